@@ -1,0 +1,12 @@
+/* The whole C interface. SPDX-License-Identifier: MIT */
+#ifndef LUMRA_LUMRA_H
+#define LUMRA_LUMRA_H
+
+#include <lumra/core_services.h>
+#include <lumra/host_array.h>
+#include <lumra/library_info.h>
+#include <lumra/session.h>
+#include <lumra/status.h>
+#include <lumra/version.h>
+
+#endif
