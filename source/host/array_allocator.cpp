@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: MIT
+#include "host/array_allocator.hpp"
+
+#include <cstring>
+#include <limits>
+
+#include "platform/immortal.hpp"
+
+namespace host {
+namespace {
+
+constexpr std::uint64_t max_count = std::numeric_limits<std::int32_t>::max();
+
+bool is_valid(element_type type, std::int32_t dimensions) noexcept {
+  return element_size(type) != 0 && (dimensions == 1 || dimensions == 2);
+}
+
+}  // namespace
+
+array_allocator &array_allocator::instance() noexcept {
+  static platform::immortal<array_allocator> allocator;
+  return allocator.get();
+}
+
+/// 0 for a block of another maker.
+std::size_t array_allocator::capacity_of(void *block) const {
+  const std::lock_guard lock(mutex_);
+  const auto found = blocks_.find(block);
+  return found == blocks_.end() ? 0 : found->second.capacity;
+}
+
+std::int32_t array_allocator::create(element_type type, std::int32_t dimensions, const std::int32_t *sizes,
+                                     void ***handle) noexcept {
+  if (!handle) return array_no_memory;
+  *handle = nullptr;
+  if (!is_valid(type, dimensions) || !sizes) return array_bad_type;
+  std::uint64_t count = 1;
+  for (std::int32_t d = 0; d < dimensions; ++d) {
+    if (sizes[d] < 0) return array_negative_size;
+    count *= static_cast<std::uint64_t>(sizes[d]);
+  }
+  const std::int32_t status = resize(type, dimensions, handle, count);
+  if (status == array_ok) std::memcpy(**handle, sizes, static_cast<std::size_t>(dimensions) * sizeof *sizes);
+  return status;
+}
+
+std::int32_t array_allocator::resize(element_type type, std::int32_t dimensions, void ***handle,
+                                     std::uint64_t count) noexcept try {
+  if (!handle) return array_no_memory;
+  if (!is_valid(type, dimensions)) return array_bad_type;
+  if (count > max_count) return array_no_memory;
+  const std::size_t header = header_size(type, dimensions);
+  const std::size_t bytes = static_cast<std::size_t>(count) * element_size(type);
+
+  void *const old = *handle ? **handle : nullptr;
+  const std::size_t old_capacity = old ? capacity_of(old) : 0;
+  if (old && old_capacity == 0) return array_no_memory;
+  if (old && old_capacity >= header + bytes) return array_ok;
+
+  // Element 0 lies on an alignment boundary, the sizes in front of it.
+  const auto lead = static_cast<std::size_t>(alignment);
+  allocation fresh;
+  fresh.memory.reset(::operator new(lead + bytes, alignment));
+  fresh.capacity = header + bytes;
+  if (!*handle) fresh.cell = std::make_unique<void *>(nullptr);
+  char *const start = static_cast<char *>(fresh.memory.get());
+  void *const block = start + lead - header;
+  std::memset(start, 0, lead + bytes);
+  if (old) std::memcpy(block, old, old_capacity);
+
+  void **cell = fresh.cell ? fresh.cell.get() : *handle;
+  allocation replaced;  // freed outside the lock
+  {
+    const std::lock_guard lock(mutex_);
+    allocation &added = blocks_.emplace(block, std::move(fresh)).first->second;
+    if (const auto found = blocks_.find(old); found != blocks_.end()) {
+      added.cell = std::move(found->second.cell);
+      replaced = std::move(found->second);
+      blocks_.erase(found);
+    }
+  }
+  *handle = cell;
+  *cell = block;
+  return array_ok;
+} catch (...) {
+  return array_no_memory;
+}
+
+void array_allocator::destroy(void ***handle) noexcept {
+  if (!handle || !*handle) return;
+  void **const cell = *handle;
+  *handle = nullptr;
+  allocation freed;
+  {
+    const std::lock_guard lock(mutex_);
+    const auto found = blocks_.find(*cell);
+    if (found == blocks_.end()) return;
+    freed = std::move(found->second);
+    blocks_.erase(found);
+  }
+  *cell = nullptr;
+}
+
+}  // namespace host
