@@ -1,0 +1,13 @@
+// The one rule by which an MKL status becomes an exception. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <mkl_dfti.h>
+
+#include "qsrfhs/math/exceptions.hpp"
+
+namespace qsrfhs {
+
+/// Throws mkl_error unless the status is 0 or of the class without error.
+void throw_if_failed(MKL_LONG status, source_position at);
+
+}  // namespace qsrfhs

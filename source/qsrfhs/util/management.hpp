@@ -1,0 +1,34 @@
+// The process-wide list of failure codes. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <list>
+#include <mutex>
+#include <span>
+
+namespace qsrfhs {
+
+class Management {
+ public:
+  static constexpr std::int32_t max_cpus = 32;
+
+  static Management &instance() noexcept;
+
+  /// Records a code in the process's list and returns it, so that exports end in `return Management::addError(code)`.
+  static std::int32_t addError(std::int32_t code) noexcept;
+
+  Management();
+  [[nodiscard]] std::int32_t cpu_count() const noexcept { return cpu_count_; }
+  [[nodiscard]] std::uint64_t error_count() const;
+  /// Copies all codes, oldest first; false when they do not fit.
+  [[nodiscard]] bool copy_errors(std::span<std::int32_t> codes) const;
+
+ private:
+  void add(std::int32_t code) noexcept;
+
+  const std::int32_t cpu_count_;
+  mutable std::mutex mutex_;
+  std::list<std::int32_t> errors_;  // under mutex_; only grows, and takes no memory while empty
+};
+
+}  // namespace qsrfhs

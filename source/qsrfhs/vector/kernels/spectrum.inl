@@ -1,0 +1,63 @@
+// The loops of the windowed FFT. SPDX-License-Identifier: MIT
+
+static inline void accumulate_8(const float *x, float *power) {
+  f8 re, im;
+  split(load(x), load(x + 8), re, im);
+  store(power, load(power) + (re * re + im * im));
+}
+
+static inline void accumulate_1(const float *x, float *power) {
+  *power += x[0] * x[0] + x[1] * x[1];
+}
+
+static inline void window_8(const float *x, const float *w, float *out) {
+  store(out, load(x) * load_twice(w));
+  store(out + 8, load(x + 8) * load_twice(w + 4));
+}
+
+static inline void window_1(const float *x, const float *w, float *out) {
+  out[0] = x[0] * *w;
+  out[1] = x[1] * *w;
+}
+
+static void copy(const float *x, float *out, std::size_t n) {
+  std::size_t k = 0;
+  for (; k + 4 <= n; k += 4) store(out + 2 * k, load(x + 2 * k));
+  for (; k < n; ++k) {
+    out[2 * k] = x[2 * k];
+    out[2 * k + 1] = x[2 * k + 1];
+  }
+}
+
+static void apply_window(const float *x, const float *w, float *out, std::size_t n) {
+  std::size_t k = 0;
+  for (; k + 8 <= n; k += 8) window_8(x + 2 * k, w + k, out + 2 * k);
+  for (; k < n; ++k) window_1(x + 2 * k, w + k, out + 2 * k);
+}
+
+static void accumulate_power(const float *x, float *power, std::size_t n) {
+  std::size_t k = 0;
+  for (; k + 8 <= n; k += 8) accumulate_8(x + 2 * k, power + k);
+  for (; k < n; ++k) accumulate_1(x + 2 * k, power + k);
+}
+
+static void accumulate_power_then_apply_window(float *work, float *power, const float *next, const float *w,
+                                               const float *ahead, std::size_t n) {
+  std::size_t k = 0;
+  for (; k + 8 <= n; k += 8) {
+    _mm_prefetch(reinterpret_cast<const char *>(ahead + 2 * k), _MM_HINT_T1);
+    accumulate_8(work + 2 * k, power + k);
+    window_8(next + 2 * k, w + k, work + 2 * k);
+  }
+  for (; k < n; ++k) {
+    accumulate_1(work + 2 * k, power + k);
+    window_1(next + 2 * k, w + k, work + 2 * k);
+  }
+}
+
+static void scale(float *x, float factor, std::size_t n) {
+  const f8 factors = broadcast(factor);
+  std::size_t k = 0;
+  for (; k + 8 <= n; k += 8) store(x + k, load(x + k) * factors);
+  for (; k < n; ++k) x[k] *= factor;
+}
