@@ -1,0 +1,32 @@
+// What happens when the library is loaded and when the process ends. SPDX-License-Identifier: MIT
+#include <strings.h>
+#include <cstring>
+
+#include "platform/process.hpp"
+#include "qsrfhs/math/mkl_runtime.hpp"
+
+namespace {
+
+// Lets the OpenMP runtime that MKL may bring live beside another copy of itself.
+constexpr const char *duplicate_runtime = "KMP_DUPLICATE_LIB_OK";
+
+// The value found at load, put back at the end; empty where there was none, or none that is worth it.
+char earlier_value[8] = "";
+
+[[gnu::constructor]] void attach() {
+  platform::pin_library(reinterpret_cast<void *>(&attach));
+  const char *value = platform::environment(duplicate_runtime);
+  if (!value || strcasecmp(value, "TRUE") != 0) {
+    // A longer value is replaced for good.
+    if (value && std::strlen(value) < sizeof earlier_value) std::strcpy(earlier_value, value);
+    platform::set_environment(duplicate_runtime, "TRUE");
+  }
+  qsrfhs::mkl_runtime::attach();
+}
+
+[[gnu::destructor]] void detach() {
+  if (earlier_value[0] != '\0') platform::set_environment(duplicate_runtime, earlier_value);
+  qsrfhs::mkl_runtime::detach();
+}
+
+}  // namespace
