@@ -1,0 +1,121 @@
+// Host arrays of the tests: blocks of exactly the size they say, so that a sanitizer sees every access beyond.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <initializer_list>
+#include <span>
+#include <vector>
+
+#include "host/host_array.hpp"
+#include "host/resize_service.hpp"
+
+namespace tests {
+
+/// A malloc'ed block of `header` + `bytes` bytes, all zero.
+inline void *new_block(std::size_t header, std::size_t bytes) {
+  return std::calloc(1, header + bytes);
+}
+
+/// A vector or matrix in a block of its own; resizable by fake_host, and by nothing else.
+template <class Block>
+class test_array {
+ public:
+  using element = host::element_of<Block>;
+  static constexpr std::size_t header = offsetof(Block, elements);
+
+  test_array() = default;  // a null block
+  explicit test_array(std::size_t count) : block_(make(count)) { block_->count = static_cast<std::int32_t>(count); }
+  test_array(std::initializer_list<element> values) : test_array(std::span(values.begin(), values.size())) {}
+  explicit test_array(std::span<const element> values) : test_array(values.size()) {
+    if (!values.empty()) std::memcpy(block_->elements, values.data(), values.size_bytes());
+  }
+  test_array(std::int32_t rows, std::int32_t columns)
+      : block_(make(static_cast<std::size_t>(rows) * static_cast<std::size_t>(columns))) {
+    block_->rows = rows;
+    block_->columns = columns;
+  }
+  test_array(const test_array &) = delete;
+  test_array &operator=(const test_array &) = delete;
+  ~test_array() { std::free(block_); }
+
+  [[nodiscard]] Block **handle() noexcept { return &block_; }
+  [[nodiscard]] Block ***address() noexcept { return &handle_; }
+  [[nodiscard]] Block *block() noexcept { return block_; }
+  [[nodiscard]] std::span<element> elements() noexcept { return host::elements(handle()); }
+  [[nodiscard]] std::vector<element> copy() { return {elements().begin(), elements().end()}; }
+
+ private:
+  static Block *make(std::size_t count) { return static_cast<Block *>(new_block(header, count * sizeof(element))); }
+
+  Block *block_ = nullptr;
+  Block **handle_ = &block_;
+};
+
+using f32_array = test_array<lumra_f32_block>;
+using f64_array = test_array<lumra_f64_block>;
+using cf32_array = test_array<lumra_cf32_block>;
+using cf64_array = test_array<lumra_cf64_block>;
+
+/// The process's resize service while it lives: records what it is asked, refuses what it is told to refuse, and
+/// allocates exactly what was asked for.
+class fake_host {
+ public:
+  enum class unit { bytes, elements };  // what the size argument counts
+  struct call {
+    std::int32_t type, dimensions;
+    std::uint64_t size;
+  };
+
+  explicit fake_host(unit size_unit) : unit_(size_unit) {
+    current() = this;
+    qsHost_SetArrayResize(&serve);
+  }
+  fake_host(const fake_host &) = delete;
+  fake_host &operator=(const fake_host &) = delete;
+  ~fake_host() {
+    qsHost_SetArrayResize(nullptr);
+    current() = nullptr;
+    for (void **cell : cells_) {
+      std::free(*cell);
+      std::free(cell);
+    }
+  }
+
+  std::vector<call> calls;
+  int refuse_from = -1;  // index of the first call that is refused, -1 for none
+  int refuse_until = 1 << 30;
+
+ private:
+  static fake_host *&current() {
+    static fake_host *host = nullptr;
+    return host;
+  }
+
+  static std::int32_t serve(std::int32_t type, std::int32_t dimensions, void *address, std::uint64_t size) {
+    fake_host &self = *current();
+    const int index = static_cast<int>(self.calls.size());
+    self.calls.push_back({type, dimensions, size});
+    if (self.refuse_from >= 0 && index >= self.refuse_from && index < self.refuse_until) return 1;
+    auto **&handle = *static_cast<void ***>(address);
+    if (!handle) {  // arrays made here are freed with the host
+      handle = static_cast<void **>(std::calloc(1, sizeof(void *)));
+      self.cells_.push_back(handle);
+    }
+    const auto element = host::element_type{type};
+    const std::size_t header = host::header_size(element, dimensions);
+    const std::size_t width = self.unit_ == unit::bytes ? 1 : host::element_size(element);
+    void *fresh = new_block(header, static_cast<std::size_t>(size) * width);
+    if (*handle) std::memcpy(fresh, *handle, header);  // the sizes stay as they were; the elements need not
+    std::free(*handle);
+    *handle = fresh;
+    return 0;
+  }
+
+  unit unit_;
+  std::vector<void **> cells_;
+};
+
+}  // namespace tests
