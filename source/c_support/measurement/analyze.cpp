@@ -71,9 +71,9 @@ std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, cons
     transform.forward(work.data());
     const float *next = x + 2 * segment * step;
     if (w) {
-      // The samples that the segment after the next adds, as far as the input goes.
-      const float *ahead = segment + 1 < segments ? next + 2 * step : next;
-      kernels.accumulate_power_then_apply_window(buffer, power, next, w, ahead, n);
+      // What the segment after this one adds comes into the caches meanwhile.
+      const std::size_t ahead_count = segment + 1 < segments ? std::min(step, n) : 0;
+      kernels.accumulate_power_then_apply_window(buffer, power, next, w, next + 2 * n, ahead_count, n);
     } else {
       kernels.accumulate_power(buffer, power, n);
       kernels.copy(next, buffer, n);
@@ -81,6 +81,7 @@ std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, cons
   }
   transform.forward(work.data());
   kernels.accumulate_power(buffer, power, n);
+  kernels.order_power(power, n);
   return segments;
 }
 

@@ -8,5 +8,6 @@ static constexpr kernel_table table = {
     .apply_window = &apply_window,
     .accumulate_power = &accumulate_power,
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
+    .order_power = &order_power,
     .scale = &scale,
 };

@@ -20,12 +20,18 @@ static inline f8 operator*(f8 a, f8 b) {
   return {_mm256_mul_ps(a.v, b.v)};
 }
 
-/// Eight complex values in a and b (four each) to eight real and eight imaginary parts.
-static inline void split(f8 a, f8 b, f8 &re, f8 &im) {
-  const __m256 low = _mm256_permute2f128_ps(a.v, b.v, 0x20);
-  const __m256 high = _mm256_permute2f128_ps(a.v, b.v, 0x31);
-  re = {_mm256_shuffle_ps(low, high, 0x88)};
-  im = {_mm256_shuffle_ps(low, high, 0xdd)};
+/// Eight complex values in a and b (four each) to eight real and eight imaginary parts, in the order 0 1 4 5 2 3 6 7.
+static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
+  re = {_mm256_shuffle_ps(a.v, b.v, 0x88)};
+  im = {_mm256_shuffle_ps(a.v, b.v, 0xdd)};
+}
+
+/// The order of split_in_lanes back to 0 to 7.
+static inline f8 order_lanes(f8 a) {
+  const __m256d pairs = _mm256_castps_pd(a.v);
+  const __m256d swapped = _mm256_permute2f128_pd(pairs, pairs, 1);
+  const __m256d low = _mm256_unpacklo_pd(pairs, swapped), high = _mm256_unpackhi_pd(pairs, swapped);
+  return {_mm256_castpd_ps(_mm256_permute2f128_pd(low, high, 0x20))};
 }
 
 /// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.

@@ -21,10 +21,15 @@ static inline f8 operator*(f8 a, f8 b) {
   return {_mm_mul_ps(a.low, b.low), _mm_mul_ps(a.high, b.high)};
 }
 
-/// Eight complex values in a and b (four each) to eight real and eight imaginary parts.
-static inline void split(f8 a, f8 b, f8 &re, f8 &im) {
+/// Eight complex values in a and b (four each) to eight real and eight imaginary parts, in the order 0 to 7.
+static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
   re = {_mm_shuffle_ps(a.low, a.high, 0x88), _mm_shuffle_ps(b.low, b.high, 0x88)};
   im = {_mm_shuffle_ps(a.low, a.high, 0xdd), _mm_shuffle_ps(b.low, b.high, 0xdd)};
+}
+
+/// The order of split_in_lanes back to 0 to 7.
+static inline f8 order_lanes(f8 a) {
+  return a;
 }
 
 /// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.
