@@ -1,0 +1,142 @@
+// Transform pool, filter, worker pool. SPDX-License-Identifier: MIT
+#include <gtest/gtest.h>
+
+#include <latch>
+#include <memory>
+#include <numeric>
+#include <thread>
+#include <vector>
+
+#include "platform/process.hpp"
+#include "qsrfhs/math/fft.hpp"
+#include "qsrfhs/math/filter.hpp"
+#include "qsrfhs/math/mkl_status.hpp"
+#include "qsrfhs/util/thread_pool.hpp"
+
+namespace {
+
+TEST(FftPool, KeepsWhatItHasASlotFor) {
+  qsrfhs::fft_pool pool;
+  { const auto lease = pool.acquire(32); }
+  EXPECT_EQ(0, pool.idle_count());  // no slot was reserved
+  pool.prefill(64);
+  pool.prefill(64);
+  EXPECT_EQ(1, pool.idle_count());
+  {
+    const auto pooled = pool.acquire(64);
+    EXPECT_EQ(0, pool.idle_count());
+    pool.prefill(64);  // the slot that is lent out counts
+    EXPECT_EQ(0, pool.idle_count());
+    const auto fresh = pool.acquire(64);
+  }
+  EXPECT_EQ(1, pool.idle_count());
+
+  pool.set_reserve_slots(1);
+  { const auto lease = pool.acquire(32); }
+  EXPECT_EQ(2, pool.idle_count());
+  {
+    const auto first = pool.acquire(64), second = pool.acquire(64);
+    EXPECT_EQ(1, pool.idle_count());
+  }
+  EXPECT_EQ(3, pool.idle_count());
+  {
+    const auto lent = pool.acquire(64);
+    pool.clear();
+    EXPECT_EQ(0, pool.idle_count());
+  }
+  EXPECT_EQ(0, pool.idle_count());
+}
+
+TEST(FftPool, ARefusedLengthLeavesNothingBehind) {
+  qsrfhs::fft_pool pool;
+  pool.set_reserve_slots(1);
+  for (int i = 0; i < 3; ++i) {
+    EXPECT_THROW(pool.prefill(qsrfhs::max_fft_length + 1), qsrfhs::invalid_argument);
+    EXPECT_THROW((void)pool.acquire(qsrfhs::max_fft_length + 1), qsrfhs::invalid_argument);
+  }
+  EXPECT_EQ(0, pool.idle_count());
+}
+
+TEST(FftPoolConcurrency, LendsATransformToOneThreadAtATime) {
+  qsrfhs::fft_pool pool;
+  pool.set_reserve_slots(1);
+  std::vector<std::jthread> threads;
+  for (int t = 0; t < 4; ++t)
+    threads.emplace_back([&] {
+      for (int i = 0; i < 200; ++i) {
+        const auto lease = pool.acquire(16);
+        std::vector<std::complex<float>> data(16, 1.F);
+        lease->forward(data.data());
+        EXPECT_EQ(16.F, data[0].real());
+        if (i % 50 == 0) pool.clear();
+      }
+    });
+}
+
+TEST(MklStatus, OnlyFailuresThrow) {
+  EXPECT_NO_THROW(qsrfhs::throw_if_failed(0, {"f", 1}));
+  try {
+    qsrfhs::throw_if_failed(DFTI_MEMORY_ERROR, {"f", 1});
+    FAIL();
+  } catch (const qsrfhs::mkl_error &e) {
+    EXPECT_STREQ(DftiErrorMessage(DFTI_MEMORY_ERROR), e.what());
+    EXPECT_EQ(DFTI_MEMORY_ERROR, e.status);
+    EXPECT_EQ(-312499, e.code);
+  }
+}
+
+TEST(Filter, CapacityIsWholeLanesOnAlignedStorage) {
+  for (const std::uint64_t n : {0U, 1U, 5U, 8U, 9U}) {
+    const qsrfhs::Filter filter(n);
+    EXPECT_EQ(n, filter.length());
+    EXPECT_EQ((n + 7) / 8 * 8, filter.capacity());
+    EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(filter.coefficients().data()) % 32);
+  }
+}
+
+TEST(ThreadPoolConcurrency, RunsWhatIsQueuedBeforeItEnds) {
+  std::atomic<int> runs{0};
+  {
+    ctpl::thread_pool pool(8);
+    for (int i = 0; i < 1000; ++i) (void)pool.push([&](std::int32_t) { ++runs; });
+    EXPECT_EQ(42, pool.push([](std::int32_t) { return 42; }).get());
+    auto failing = pool.push([](std::int32_t) { throw std::runtime_error("task"); });
+    EXPECT_THROW(failing.get(), std::runtime_error);
+    EXPECT_THROW(pool.push([&](std::int32_t) { pool.stop(); }).get(), std::system_error);
+  }
+  EXPECT_EQ(1000, runs);
+}
+
+TEST(ThreadPoolConcurrency, DroppedWorkersFinishTheirTaskAndTheRestServeTheQueue) {
+  std::latch release(1), running(8);
+  std::vector<std::future<std::int32_t>> held, later;
+  {
+    ctpl::thread_pool pool(8);
+    for (int i = 0; i < 8; ++i)
+      held.push_back(pool.push([&](std::int32_t worker) {
+        running.count_down();
+        release.wait();
+        return worker;
+      }));
+    running.wait();
+    for (int i = 0; i < 100; ++i) later.push_back(pool.push([](std::int32_t worker) { return worker; }));
+    pool.resize(2);
+    EXPECT_EQ(2, pool.size());
+    release.count_down();
+    for (auto &f : later) EXPECT_LT(f.get(), 2);
+    for (auto &f : held) EXPECT_GE(f.get(), 0);
+    pool.resize(3);
+    EXPECT_EQ(3, pool.size());
+  }
+}
+
+TEST(Process, KnowsWhatIsReadable) {
+  const std::vector<char> block(100000);
+  EXPECT_TRUE(platform::is_readable(block.data(), block.size()));
+  EXPECT_FALSE(platform::is_readable(block.data(), std::size_t{1} << 35));
+  EXPECT_FALSE(platform::is_readable(nullptr, 1));
+  EXPECT_FALSE(platform::is_readable(block.data(), SIZE_MAX));
+  EXPECT_EQ(nullptr, platform::find_symbol("no_such_symbol_anywhere"));
+}
+
+}  // namespace
