@@ -1,0 +1,161 @@
+// The windowed FFT of 2^20 samples, flat top, 50 % overlap, one thread, beside its peers and the bare transforms; and
+// what a call costs. SPDX-License-Identifier: MIT
+#include <benchmark/benchmark.h>
+#include <mkl_dfti.h>
+#include <mkl_service.h>
+#include <lumra/lumra.hpp>
+
+#include <algorithm>
+#include <cmath>
+#include <complex>
+#include <cstdlib>
+#include <memory>
+#include <new>
+#include <numbers>
+#include <random>
+#include <vector>
+
+#ifdef LUMRA_PEER_FFTW_VOLK
+#include <fftw3.h>
+#include <volk/volk.h>
+#endif
+#ifdef LUMRA_PEER_LIQUID
+#include <liquid/liquid.h>
+#endif
+
+namespace {
+
+using sample = std::complex<float>;
+constexpr std::size_t count = 1 << 20;
+
+template <class T>
+struct aligned {
+  explicit aligned(std::size_t n) : memory(static_cast<T *>(std::aligned_alloc(64, (n * sizeof(T) + 63) / 64 * 64))) {}
+  ~aligned() { std::free(memory); }
+  aligned(const aligned &) = delete;
+  aligned &operator=(const aligned &) = delete;
+  T *memory;
+};
+
+const lumra::host_array<sample> &input() {
+  static const auto array = [] {
+    lumra::host_array<sample> samples(count);
+    std::mt19937 random(1);
+    std::normal_distribution<float> value;
+    for (sample &s : samples.elements()) s = {value(random), value(random)};
+    return samples;
+  }();
+  return array;
+}
+
+std::vector<float> flat_top(std::size_t n) {
+  std::vector<float> w(n);
+  for (std::size_t k = 0; k < n; ++k) {
+    const double x = 2 * std::numbers::pi * static_cast<double>(k) / static_cast<double>(n);
+    w[k] = static_cast<float>(0.21557895 - 0.41663158 * std::cos(x) + 0.277263158 * std::cos(2 * x) -
+                              0.083578947 * std::cos(3 * x) + 0.006947368 * std::cos(4 * x));
+  }
+  return w;
+}
+
+void report(benchmark::State &state, std::size_t samples) {
+  state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(samples));
+}
+
+void lumra_windowed_fft(benchmark::State &state) {
+  const auto n = static_cast<std::int32_t>(state.range(0));
+  lumra::session session;
+  session.initialize_fft(n);
+  session.initialize_window(lumra::window::flat_top, n);
+  lumra::spectrum out;
+  for (auto _ : state) session.power_spectrum(lumra::window::flat_top, n, 50, input(), 1e-6, out);
+  report(state, count);
+}
+
+// The limit: nothing but the transforms, in place.
+void mkl_transforms_alone(benchmark::State &state) {
+  const auto n = static_cast<std::size_t>(state.range(0));
+  const aligned<sample> work(n);
+  std::fill_n(work.memory, n, sample(0));
+  DFTI_DESCRIPTOR_HANDLE transform = nullptr;
+  DftiCreateDescriptor(&transform, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(n));
+  DftiCommitDescriptor(transform);
+  const std::size_t segments = (count - n) / (n / 2) + 1;
+  for (auto _ : state)
+    for (std::size_t s = 0; s < segments; ++s) DftiComputeForward(transform, work.memory);
+  DftiFreeDescriptor(&transform);
+  report(state, count);
+}
+
+#ifdef LUMRA_PEER_FFTW_VOLK
+void fftw_with_volk(benchmark::State &state) {
+  const auto n = static_cast<unsigned>(state.range(0));
+  const aligned<sample> work(n), spectrum(n);
+  const aligned<float> window(n), power(n), sum(n);
+  const auto w = flat_top(n);
+  std::copy(w.begin(), w.end(), window.memory);
+  const auto plan = fftwf_plan_dft_1d(static_cast<int>(n), reinterpret_cast<fftwf_complex *>(work.memory),
+                                      reinterpret_cast<fftwf_complex *>(spectrum.memory), FFTW_FORWARD, FFTW_MEASURE);
+  const std::size_t step = n / 2;
+  const sample *x = input().elements().data();
+  for (auto _ : state) {
+    std::fill_n(sum.memory, n, 0.F);
+    for (std::size_t start = 0; start + n <= count; start += step) {
+      volk_32fc_32f_multiply_32fc(work.memory, x + start, window.memory, n);
+      fftwf_execute(plan);
+      volk_32fc_magnitude_squared_32f(power.memory, spectrum.memory, n);
+      volk_32f_x2_add_32f(sum.memory, sum.memory, power.memory, n);
+    }
+    volk_32f_s32f_multiply_32f(sum.memory, sum.memory, 1.F / static_cast<float>((count - n) / step + 1), n);
+    benchmark::DoNotOptimize(sum.memory[0]);
+  }
+  fftwf_destroy_plan(plan);
+  report(state, count);
+}
+#endif
+
+#ifdef LUMRA_PEER_LIQUID
+void liquid_periodogram(benchmark::State &state) {
+  const auto n = static_cast<unsigned>(state.range(0));
+  auto *x = const_cast<sample *>(input().elements().data());
+  std::vector<float> power(n);
+  for (auto _ : state) {
+    spgramcf periodogram = spgramcf_create(n, LIQUID_WINDOW_FLATTOP, n, n / 2);
+    spgramcf_write(periodogram, reinterpret_cast<liquid_float_complex *>(x), count);
+    spgramcf_get_psd(periodogram, power.data());
+    spgramcf_destroy(periodogram);
+  }
+  report(state, count);
+}
+#endif
+
+// Look-up, checks, buffers and bookkeeping: the transform of 16 points itself takes some 15 ns.
+void lumra_call_of_16_samples(benchmark::State &state) {
+  lumra::session session;
+  session.initialize_fft(16);
+  session.initialize_window(lumra::window::flat_top, 16);
+  const lumra::host_array<sample> samples(16);
+  lumra::spectrum out;
+  for (auto _ : state) session.power_spectrum(lumra::window::flat_top, 16, 0, samples, 1e-6, out);
+}
+
+// The fastest of the repetitions: what is left when nobody else uses the machine.
+double best(const std::vector<double> &times) {
+  return *std::min_element(times.begin(), times.end());
+}
+
+#define SIZES \
+  ->Arg(256)->Arg(1024)->Arg(4096)->Arg(65536)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best)
+BENCHMARK(lumra_windowed_fft) SIZES;
+BENCHMARK(mkl_transforms_alone) SIZES;
+#ifdef LUMRA_PEER_FFTW_VOLK
+BENCHMARK(fftw_with_volk) SIZES;
+#endif
+#ifdef LUMRA_PEER_LIQUID
+BENCHMARK(liquid_periodogram) SIZES;
+#endif
+BENCHMARK(lumra_call_of_16_samples)->ComputeStatistics("best", best);
+
+}  // namespace
+
+BENCHMARK_MAIN();
