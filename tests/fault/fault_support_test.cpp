@@ -33,7 +33,7 @@ TEST(FaultInjection, TheChosenTransformCallFails) {
     MKL_LONG made = 0, committed = 0, computed = 0, freed = 0;
     {
       const tests::mkl_faults::fail_at armed(n);
-      made = DftiCreateDescriptor(&descriptor, DFTI_SINGLE, DFTI_COMPLEX, 1, MKL_LONG{4});
+      made = DftiCreateDescriptor(&descriptor, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(4));
       if (made == 0) committed = DftiCommitDescriptor(descriptor);
       if (made == 0 && committed == 0) computed = DftiComputeForward(descriptor, data);
       if (made == 0) freed = DftiFreeDescriptor(&descriptor);
