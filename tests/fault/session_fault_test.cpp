@@ -86,8 +86,12 @@ TEST(SessionFaults, MklFailuresAreLoggedWithTheirPlace) {
 }
 
 TEST(SessionFaults, MemoryRunsOutAtEveryAllocation) {
+  const auto run = [] {
+    fail_everywhere<tests::memory_faults::fail_at>(&tests::memory_faults::calls, "bad allocation");
+  };
+  run();  // what the test framework keeps once is there
   const long before = tests::memory_faults::live();
-  fail_everywhere<tests::memory_faults::fail_at>(&tests::memory_faults::calls, "bad allocation");
+  run();
   EXPECT_EQ(before, tests::memory_faults::live());
 }
 
