@@ -18,7 +18,7 @@ char earlier_value[8] = "";
   const char *value = platform::environment(duplicate_runtime);
   if (!value || strcasecmp(value, "TRUE") != 0) {
     // A longer value is replaced for good.
-    if (value && std::strlen(value) < sizeof earlier_value) std::strcpy(earlier_value, value);
+    if (value && std::strlen(value) < sizeof earlier_value) std::memcpy(earlier_value, value, std::strlen(value) + 1);
     platform::set_environment(duplicate_runtime, "TRUE");
   }
   qsrfhs::mkl_runtime::attach();

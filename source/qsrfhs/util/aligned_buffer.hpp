@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstddef>
-#include <cstdint>
 #include <memory>
 #include <new>
 #include <span>
@@ -20,9 +19,11 @@ class aligned_buffer {
   explicit aligned_buffer(std::size_t size) : size_(size) {
     if (size == 0) return;
     // Aligned by hand: small blocks come from malloc's per-thread lists three times as fast as aligned ones.
-    memory_.reset(::operator new(capacity() * sizeof(T) + alignment));
-    const auto address = reinterpret_cast<std::uintptr_t>(memory_.get());
-    data_ = reinterpret_cast<T *>((address + alignment - 1) / alignment * alignment);
+    const std::size_t bytes = capacity() * sizeof(T);
+    std::size_t room = bytes + alignment;
+    memory_.reset(::operator new(room));
+    void *first = memory_.get();
+    data_ = static_cast<T *>(std::align(alignment, bytes, first, room));
   }
 
   [[nodiscard]] T *data() const noexcept { return data_; }

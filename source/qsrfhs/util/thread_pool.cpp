@@ -19,7 +19,7 @@ thread_pool::thread_pool(std::int32_t workers) : state_(std::make_shared<state>(
   try {
     resize(workers);
   } catch (...) {
-    stop();
+    finish();
     throw;
   }
 }
@@ -83,6 +83,10 @@ void thread_pool::stop() {
   for (const std::thread &thread : threads_)
     if (thread.get_id() == std::this_thread::get_id())
       throw std::system_error(std::make_error_code(std::errc::resource_deadlock_would_occur));
+  finish();
+}
+
+void thread_pool::finish() noexcept {
   {
     const std::lock_guard lock(state_->mutex);
     if (state_->done) return;

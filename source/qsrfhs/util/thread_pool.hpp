@@ -45,6 +45,7 @@ class thread_pool {
   struct state;
   using stop_flag = std::shared_ptr<std::atomic<bool>>;
 
+  void finish() noexcept;
   void enqueue(std::function<void(std::int32_t)> task);
   static void work(state &shared, const std::atomic<bool> &leave, std::int32_t worker);
 
