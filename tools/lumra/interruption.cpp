@@ -1,0 +1,72 @@
+// SPDX-License-Identifier: MIT
+#include "interruption.hpp"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <atomic>
+#include <climits>
+#include <csignal>
+#include <cstring>
+
+#include "failure.hpp"
+
+namespace tool {
+namespace {
+
+constexpr int signals[] = {SIGINT, SIGTERM, SIGHUP, SIGPIPE};
+
+struct slot {
+  std::atomic<bool> taken{false};
+  std::atomic<bool> armed{false};  // the handler reads the name only then
+  char name[PATH_MAX] = {};
+};
+slot slots[4];
+std::atomic<bool> bar_shown{false};
+
+/// Calls only functions that POSIX allows in a handler.
+void clean_up(int number) {
+  for (slot &s : slots)
+    if (s.armed) ::unlink(s.name);
+  if (bar_shown) (void)!::write(STDERR_FILENO, "\n", 1);
+  // The disposition is the default one again (SA_RESETHAND); the signal arrives when the handler returns.
+  (void)::raise(number);
+}
+
+}  // namespace
+
+void install_interruption() {
+  struct sigaction action = {};
+  action.sa_handler = clean_up;
+  action.sa_flags = static_cast<int>(SA_RESETHAND);
+  sigemptyset(&action.sa_mask);
+  for (const int number : signals) sigaddset(&action.sa_mask, number);
+  for (const int number : signals) {
+    struct sigaction before = {};
+    // A signal that whoever started the program ignores (nohup, a job in the background) stays ignored.
+    if (::sigaction(number, nullptr, &before) == 0 && before.sa_handler != SIG_IGN)
+      (void)::sigaction(number, &action, nullptr);
+  }
+}
+
+unfinished_file::unfinished_file(const std::filesystem::path &file) : slot_(-1) {
+  const std::string name = std::filesystem::absolute(file).string();
+  if (name.size() >= sizeof slot::name) throw failure("{}: name too long", file.string());
+  const auto *free = std::find_if(std::begin(slots), std::end(slots), [](slot &s) { return !s.taken.exchange(true); });
+  if (free == std::end(slots)) throw failure("{}: too many output files at once", file.string());
+  slot_ = static_cast<int>(free - slots);
+  slot &mine = slots[slot_];
+  std::copy_n(name.c_str(), name.size() + 1, mine.name);
+  mine.armed = true;
+}
+
+unfinished_file::~unfinished_file() {
+  slots[slot_].armed = false;
+  slots[slot_].taken = false;
+}
+
+void set_bar_shown(bool shown) noexcept {
+  bar_shown = shown;
+}
+
+}  // namespace tool

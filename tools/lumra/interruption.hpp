@@ -1,0 +1,29 @@
+// What is undone when a signal ends the program. SPDX-License-Identifier: MIT
+//
+// The handler itself removes unfinished files and ends the program by the same signal, so that an interruption takes
+// effect at once, whatever is being computed.
+#pragma once
+
+#include <filesystem>
+
+namespace tool {
+
+/// To be called once, at the start.
+void install_interruption();
+
+/// A file that is removed when a signal ends the program while this lives.
+class unfinished_file {
+ public:
+  explicit unfinished_file(const std::filesystem::path &file);  // throws failure
+  unfinished_file(const unfinished_file &) = delete;
+  unfinished_file &operator=(const unfinished_file &) = delete;
+  ~unfinished_file();
+
+ private:
+  int slot_;
+};
+
+/// Whether a progress bar stands on the terminal, which the handler then ends with a new line.
+void set_bar_shown(bool shown) noexcept;
+
+}  // namespace tool

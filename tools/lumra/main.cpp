@@ -1,0 +1,48 @@
+// The command-line program lumra. Exit codes: 0 done; 1 bad input or failed work, with one line that says what to do;
+// 2 wrong usage; a signal's own when interrupted. SPDX-License-Identifier: MIT
+#include <cerrno>
+#include <cstdio>
+#include <new>
+#include <system_error>
+
+#include <lumra/lumra.hpp>
+#include "commands.hpp"
+#include "failure.hpp"
+#include "interruption.hpp"
+
+namespace {
+
+int fail(int code, const std::string &text) {
+  fmt::print(stderr, "lumra: {}\n", text);
+  return code;
+}
+
+int run(int count, char **arguments) {
+  CLI::App program("Spectra of recorded radio signals", "lumra");
+  program.require_subcommand(1);
+  tool::add_spectrum(program);
+  tool::add_info(program);
+  try {
+    program.parse(count, arguments);
+  } catch (const CLI::ParseError &error) {
+    if (error.get_exit_code() == 0) return program.exit(error);  // help
+    return fail(
+        2, fmt::format("{}; see lumra {}--help", error.what(), program.got_subcommand("spectrum") ? "spectrum " : ""));
+  }
+  if (std::fflush(stdout) != 0)
+    throw tool::failure("cannot write the summary: {}", std::generic_category().message(errno));
+  return 0;
+}
+
+}  // namespace
+
+int main(int count, char **arguments) {
+  tool::install_interruption();
+  try {
+    return run(count, arguments);
+  } catch (const std::bad_alloc &) {
+    return fail(1, "not enough memory; use a smaller --fft");
+  } catch (const std::exception &error) {
+    return fail(1, error.what());
+  }
+}

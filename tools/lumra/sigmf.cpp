@@ -1,0 +1,193 @@
+// Follows SigMF 1.2: sample indices count from core:offset; every capture may have header bytes of its own in front of
+// its samples. SPDX-License-Identifier: MIT
+#include "sigmf.hpp"
+
+#include <cmath>
+#include <fstream>
+#include <limits>
+#include <nlohmann/json.hpp>
+
+#include "failure.hpp"
+
+namespace tool {
+namespace {
+
+namespace fs = std::filesystem;
+using nlohmann::json;
+
+struct capture {
+  std::uint64_t start = 0;  // index of the first sample
+  std::uint64_t header_bytes = 0;
+  std::optional<double> frequency;
+  std::optional<std::uint64_t> global_index;
+};
+
+/// The fields of one JSON object, with the file's name for messages.
+class fields {
+ public:
+  fields(const json &object, std::string where) : object_(object), where_(std::move(where)) {
+    if (!object.is_object()) throw failure("{} is missing or not an object", where_);
+  }
+
+  [[nodiscard]] std::optional<std::string> text(const char *key) const {
+    const json *value = find(key);
+    if (value && !value->is_string()) throw failure("{}: {} must be a text", where_, key);
+    return value ? std::optional(value->get<std::string>()) : std::nullopt;
+  }
+  [[nodiscard]] std::optional<double> number(const char *key) const {
+    const json *value = find(key);
+    if (value && !value->is_number()) throw failure("{}: {} must be a number", where_, key);
+    return value ? std::optional(value->get<double>()) : std::nullopt;
+  }
+  /// Counts are limited so that sums and products of a few cannot overflow.
+  [[nodiscard]] std::optional<std::uint64_t> count(const char *key) const {
+    const json *value = find(key);
+    if (!value) return std::nullopt;
+    const std::uint64_t largest = std::uint64_t{1} << 52;
+    if (!value->is_number_unsigned() || value->get<std::uint64_t>() > largest)
+      throw failure("{}: {} must be a whole number from 0 to 2^52", where_, key);
+    return value->get<std::uint64_t>();
+  }
+  [[nodiscard]] bool is_true(const char *key) const {
+    const json *value = find(key);
+    return value && value->is_boolean() && value->get<bool>();
+  }
+  [[nodiscard]] const std::string &where() const noexcept { return where_; }
+
+ private:
+  [[nodiscard]] const json *find(const char *key) const {
+    const auto found = object_.find(key);
+    return found == object_.end() || found->is_null() ? nullptr : &*found;
+  }
+
+  const json &object_;
+  std::string where_;
+};
+
+json parse(const fs::path &meta) {
+  readable_size(meta);
+  std::ifstream file(meta, std::ios::binary);
+  try {
+    return json::parse(file);
+  } catch (const json::parse_error &error) {
+    throw failure("{}: not valid JSON near byte {}; is this the metadata file?", meta.string(), error.byte);
+  }
+}
+
+std::vector<capture> read_captures(const json &root, const fs::path &meta) {
+  const auto list = root.find("captures");
+  if (list == root.end()) return {capture{}};
+  if (!list->is_array()) throw failure("{}: captures must be a list", meta.string());
+  std::vector<capture> captures;
+  for (const json &item : *list) {
+    const fields of_capture(item, fmt::format("{}: capture {}", meta.string(), captures.size()));
+    capture next;
+    next.start = of_capture.count("core:sample_start").value_or(0);
+    next.header_bytes = of_capture.count("core:header_bytes").value_or(0);
+    next.frequency = of_capture.number("core:frequency");
+    next.global_index = of_capture.count("core:global_index");
+    if (next.frequency && !std::isfinite(*next.frequency))
+      throw failure("{}: core:frequency is not finite", of_capture.where());
+    if (!captures.empty() && next.start < captures.back().start)
+      throw failure("{}: core:sample_start lies before that of the capture in front", of_capture.where());
+    captures.push_back(next);
+  }
+  return captures.empty() ? std::vector{capture{}} : captures;
+}
+
+/// One spectrum needs one centre frequency and samples without a gap.
+void require_one_signal(const std::vector<capture> &captures, const fs::path &meta) {
+  for (std::size_t i = 1; i < captures.size(); ++i) {
+    const capture &before = captures[i - 1];
+    const capture &now = captures[i];
+    if (now.frequency && before.frequency != now.frequency)
+      throw failure("{}: captures {} and {} differ in centre frequency; choose one with --capture", meta.string(),
+                    i - 1, i);
+    if (before.global_index && now.global_index && *now.global_index - *before.global_index != now.start - before.start)
+      throw failure("{}: samples are missing between captures {} and {}; choose one with --capture", meta.string(),
+                    i - 1, i);
+  }
+}
+
+fs::path data_file(const fields &global, const fs::path &meta) {
+  const auto dataset = global.text("core:dataset");
+  if (!dataset) return fs::path(meta).replace_extension(".sigmf-data");
+  if (dataset->empty() || fs::path(*dataset).has_parent_path())
+    throw failure("{}: core:dataset must be the name of a file in the same folder", meta.string());
+  return meta.parent_path() / *dataset;
+}
+
+/// Where the samples of each capture lie. Headers stand in front of their captures.
+std::vector<extent> locate(const std::vector<capture> &captures, std::uint64_t first_index, std::uint64_t data_bytes,
+                           std::size_t width, const fs::path &data) {
+  std::vector<extent> extents;
+  std::uint64_t headers = 0;
+  for (std::size_t i = 0; i < captures.size(); ++i) {
+    if (captures[i].start < first_index)
+      throw failure("{}: capture {} starts before core:offset; correct the metadata", data.string(), i);
+    headers += captures[i].header_bytes;
+    const std::uint64_t begin = headers + (captures[i].start - first_index) * width;
+    if (begin > data_bytes)
+      throw failure("{}: ends before capture {} begins (byte {} of {}); is the file complete?", data.string(), i, begin,
+                    data_bytes);
+    std::uint64_t bytes = data_bytes - begin;
+    if (i + 1 < captures.size())
+      bytes = std::min(bytes, (captures[i + 1].start - captures[i].start) * width);
+    else if (bytes % width != 0)
+      throw failure("{}: its {} bytes of samples are no whole number of samples ({} bytes each); is the file complete?",
+                    data.string(), bytes, width);
+    extents.push_back({begin, bytes / width});
+  }
+  return extents;
+}
+
+}  // namespace
+
+recording open_sigmf(const fs::path &meta, const recording_options &options) {
+  const json root = parse(meta);
+  if (!root.is_object() || !root.contains("global")) throw failure("{}: no SigMF metadata (no global)", meta.string());
+  const fields global(root["global"], meta.string() + ": global");
+
+  recording result;
+  result.name = meta.stem().string();
+  if (global.is_true("core:metadata_only"))
+    throw failure("{}: holds metadata only, there are no samples to analyse", meta.string());
+  if (global.count("core:num_channels").value_or(1) != 1)
+    throw failure("{}: several channels are interleaved; split them into one recording each", meta.string());
+
+  const auto type = options.format ? options.format : global.text("core:datatype");
+  if (!type) throw failure("{}: core:datatype is missing; say --format", meta.string());
+  try {
+    result.format = parse_format(*type);
+  } catch (const failure &reason) {
+    throw failure("{}: {}", meta.string(), reason.what());
+  }
+  const auto rate = options.rate ? options.rate : global.number("core:sample_rate");
+  if (!rate) throw failure("{}: core:sample_rate is missing; say --rate HZ", meta.string());
+  if (!(*rate > 0) || !std::isfinite(*rate))
+    throw failure("{}: core:sample_rate {} is not positive; say --rate HZ", meta.string(), *rate);
+  result.rate = *rate;
+
+  result.data = data_file(global, meta);
+  result.files = {meta, result.data};
+  const std::uint64_t size = readable_size(result.data);
+  const std::uint64_t trailing = global.count("core:trailing_bytes").value_or(0);
+  if (trailing > size) throw failure("{}: shorter than its core:trailing_bytes", result.data.string());
+
+  std::vector<capture> captures = read_captures(root, meta);
+  result.extents =
+      locate(captures, global.count("core:offset").value_or(0), size - trailing, result.format.bytes(), result.data);
+  if (options.capture) {
+    if (*options.capture >= captures.size())
+      throw failure("{}: no capture {}; there are {}, counted from 0", meta.string(), *options.capture,
+                    captures.size());
+    const auto chosen = static_cast<std::ptrdiff_t>(*options.capture);
+    captures = {captures[static_cast<std::size_t>(chosen)]};
+    result.extents = {result.extents[static_cast<std::size_t>(chosen)]};
+  }
+  require_one_signal(captures, meta);
+  result.frequency = captures.front().frequency;
+  return result;
+}
+
+}  // namespace tool

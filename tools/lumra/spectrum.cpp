@@ -1,0 +1,158 @@
+// lumra spectrum: averaged power spectrum of a recording as summary, CSV and picture. SPDX-License-Identifier: MIT
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <memory>
+
+#include "averaged_spectrum.hpp"
+#include "commands.hpp"
+#include "failure.hpp"
+#include "gnuplot.hpp"
+#include "output_file.hpp"
+#include "progress.hpp"
+#include "recording.hpp"
+#include "spectrum_picture.hpp"
+#include "units.hpp"
+
+namespace tool {
+namespace {
+
+constexpr std::int32_t default_fft_size = 4096;
+
+struct spectrum_command {
+  std::string path;
+  recording_options options;
+  spectrum_settings settings;
+  std::string csv, plot;
+};
+
+const char *name_of(lumra::window window) {
+  return window == lumra::window::none ? "no window" : "flat top";
+}
+
+/// N when none was asked for: the largest power of two that fits, up to a size that suits a screen.
+std::int32_t fitting_size(std::uint64_t samples) {
+  std::int32_t size = default_fft_size;
+  while (size > 16 && static_cast<std::uint64_t>(size) > samples) size /= 2;
+  return size;
+}
+
+void write_csv(output_file &csv, const averaged_spectrum &spectrum, double centre) {
+  progress bar("Writing CSV");
+  csv.print("frequency_hz,level_dbfs\n");
+  const std::size_t bins = spectrum.power.size();
+  for (std::size_t k = 0; k < bins; ++k) {
+    csv.print("{},{:.4f}\n", centre + spectrum.offset(k), decibels(spectrum.power[k]));
+    if (k % 65536 == 0) bar.update(k, bins);
+  }
+}
+
+void print_summary(const spectrum_command &command, const recording &source, const averaged_spectrum &spectrum,
+                   std::size_t peak) {
+  const bool styled = ::isatty(STDOUT_FILENO) == 1;
+  const auto line = [&](const char *label, const std::string &text) {
+    fmt::print("{}{:<22}{}{}\n", styled ? "\033[1m" : "", label, styled ? "\033[0m" : "", text);
+  };
+  const double rbw = spectrum.resolution_bandwidth();
+  line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  line("Samples", fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
+  line("Sample rate", exact_text(source.rate));
+  line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
+  line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
+  line("Window",
+       fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window), spectrum.noise_bandwidth));
+  line("Averaged", fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
+  line("Resolution bandwidth",
+       fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
+  const double offset = spectrum.offset(peak);
+  const double centre = source.frequency.value_or(0);
+  if (spectrum.power[peak] > 0) {
+    line("Peak",
+         fmt::format("{:.2f} dBFS at {} (offset {})", decibels(spectrum.power[peak]),
+                     frequency_text(centre + offset, spectrum.df), offset_text(offset, spectrum.df, unit_for(offset))));
+  } else {
+    line("Peak", "none: all samples are zero");
+  }
+  if (!command.csv.empty()) line("CSV", command.csv);
+  if (!command.plot.empty()) line("Picture", command.plot);
+}
+
+void run(spectrum_command &command) {
+  const recording source = open_recording(command.path, command.options);
+  if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
+  if (command.settings.fft_size == 0) command.settings.fft_size = fitting_size(source.samples());
+
+  // Made first, so that an output that cannot be written is known before the work.
+  std::unique_ptr<output_file> csv, plot;
+  picture_type type = picture_type::png;
+  if (!command.csv.empty()) csv = std::make_unique<output_file>(command.csv, source.files);
+  if (!command.plot.empty()) {
+    type = picture_type_of(command.plot);
+    plot = std::make_unique<output_file>(command.plot, source.files);
+  }
+
+  const averaged_spectrum spectrum = average_spectrum(source, command.settings);
+  const auto peak =
+      static_cast<std::size_t>(std::max_element(spectrum.power.begin(), spectrum.power.end()) - spectrum.power.begin());
+  if (csv) write_csv(*csv, spectrum, source.frequency.value_or(0));
+  if (plot) {
+    const std::string settings =
+        fmt::format("N = {}  ·  {}  ·  {:g} % overlap  ·  {} averaged  ·  RBW {:.4g} {}", spectrum.power.size(),
+                    name_of(command.settings.window), command.settings.overlap_percent, spectrum.segments,
+                    spectrum.resolution_bandwidth() / unit_for(spectrum.resolution_bandwidth()).hertz,
+                    unit_for(spectrum.resolution_bandwidth()).name);
+    draw(spectrum_script(source, spectrum, peak, settings, type), type, *plot);
+  }
+  if (csv) csv->commit();
+  if (plot) plot->commit();
+  print_summary(command, source, spectrum, peak);
+}
+
+/// An option's value must satisfy `holds`; NaN satisfies nothing.
+template <class Holds>
+CLI::Validator number_where(const char *what, Holds holds) {
+  return {[=](std::string &text) {
+            double value = 0;
+            return CLI::detail::lexical_cast(text, value) && holds(value) ? std::string() : text + " is not " + what;
+          },
+          ""};
+}
+
+}  // namespace
+
+void add_spectrum(CLI::App &program) {
+  auto command = std::make_shared<spectrum_command>();
+  CLI::App *app = program.add_subcommand("spectrum", "Averaged power spectrum of a recording, in dB of full scale");
+  app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
+      ->required();
+  app->add_option("--fft", command->settings.fft_size, "FFT size N, 16 to 2^27 (default 4096, or less if it must fit)")
+      ->option_text("N")
+      ->check(CLI::Range(16, 1 << 27));
+  const std::map<std::string, lumra::window> windows{{"none", lumra::window::none},
+                                                     {"flattop", lumra::window::flat_top}};
+  app->add_option("--window", command->settings.window, "none or flattop (default)")
+      ->option_text("NAME")
+      ->transform(CLI::Transformer(windows))
+      ->transform(CLI::IsMember(windows));
+  app->add_option("--overlap", command->settings.overlap_percent, "Overlap of the segments (default 50)")
+      ->option_text("PERCENT")
+      ->check(number_where("at least 0 and below 100", [](double value) { return value >= 0 && value < 100; }));
+  app->add_option("--csv", command->csv, "Write frequency and level of every bin")->option_text("FILE");
+  app->add_option("--plot", command->plot, "Draw the spectrum")->option_text("FILE.png|.svg");
+  app->add_option("--rate", command->options.rate, "Sample rate; needed for raw files, overrides the metadata")
+      ->option_text("HZ")
+      ->check(number_where("a positive number", [](double value) { return value > 0 && std::isfinite(value); }));
+  app->add_option("--format", command->options.format,
+                  "Sample type (cf32, cf64, ci32, ci16, ci8, cu32, cu16, cu8; _le or _be); overrides the metadata")
+      ->option_text("NAME");
+  app->add_option("--capture", command->options.capture, "Use this capture of a SigMF recording alone, from 0")
+      ->option_text("INDEX");
+  // For tests: how much is read at a time must not change the result.
+  app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
+  app->callback([command] { run(*command); });
+}
+
+}  // namespace tool

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: MIT
+#include "spectrum_picture.hpp"
+
+#include <algorithm>
+#include <cmath>
+
+#include "units.hpp"
+
+namespace tool {
+namespace {
+
+/// Wider spectra are drawn as the largest level in each of this many columns.
+constexpr std::size_t columns = 1150;
+constexpr std::size_t most_points = 8 * columns;
+
+/// Level axis in whole divisions; room above the peak for its label.
+struct level_range {
+  double bottom, top, division;
+};
+
+level_range range_for(const std::vector<double> &levels) {
+  std::vector<double> sorted = levels;
+  // A few deep notches must not press the trace together.
+  const auto low = sorted.begin() + static_cast<std::ptrdiff_t>(sorted.size() / 200);
+  std::nth_element(sorted.begin(), low, sorted.end());
+  const double peak = *std::max_element(levels.begin(), levels.end());
+  const double bottom = std::max(*low - 2, peak - 190);
+  const double division = peak - bottom > 100 ? 20 : peak - bottom > 25 ? 10 : 5;
+  level_range range{division * std::floor(bottom / division), 0, division};
+  range.top = division * std::ceil(peak / division);
+  while (range.top - peak < 0.14 * (range.top - range.bottom)) range.top += division / 2;
+  return range;
+}
+
+}  // namespace
+
+std::string spectrum_script(const recording &source, const averaged_spectrum &spectrum, std::size_t peak,
+                            const std::string &settings, picture_type type) {
+  const std::size_t bins = spectrum.power.size();
+  const std::size_t points = bins > most_points ? columns : bins;
+  const frequency_unit unit = unit_for(source.rate / 2);
+  std::vector<double> levels(points);
+  std::string data;
+  for (std::size_t point = 0; point < points; ++point) {
+    const auto first = spectrum.power.begin() + static_cast<std::ptrdiff_t>(point * bins / points);
+    const auto last = spectrum.power.begin() + static_cast<std::ptrdiff_t>((point + 1) * bins / points);
+    const auto largest = std::max_element(first, last);
+    levels[point] = decibels(*largest);
+    fmt::format_to(std::back_inserter(data), "{:.9g} {:.3f}\n",
+                   spectrum.offset(static_cast<std::size_t>(largest - spectrum.power.begin())) / unit.hertz,
+                   levels[point]);
+  }
+  const level_range range = range_for(levels);
+
+  // Bins cover the band from edge to edge. The offset from the centre keeps tick labels short.
+  const double half = source.rate / 2 / unit.hertz;
+  const bool has_centre = source.frequency.value_or(0) != 0;
+  const std::string axis = has_centre ? fmt::format("Offset from {} ({})", exact_text(*source.frequency), unit.name)
+                                      : fmt::format("Frequency ({})", unit.name);
+
+  const double offset = spectrum.offset(peak);
+  const double level = decibels(spectrum.power[peak]);
+  const double x = offset / unit.hertz;
+  // Above the peak nothing is drawn; at the borders the label leans inwards.
+  const char *side = x < -0.8 * half ? "left" : x > 0.8 * half ? "right" : "center";
+  const std::string where = has_centre ? frequency_text(*source.frequency + offset, spectrum.df)
+                                       : offset_text(offset, spectrum.df, unit_for(offset));
+  const std::string label = fmt::format("{}   {:.2f} dBFS", where, level);
+
+  const std::string detector = points < bins ? fmt::format("  ·  highest of {:.0f} bins per column",
+                                                           std::round(static_cast<double>(bins) / columns))
+                                             : "";
+  const bool png = type == picture_type::png;
+  return picture_preamble(type) +
+         fmt::format(
+             "set title {} noenhanced offset 0,1.6 font 'DejaVu Sans Bold,{}'\n"
+             "set label 1 {} at graph 0.5,1.035 center noenhanced tc rgb '#505050'\n"
+             "set tmargin 5\nset rmargin 4\nset lmargin 10\nset bmargin 4.2\n"
+             "set border lw 1 lc rgb '#404040'\n"
+             "set xlabel {} noenhanced offset 0,-0.3\nset ylabel 'Level (dBFS)' offset -0.5,0\n"
+             "set xrange [{}:{}]\nset yrange [{}:{}]\n"
+             "set ytics {}\nset mxtics 2\nset mytics 2\nset tics scale 0.8,0.4\n"
+             "set grid xtics ytics mxtics mytics lw 0.8 lc rgb '#c8c8c8', lw 0.5 lc rgb '#ebebeb'\n"
+             "unset key\n",
+             gnuplot_text(source.name), png ? 14 : 19, gnuplot_text(settings + detector), gnuplot_text(axis), -half,
+             half, range.bottom, range.top, range.division) +
+         fmt::format(
+             "set label 2 {} at first {:.9g},{:.3f} {} offset {},1.5 noenhanced front tc rgb '#b02020'\n"
+             "$trace << end_of_trace\n{}end_of_trace\n"
+             "$peak << end_of_peak\n{:.9g} {:.3f}\nend_of_peak\n"
+             "plot $trace using 1:2 with lines lw 1 lc rgb '#1f4e8c', \\\n"
+             "  $peak using 1:2 with points pt 11 ps 1.3 lc rgb '#b02020'\n",
+             gnuplot_text(label), x, level, side, 0, data, x, level);
+}
+
+}  // namespace tool
