@@ -76,6 +76,8 @@ void print_summary(const spectrum_command &command, const recording &source, con
   } else {
     line("Peak", "none: all samples are zero");
   }
+  if (spectrum.power[peak] > 1.01)
+    line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
   if (!command.csv.empty()) line("CSV", command.csv);
   if (!command.plot.empty()) line("Picture", command.plot);
 }

@@ -32,6 +32,14 @@ level_range range_for(const std::vector<double> &levels) {
   return range;
 }
 
+/// Distance of the marks on an axis of this length: 1, 2 or 5 times a power of ten, ten to twenty of them.
+double mark_distance(double length) {
+  const double decade = std::pow(10, std::floor(std::log10(length / 10)));
+  for (const double step : {5.0, 2.0})
+    if (length / 10 >= step * decade) return step * decade;
+  return decade;
+}
+
 }  // namespace
 
 std::string spectrum_script(const recording &source, const averaged_spectrum &spectrum, std::size_t peak,
@@ -79,18 +87,18 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
              "set border lw 1 lc rgb '#404040'\n"
              "set xlabel {} noenhanced offset 0,-0.3\nset ylabel 'Level (dBFS)' offset -0.5,0\n"
              "set xrange [{}:{}]\nset yrange [{}:{}]\n"
-             "set ytics {}\nset mxtics 2\nset mytics 2\nset tics scale 0.8,0.4\n"
-             "set grid xtics ytics mxtics mytics lw 0.8 lc rgb '#c8c8c8', lw 0.5 lc rgb '#ebebeb'\n"
+             "set xtics {}\nset ytics {}\nset mytics 2\nset tics scale 0.8,0.4\nset minussign\n"
+             "set grid xtics ytics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
              "unset key\n",
              gnuplot_text(source.name), png ? 14 : 19, gnuplot_text(settings + detector), gnuplot_text(axis), -half,
-             half, range.bottom, range.top, range.division) +
+             half, range.bottom, range.top, mark_distance(2 * half), range.division) +
          fmt::format(
-             "set label 2 {} at first {:.9g},{:.3f} {} offset {},1.5 noenhanced front tc rgb '#b02020'\n"
+             "set label 2 {} at first {:.9g},{:.3f} {} offset 0,1.4 noenhanced front tc rgb '#b02020'\n"
              "$trace << end_of_trace\n{}end_of_trace\n"
              "$peak << end_of_peak\n{:.9g} {:.3f}\nend_of_peak\n"
-             "plot $trace using 1:2 with lines lw 1 lc rgb '#1f4e8c', \\\n"
+             "plot $trace using 1:2 with lines lw 1.2 lc rgb '#1f4e8c', \\\n"
              "  $peak using 1:2 with points pt 11 ps 1.3 lc rgb '#b02020'\n",
-             gnuplot_text(label), x, level, side, 0, data, x, level);
+             gnuplot_text(label), x, level, side, data, x, level);
 }
 
 }  // namespace tool

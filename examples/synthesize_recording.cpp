@@ -1,0 +1,181 @@
+// Synthesises what a receiver at 3.5 GHz might have recorded, as SigMF (ci16_le): an OFDM carrier beside a weak tone
+// and a burst over noise. The library's averaged spectrum sets the carrier's level.
+//
+//   synthesize_recording NAME       writes NAME.sigmf-data and NAME.sigmf-meta
+//
+// SPDX-License-Identifier: MIT
+#include <algorithm>
+#include <cmath>
+#include <complex>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <lumra/lumra.hpp>
+#include <nlohmann/json.hpp>
+#include <numbers>
+#include <random>
+#include <span>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace {
+
+using sample = std::complex<float>;
+
+constexpr double sample_rate = 30.72e6;     // Hz
+constexpr double centre_frequency = 3.5e9;  // Hz
+constexpr std::size_t length = 3'072'000;   // 0.1 s
+constexpr double noise_level = -55;         // dBFS in the whole band
+constexpr double carrier_level = -18;       // dBFS, mean power
+constexpr double carrier_offset = -5.5e6;   // Hz from the centre
+constexpr double tone_level = -66, tone_offset = 4.3e6;
+constexpr double burst_level = -38, burst_offset = 9.9e6;  // level while it is on
+constexpr double burst_symbol_rate = 1.28e6;               // Hz: 24 samples a symbol
+
+double power_of(double decibels) {
+  return std::pow(10, decibels / 10);
+}
+
+/// exp(j 2 pi f t) at sample n; the phase is reduced in double precision so that long records stay coherent.
+sample rotation(double frequency, std::size_t n) {
+  const double turns = frequency / sample_rate * static_cast<double>(n);
+  const double angle = 2 * std::numbers::pi * (turns - std::floor(turns));
+  return {static_cast<float>(std::cos(angle)), static_cast<float>(std::sin(angle))};
+}
+
+/// Inverse transform without scaling; the size is a power of two.
+void inverse_transform(std::span<sample> x) {
+  const std::size_t n = x.size();
+  for (std::size_t i = 1, j = 0; i < n; ++i) {
+    std::size_t bit = n / 2;
+    for (; j & bit; bit /= 2) j ^= bit;
+    j ^= bit;
+    if (i < j) std::swap(x[i], x[j]);
+  }
+  for (std::size_t half = 1; half < n; half *= 2)
+    for (std::size_t k = 0; k < half; ++k) {
+      const double angle = std::numbers::pi * static_cast<double>(k) / static_cast<double>(half);
+      const sample twiddle(static_cast<float>(std::cos(angle)), static_cast<float>(std::sin(angle)));
+      for (std::size_t i = k; i < n; i += 2 * half) {
+        const sample odd = x[i + half] * twiddle;
+        x[i + half] = x[i] - odd;
+        x[i] += odd;
+      }
+    }
+}
+
+/// 600 subcarriers of 15 kHz with 64-QAM, guard intervals, and symbols that fade into each other.
+void add_ofdm(std::span<sample> out, std::mt19937 &random) {
+  constexpr std::size_t size = 2048, used = 600, guard = 144, ramp = 64;
+  std::uniform_int_distribution<int> level(0, 7);
+  // Two paths 260 ns apart give the carrier the tilt and dip of a real channel.
+  const auto channel = [](double frequency) {
+    const double angle = -2 * std::numbers::pi * frequency * 260e-9 + 2.1;
+    return sample(1.0F + 0.45F * static_cast<float>(std::cos(angle)), 0.45F * static_cast<float>(std::sin(angle)));
+  };
+  // 42 is the mean power of the levels -7, -5 ... 7 in both components.
+  const auto scale = static_cast<float>(1 / std::sqrt(42.0 * used));
+  std::vector<sample> symbol(size);
+  for (std::size_t start = 0; start + size + guard + ramp <= out.size(); start += size + guard) {
+    std::fill(symbol.begin(), symbol.end(), sample{});
+    for (std::size_t k = 1; k <= used / 2; ++k)
+      for (const bool upper : {false, true}) {
+        const double frequency = (upper ? 1.0 : -1.0) * static_cast<double>(k) * sample_rate / size;
+        const sample point(static_cast<float>(2 * level(random) - 7), static_cast<float>(2 * level(random) - 7));
+        symbol[upper ? k : size - k] = point * channel(frequency) * scale;
+      }
+    inverse_transform(symbol);
+    for (std::size_t n = 0; n < size + guard + ramp; ++n) {
+      const std::size_t from_edge = std::min(n, size + guard + ramp - 1 - n);
+      const double phase = std::numbers::pi / 2 * (static_cast<double>(from_edge) + 0.5) / ramp;
+      const auto fade = from_edge < ramp ? static_cast<float>(std::sin(phase) * std::sin(phase)) : 1.0F;
+      out[start + n] += fade * symbol[(n + size - guard) % size];
+    }
+  }
+}
+
+/// QPSK with Hann-shaped pulses, one millisecond in every ten.
+void add_bursts(std::span<sample> out, std::mt19937 &random) {
+  constexpr auto per_symbol = static_cast<std::size_t>(sample_rate / burst_symbol_rate);
+  constexpr auto period = static_cast<std::size_t>(sample_rate / 100), on = period / 10;
+  const auto amplitude = static_cast<float>(std::sqrt(power_of(burst_level)));
+  std::uniform_int_distribution<int> quadrant(0, 3);
+  for (std::size_t burst = period / 3; burst + on + 2 * per_symbol < out.size(); burst += period)
+    for (std::size_t start = burst; start < burst + on; start += per_symbol) {
+      const sample point =
+          amplitude * std::polar(1.0F, static_cast<float>(std::numbers::pi / 4 * (2 * quadrant(random) + 1)));
+      for (std::size_t n = 0; n < 2 * per_symbol; ++n) {
+        const double x = std::sin(std::numbers::pi * static_cast<double>(n) / static_cast<double>(2 * per_symbol));
+        out[start + n] += point * static_cast<float>(x * x) * rotation(burst_offset, start + n);
+      }
+    }
+}
+
+/// Total power in dB of full scale, as the library's spectrum shows it: Parseval's sum over its bins.
+double measured_level(lumra::session &session, const lumra::host_array<sample> &samples) {
+  constexpr std::int32_t size = 4096;
+  session.initialize_window(lumra::window::none, size);
+  lumra::spectrum spectrum;
+  session.power_spectrum(lumra::window::none, size, 0, samples, 1 / sample_rate, spectrum);
+  double sum = 0;
+  for (const float power : spectrum.power.elements()) sum += power;
+  return 10 * std::log10(sum / (double{size} * size));
+}
+
+void write_recording(const std::string &name, std::span<const sample> samples) {
+  std::ofstream data(name + ".sigmf-data", std::ios::binary);
+  for (const sample &x : samples)
+    for (const float component : {x.real(), x.imag()}) {
+      const auto value = static_cast<std::uint16_t>(std::lround(std::clamp(component, -1.0F, 1.0F) * 32767.0F));
+      const char bytes[] = {static_cast<char>(value & 0xFF), static_cast<char>(value >> 8)};
+      data.write(bytes, sizeof bytes);
+    }
+  const nlohmann::json meta = {{"global",
+                                {{"core:datatype", "ci16_le"},
+                                 {"core:sample_rate", sample_rate},
+                                 {"core:version", "1.0.0"},
+                                 {"core:description", "Synthetic: OFDM carrier, weak tone and burst over noise"}}},
+                               {"captures", {{{"core:sample_start", 0}, {"core:frequency", centre_frequency}}}},
+                               {"annotations", nlohmann::json::array()}};
+  std::ofstream text(name + ".sigmf-meta");
+  text << meta.dump(2) << '\n';
+  if (!data.flush() || !text.flush()) throw std::runtime_error("cannot write " + name + ".sigmf-data and -meta");
+}
+
+void synthesize(const std::string &name) {
+  std::mt19937 random(20);  // the same recording every time
+  lumra::session session;
+  lumra::host_array<sample> samples(length);
+  const std::span<sample> x = samples.elements();
+
+  add_ofdm(x, random);
+  const auto gain = static_cast<float>(std::sqrt(power_of(carrier_level - measured_level(session, samples))));
+  for (std::size_t n = 0; n < x.size(); ++n) x[n] *= gain * rotation(carrier_offset, n);
+  add_bursts(x, random);
+  const auto tone = static_cast<float>(std::sqrt(power_of(tone_level)));
+  std::normal_distribution<float> noise(0.0F, static_cast<float>(std::sqrt(power_of(noise_level) / 2)));
+  for (std::size_t n = 0; n < x.size(); ++n)
+    x[n] += tone * rotation(tone_offset, n) + sample(noise(random), noise(random));
+
+  write_recording(name, x);
+  std::printf("%s.sigmf-meta: %zu samples at %.2f MHz, %.2f dBFS in all\n", name.c_str(), x.size(), sample_rate / 1e6,
+              measured_level(session, samples));
+}
+
+}  // namespace
+
+int main(int count, char **arguments) {
+  if (count != 2) {
+    (void)std::fputs("usage: synthesize_recording NAME\n", stderr);
+    return 2;
+  }
+  try {
+    synthesize(arguments[1]);
+    return EXIT_SUCCESS;
+  } catch (const std::exception &error) {
+    (void)std::fprintf(stderr, "synthesize_recording: %s\n", error.what());
+    return EXIT_FAILURE;
+  }
+}
