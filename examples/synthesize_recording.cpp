@@ -70,9 +70,9 @@ void inverse_transform(std::span<sample> x) {
 void add_ofdm(std::span<sample> out, std::mt19937 &random) {
   constexpr std::size_t size = 2048, used = 600, guard = 144, ramp = 64;
   std::uniform_int_distribution<int> level(0, 7);
-  // Two paths 260 ns apart give the carrier the tilt and dip of a real channel.
+  // Two paths 130 ns apart give the carrier the tilt and dip of a real channel.
   const auto channel = [](double frequency) {
-    const double angle = -2 * std::numbers::pi * frequency * 260e-9 + 2.1;
+    const double angle = -2 * std::numbers::pi * frequency * 130e-9 + 2.1;
     return sample(1.0F + 0.45F * static_cast<float>(std::cos(angle)), 0.45F * static_cast<float>(std::sin(angle)));
   };
   // 42 is the mean power of the levels -7, -5 ... 7 in both components.

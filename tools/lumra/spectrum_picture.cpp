@@ -73,7 +73,8 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
   const char *side = x < -0.8 * half ? "left" : x > 0.8 * half ? "right" : "center";
   const std::string where = has_centre ? frequency_text(*source.frequency + offset, spectrum.df)
                                        : offset_text(offset, spectrum.df, unit_for(offset));
-  const std::string label = fmt::format("{}   {:.2f} dBFS", where, level);
+  std::string label = fmt::format("{}   {:.2f} dBFS", where, level);
+  for (std::size_t at = 0; (at = label.find('-', at)) != std::string::npos;) label.replace(at, 1, "−");
 
   const std::string detector = points < bins ? fmt::format("  ·  highest of {:.0f} bins per column",
                                                            std::round(static_cast<double>(bins) / columns))
