@@ -1,11 +1,13 @@
 // Runs the program lumra in a folder of its own, as a user would. SPDX-License-Identifier: MIT
 #pragma once
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <csignal>
 #include <cstdint>
 #include <cstdlib>
@@ -41,6 +43,7 @@ class ProgramTest : public testing::Test {
     std::vector<std::string> all{LUMRA_PROGRAM};
     all.insert(all.end(), arguments.begin(), arguments.end());
     std::vector<char *> argv;
+    argv.reserve(all.size() + 1);
     for (std::string &argument : all) argv.push_back(argument.data());
     argv.push_back(nullptr);
     const std::string out = logs_ + "out", err = logs_ + "err";

@@ -1,6 +1,4 @@
 // lumra spectrum, from files to files. SPDX-License-Identifier: MIT
-#include <fcntl.h>
-
 #include <algorithm>
 #include <chrono>
 #include <cmath>
@@ -58,6 +56,7 @@ std::string with_type(const std::string &type, const samples &x) {
   return encode<std::uint32_t>(x, big, rounded(2147483647.5, 2147483647.5));
 }
 
+constexpr std::size_t width = 8;  // of a cf32 sample
 std::string as_cf32(const samples &x) {
   return with_type("cf32", x);
 }
@@ -170,7 +169,7 @@ TEST_F(Spectrum, HonoursWhatTheMetadataSay) {
       {"header", "", R"({"core:sample_start": 0, "core:header_bytes": 40})", junk + bytes},
       {"header before each capture", "",
        R"({"core:sample_start": 0, "core:header_bytes": 40}, {"core:sample_start": 333, "core:header_bytes": 7})",
-       junk + bytes.substr(0, 333 * 8) + junk.substr(0, 7) + bytes.substr(333 * 8)},
+       junk + bytes.substr(0, 333 * width) + junk.substr(0, 7) + bytes.substr(333 * width)},
       {"trailing bytes", R"(, "core:trailing_bytes": 40)", "", bytes + junk},
       {"offset", R"(, "core:offset": 5000)",
        R"({"core:sample_start": 5000, "core:global_index": 9}, {"core:sample_start": 5100, "core:global_index": 109})",
@@ -187,7 +186,7 @@ TEST_F(Spectrum, HonoursWhatTheMetadataSay) {
   expect_equal(plain, spectrum({"y", "--fft", "64"}), 0);
   write("z.sigmf-meta", metadata("", R"({"core:sample_start": 0, "core:frequency": 5},
                                         {"core:sample_start": 40, "core:frequency": 0})"));
-  write("z.sigmf-data", bytes.substr(0, 40 * 8) + bytes);
+  write("z.sigmf-data", bytes.substr(0, 40 * width) + bytes);
   expect_equal(plain, spectrum({"z", "--fft", "64", "--capture", "1"}), 0);
 }
 
@@ -197,7 +196,7 @@ TEST_F(Spectrum, RefusesBadInputInOneLine) {
   write("cut.cf32", bytes.substr(0, 99));
   write("x.bin", bytes);
   write("empty.cf32", "");
-  write("nan.cf32", bytes.substr(0, 80 * 8) + std::string(160, '\xFF'));
+  write("nan.cf32", bytes.substr(0, 80 * width) + std::string(160, '\xFF'));
   write("huge.cf64", encode<double>(samples(64, 1e300), false, [](double v) { return v; }));
   write("large.cf32", as_cf32(samples(64, 1e30)));
   const auto sigmf = [&](const std::string &name, const std::string &meta) {
@@ -206,6 +205,7 @@ TEST_F(Spectrum, RefusesBadInputInOneLine) {
   };
   sigmf("broken", "{\"global\": ");
   sigmf("list", "[]");
+  sigmf("overflow", R"({"global": {"core:sample_rate": 1e999}})");
   sigmf("norate", R"({"global": {"core:datatype": "cf32_le"}})");
   sigmf("notype", R"({"global": {"core:sample_rate": 1}})");
   sigmf("real", R"({"global": {"core:datatype": "rf32_le", "core:sample_rate": 1}})");
@@ -242,6 +242,7 @@ TEST_F(Spectrum, RefusesBadInputInOneLine) {
       {1, "too large", {"large.cf32", "--rate", "1"}},
       {1, "not valid JSON", {"broken"}},
       {1, "no global", {"list"}},
+      {1, "out of range", {"overflow"}},
       {1, "--rate HZ", {"norate"}},
       {1, "--format", {"notype"}},
       {1, "are real", {"real"}},

@@ -1,8 +1,10 @@
 // The command-line program lumra. Exit codes: 0 done; 1 bad input or failed work, with one line that says what to do;
 // 2 wrong usage; a signal's own when interrupted. SPDX-License-Identifier: MIT
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <new>
+#include <string>
 #include <system_error>
 
 #include <lumra/lumra.hpp>
@@ -12,7 +14,8 @@
 
 namespace {
 
-int fail(int code, const std::string &text) {
+int fail(int code, std::string text) {
+  std::replace(text.begin(), text.end(), '\n', ' ');  // names of files may hold anything
   fmt::print(stderr, "lumra: {}\n", text);
   return code;
 }
@@ -20,6 +23,7 @@ int fail(int code, const std::string &text) {
 int run(int count, char **arguments) {
   CLI::App program("Spectra of recorded radio signals", "lumra");
   program.require_subcommand(1);
+  program.set_version_flag("--version", "lumra " + lumra::library().version_text);
   tool::add_spectrum(program);
   tool::add_info(program);
   try {

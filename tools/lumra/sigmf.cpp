@@ -71,6 +71,8 @@ json parse(const fs::path &meta) {
     return json::parse(file);
   } catch (const json::parse_error &error) {
     throw failure("{}: not valid JSON near byte {}; is this the metadata file?", meta.string(), error.byte);
+  } catch (const json::exception &) {
+    throw failure("{}: a number is out of range; correct the metadata", meta.string());
   }
 }
 

@@ -82,13 +82,14 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
   const bool png = type == picture_type::png;
   return picture_preamble(type) +
          fmt::format(
-             "set title {} noenhanced offset 0,1.6 font 'DejaVu Sans Bold,{}'\n"
+             "set title {} noenhanced offset 0,1.6 font 'DejaVu Sans:Bold,{}'\n"
              "set label 1 {} at graph 0.5,1.035 center noenhanced tc rgb '#505050'\n"
              "set tmargin 5\nset rmargin 4\nset lmargin 10\nset bmargin 4.2\n"
              "set border lw 1 lc rgb '#404040'\n"
              "set xlabel {} noenhanced offset 0,-0.3\nset ylabel 'Level (dBFS)' offset -0.5,0\n"
              "set xrange [{}:{}]\nset yrange [{}:{}]\n"
-             "set xtics {}\nset ytics {}\nset mytics 2\nset tics scale 0.8,0.4\nset minussign\n"
+             "set xtics {}\nset ytics {}\nset mytics 2\nset tics scale 0.8,0.4\nset minussign\nset format x '%h'\nset "
+             "format y '%h'\n"
              "set grid xtics ytics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
              "unset key\n",
              gnuplot_text(source.name), png ? 14 : 19, gnuplot_text(settings + detector), gnuplot_text(axis), -half,
@@ -98,8 +99,8 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
              "$trace << end_of_trace\n{}end_of_trace\n"
              "$peak << end_of_peak\n{:.9g} {:.3f}\nend_of_peak\n"
              "plot $trace using 1:2 with lines lw 1.2 lc rgb '#1f4e8c', \\\n"
-             "  $peak using 1:2 with points pt 11 ps 1.3 lc rgb '#b02020'\n",
-             gnuplot_text(label), x, level, side, data, x, level);
+             "  $peak using 1:($2 + {:.3f}) with points pt 11 ps 1.3 lc rgb '#b02020'\n",
+             gnuplot_text(label), x, level, side, data, x, level, 0.011 * (range.top - range.bottom));
 }
 
 }  // namespace tool
