@@ -100,8 +100,8 @@ std::string picture_preamble(picture_type type) {
   const bool png = type == picture_type::png;
   return fmt::format(
       "set encoding utf8\n"
-      "set terminal {} size {},{} font 'DejaVu Sans,{}' background rgb 'white'\n",
-      png ? "pngcairo" : "svg dynamic", picture_width, picture_height, png ? 12 : 16);
+      "set terminal {} size {},{} font '{}' background rgb 'white'\n",
+      png ? "pngcairo" : "svg dynamic", picture_width, picture_height, png ? "DejaVu Sans,12" : "sans-serif,16");
 }
 
 std::string gnuplot_text(std::string_view text) {

@@ -69,13 +69,10 @@ void print_summary(const spectrum_command &command, const recording &source, con
        fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
   const double offset = spectrum.offset(peak);
   const double centre = source.frequency.value_or(0);
-  if (spectrum.power[peak] > 0) {
-    line("Peak",
-         fmt::format("{:.2f} dBFS at {} (offset {})", decibels(spectrum.power[peak]),
-                     frequency_text(centre + offset, spectrum.df), offset_text(offset, spectrum.df, unit_for(offset))));
-  } else {
-    line("Peak", "none: all samples are zero");
-  }
+  std::string where = frequency_text(centre + offset, spectrum.df);
+  if (source.frequency) where += fmt::format(" (offset {})", offset_text(offset, spectrum.df, unit_for(offset)));
+  line("Peak", spectrum.power[peak] > 0 ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
+                                        : "none: all samples are zero");
   if (spectrum.power[peak] > 1.01)
     line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
   if (!command.csv.empty()) line("CSV", command.csv);

@@ -70,9 +70,9 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
   const double level = decibels(spectrum.power[peak]);
   const double x = offset / unit.hertz;
   // Above the peak nothing is drawn; at the borders the label leans inwards.
-  const char *side = x < -0.8 * half ? "left" : x > 0.8 * half ? "right" : "center";
-  const std::string where = has_centre ? frequency_text(*source.frequency + offset, spectrum.df)
-                                       : offset_text(offset, spectrum.df, unit_for(offset));
+  const int lean = x < -0.8 * half ? 1 : x > 0.8 * half ? -1 : 0;
+  const char *side = lean > 0 ? "left" : lean < 0 ? "right" : "center";
+  const std::string where = frequency_text(source.frequency.value_or(0) + offset, spectrum.df);
   std::string label = fmt::format("{}   {:.2f} dBFS", where, level);
   for (std::size_t at = 0; (at = label.find('-', at)) != std::string::npos;) label.replace(at, 1, "−");
 
@@ -82,7 +82,7 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
   const bool png = type == picture_type::png;
   return picture_preamble(type) +
          fmt::format(
-             "set title {} noenhanced offset 0,1.6 font 'DejaVu Sans:Bold,{}'\n"
+             "set title {} noenhanced offset 0,1.6 font '{}'\n"
              "set label 1 {} at graph 0.5,1.035 center noenhanced tc rgb '#505050'\n"
              "set tmargin 5\nset rmargin 4\nset lmargin 10\nset bmargin 4.2\n"
              "set border lw 1 lc rgb '#404040'\n"
@@ -92,15 +92,16 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
              "format y '%h'\n"
              "set grid xtics ytics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
              "unset key\n",
-             gnuplot_text(source.name), png ? 14 : 19, gnuplot_text(settings + detector), gnuplot_text(axis), -half,
-             half, range.bottom, range.top, mark_distance(2 * half), range.division) +
+             gnuplot_text(source.name), png ? "DejaVu Sans:Bold,14" : "sans-serif,20",
+             gnuplot_text(settings + detector), gnuplot_text(axis), -half, half, range.bottom, range.top,
+             mark_distance(2 * half), range.division) +
          fmt::format(
-             "set label 2 {} at first {:.9g},{:.3f} {} offset 0,1.4 noenhanced front tc rgb '#b02020'\n"
+             "set label 2 {} at first {:.9g},{:.3f} {} offset {},1.4 noenhanced front tc rgb '#b02020'\n"
              "$trace << end_of_trace\n{}end_of_trace\n"
              "$peak << end_of_peak\n{:.9g} {:.3f}\nend_of_peak\n"
              "plot $trace using 1:2 with lines lw 1.2 lc rgb '#1f4e8c', \\\n"
              "  $peak using 1:($2 + {:.3f}) with points pt 11 ps 1.3 lc rgb '#b02020'\n",
-             gnuplot_text(label), x, level, side, data, x, level, 0.011 * (range.top - range.bottom));
+             gnuplot_text(label), x, level, side, lean, data, x, level, 0.011 * (range.top - range.bottom));
 }
 
 }  // namespace tool
