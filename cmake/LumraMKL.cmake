@@ -54,7 +54,7 @@ endif()
 
 # The version that lumra/version.h names.
 find_path(LUMRA_MKL_VERSION_DIR mkl_version.h PATHS ${LUMRA_MKL_INCLUDE} ${MKL_INCLUDE} REQUIRED)
-file(STRINGS ${LUMRA_MKL_VERSION_DIR}/mkl_version.h mkl_version_lines REGEX "define __INTEL_MKL_(_|_MINOR__|_UPDATE__)")
+file(STRINGS ${LUMRA_MKL_VERSION_DIR}/mkl_version.h mkl_version_lines REGEX "define __INTEL_MKL_(_|MINOR__|UPDATE__) ")
 list(JOIN mkl_version_lines " " mkl_version_lines)
 string(REGEX MATCHALL "[0-9]+" mkl_version_numbers "${mkl_version_lines}")
 list(JOIN mkl_version_numbers "." LUMRA_MKL_VERSION)
