@@ -3,10 +3,12 @@
 #define LUMRA_LUMRA_H
 
 #include <lumra/core_services.h>
+#include <lumra/error_vector.h>
 #include <lumra/host_array.h>
 #include <lumra/library_info.h>
 #include <lumra/session.h>
 #include <lumra/status.h>
+#include <lumra/vector_utilities.h>
 #include <lumra/version.h>
 
 #endif

@@ -2,7 +2,10 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdint>
+#include <span>
 
 #include "host/host_array.hpp"
 
@@ -26,6 +29,25 @@ bool resize_vector(Block ***handle_address, std::int32_t count, std::uint64_t ho
   if (!has_block(handle)) return false;
   (*handle)->count = count;
   return true;
+}
+
+/// Sizes an output that shrinks in place: one with room for `count` elements only gets the count, any other is resized,
+/// with the size argument in bytes. Returns what may be written: `count` elements, or where the resize was refused as
+/// many of them as there were before.
+template <class Block>
+std::span<element_of<Block>> size_output(Block ***handle_address, std::size_t count) noexcept {
+  const auto wanted = static_cast<std::int32_t>(count);
+  Block **&handle = *handle_address;
+  if (has_block(handle) && wanted <= (*handle)->count) {
+    (*handle)->count = wanted;
+  } else {
+    try {
+      (void)resize_vector(handle_address, wanted, count * sizeof(element_of<Block>));
+    } catch (...) {  // a host's service that throws has refused
+    }
+  }
+  const std::span<element_of<Block>> room = elements(handle);
+  return room.first(std::min(count, room.size()));
 }
 
 }  // namespace host

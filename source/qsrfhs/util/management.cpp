@@ -5,10 +5,12 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <exception>
 
 #include "platform/immortal.hpp"
 #include "platform/processor.hpp"
+#include "platform/thread.hpp"
 
 namespace qsrfhs {
 namespace {
@@ -26,7 +28,15 @@ Management &Management::instance() noexcept {
   return management.get();
 }
 
-Management::Management() : cpu_count_(std::min(platform::processor_count(), max_cpus)) {}
+Management::Management() : cpu_count_(std::min(platform::processor_count(), max_cpus)) {
+  (void)std::atexit([] { instance().scheduler_.stop(); });
+  // A child of a fork finds the lock free, the list whole and the teams not started.
+  platform::at_fork([] { instance().mutex_.lock(); }, [] { instance().mutex_.unlock(); },
+                    [] {
+                      instance().scheduler_.forget_threads();
+                      instance().mutex_.unlock();
+                    });
+}
 
 std::int32_t Management::addError(std::int32_t code) noexcept {
   instance().add(code);

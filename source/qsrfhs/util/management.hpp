@@ -1,10 +1,12 @@
-// The process-wide list of failure codes. SPDX-License-Identifier: MIT
+// The process-wide list of failure codes, and the threads for parallel element loops. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstdint>
 #include <list>
 #include <mutex>
 #include <span>
+
+#include "qsrfhs/util/batch_scheduler.hpp"
 
 namespace qsrfhs {
 
@@ -17,6 +19,13 @@ class Management {
   /// Records a code in the process's list and returns it, so that exports end in `return Management::addError(code)`.
   static std::int32_t addError(std::int32_t code) noexcept;
 
+  /// Runs task records on the library's own threads; see batch_scheduler.
+  std::int32_t RunBatch(batch_scheduler::worker work, void *records, std::uint32_t count, std::size_t record_size,
+                        std::int32_t mode) {
+    return scheduler_.RunBatch(work, records, count, record_size, mode);
+  }
+
+  /// Only instance() makes one.
   Management();
   [[nodiscard]] std::int32_t cpu_count() const noexcept { return cpu_count_; }
   [[nodiscard]] std::uint64_t error_count() const;
@@ -29,6 +38,7 @@ class Management {
   const std::int32_t cpu_count_;
   mutable std::mutex mutex_;
   std::list<std::int32_t> errors_;  // under mutex_; only grows, and takes no memory while empty
+  batch_scheduler scheduler_{mutex_, cpu_count_, &addError};
 };
 
 }  // namespace qsrfhs

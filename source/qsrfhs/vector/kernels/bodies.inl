@@ -1,6 +1,13 @@
 // Every kernel body, and the table that names them. Bodies include nothing, call no library function and have no
 // static state: they are compiled inside a target region. SPDX-License-Identifier: MIT
 
+#include "element_wise.inl"
+//
+#include "complex.inl"
+#include "log2.inl"
+#include "lookup.inl"
+#include "polynomial.inl"
+#include "rms.inl"
 #include "spectrum.inl"
 
 static constexpr kernel_table table = {
@@ -10,4 +17,17 @@ static constexpr kernel_table table = {
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
     .order_power = &order_power,
     .scale = &scale,
+    .divide = &divide,
+    .divide_by_value = &divide_by_value,
+    .magnitude = &magnitude,
+    .magnitude_squared = &magnitude_squared,
+    .polynomial_reach = &polynomial_reach,
+    .polynomial = &polynomial,
+    .complex_polynomial = &complex_polynomial,
+    .log2_scaled = &log2_scaled,
+    .log2_scaled_or_infinity = &log2_scaled_or_infinity,
+    .log2_scaled_power = &log2_scaled_power,
+    .sum_power = &sum_power,
+    .sum_power_and_peak = &sum_power_and_peak,
+    .lookup = &lookup,
 };

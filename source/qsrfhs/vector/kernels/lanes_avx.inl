@@ -4,6 +4,11 @@ struct f8 {
   __m256 v;
 };
 
+// Where the builds differ on purpose; what follows from it is told where it is used.
+static constexpr std::size_t polynomial_coefficients = 32;
+static constexpr std::size_t polynomial_boundary = 32;
+static constexpr bool peak_sums_in_lanes = true;
+
 static inline f8 load(const float *p) {
   return {_mm256_loadu_ps(p)};
 }
@@ -13,11 +18,63 @@ static inline void store(float *p, f8 a) {
 static inline f8 broadcast(float a) {
   return {_mm256_set1_ps(a)};
 }
+/// Eight times the float with these bits.
+static inline f8 broadcast_bits(int bits) {
+  return {_mm256_castsi256_ps(_mm256_set1_epi32(bits))};
+}
+/// Stores past the caches; p lies on a boundary of 32 bytes.
+static inline void stream(float *p, f8 a) {
+  _mm256_stream_ps(p, a.v);
+}
 static inline f8 operator+(f8 a, f8 b) {
   return {_mm256_add_ps(a.v, b.v)};
 }
+static inline f8 operator-(f8 a, f8 b) {
+  return {_mm256_sub_ps(a.v, b.v)};
+}
 static inline f8 operator*(f8 a, f8 b) {
   return {_mm256_mul_ps(a.v, b.v)};
+}
+static inline f8 operator/(f8 a, f8 b) {
+  return {_mm256_div_ps(a.v, b.v)};
+}
+static inline f8 square_root(f8 a) {
+  return {_mm256_sqrt_ps(a.v)};
+}
+/// a > b ? a : b, so b where one of them is a NaN.
+static inline f8 greater_of(f8 a, f8 b) {
+  return {_mm256_max_ps(a.v, b.v)};
+}
+
+// Comparisons give lanes of all ones or all zeros; a NaN compares false.
+static inline f8 operator>=(f8 a, f8 b) {
+  return {_mm256_cmp_ps(a.v, b.v, _CMP_GE_OS)};
+}
+static inline f8 operator==(f8 a, f8 b) {
+  return {_mm256_cmp_ps(a.v, b.v, _CMP_EQ_OQ)};
+}
+static inline f8 operator&(f8 a, f8 b) {
+  return {_mm256_and_ps(a.v, b.v)};
+}
+static inline f8 operator|(f8 a, f8 b) {
+  return {_mm256_or_ps(a.v, b.v)};
+}
+/// b without the bits of a.
+static inline f8 clear(f8 a, f8 b) {
+  return {_mm256_andnot_ps(a.v, b.v)};
+}
+static inline f8 select(f8 mask, f8 a, f8 b) {
+  return {_mm256_blendv_ps(b.v, a.v, mask.v)};
+}
+
+/// Bits of the integers that the lanes give when cut towards zero; the most negative integer for a NaN and for what
+/// does not fit.
+static inline f8 to_integers(f8 a) {
+  return {_mm256_castsi256_ps(_mm256_cvttps_epi32(a.v))};
+}
+/// Values of lanes that hold the bits of integers.
+static inline f8 from_integers(f8 a) {
+  return {_mm256_cvtepi32_ps(_mm256_castps_si256(a.v))};
 }
 
 /// Eight complex values in a and b (four each) to eight real and eight imaginary parts, in the order 0 1 4 5 2 3 6 7.
@@ -38,4 +95,43 @@ static inline f8 order_lanes(f8 a) {
 static inline f8 load_twice(const float *p) {
   const __m256 both = _mm256_broadcast_ps(reinterpret_cast<const __m128 *>(p));
   return {_mm256_permutevar_ps(both, _mm256_setr_epi32(0, 0, 1, 1, 2, 2, 3, 3))};
+}
+
+/// As split, in the order 0 1 4 5 2 3 6 7; join_in_lanes takes it back.
+static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
+  re = {_mm256_shuffle_ps(a.v, b.v, 0x88)};
+  im = {_mm256_shuffle_ps(a.v, b.v, 0xdd)};
+}
+static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
+  a = {_mm256_unpacklo_ps(re.v, im.v)};
+  b = {_mm256_unpackhi_ps(re.v, im.v)};
+}
+
+static inline __m256 load_halves(const float *low, const float *high) {
+  return _mm256_insertf128_ps(_mm256_castps128_ps256(_mm_loadu_ps(low)), _mm_loadu_ps(high), 1);
+}
+
+/// Eight complex values, to eight real and eight imaginary parts in their order.
+static inline void load_complex(const float *p, f8 &re, f8 &im) {
+  const __m256 low = load_halves(p, p + 8), high = load_halves(p + 4, p + 12);
+  re = {_mm256_shuffle_ps(low, high, 0x88)};
+  im = {_mm256_shuffle_ps(low, high, 0xdd)};
+}
+static inline void store_complex(float *p, f8 re, f8 im) {
+  const __m256 low = _mm256_unpacklo_ps(re.v, im.v), high = _mm256_unpackhi_ps(re.v, im.v);
+  _mm256_storeu_ps(p, _mm256_permute2f128_ps(low, high, 0x20));
+  _mm256_storeu_ps(p + 8, _mm256_permute2f128_ps(low, high, 0x31));
+}
+
+/// Rows of four floats by index, turned into four columns.
+static inline void load_columns(const float *rows, const int *index, f8 *columns) {
+  const auto row = [=](int i) { return rows + 4 * static_cast<std::size_t>(index[i]); };
+  const __m256 r0 = load_halves(row(0), row(4)), r1 = load_halves(row(1), row(5));
+  const __m256 r2 = load_halves(row(2), row(6)), r3 = load_halves(row(3), row(7));
+  const __m256d a = _mm256_castps_pd(_mm256_unpacklo_ps(r0, r1)), b = _mm256_castps_pd(_mm256_unpacklo_ps(r2, r3));
+  const __m256d c = _mm256_castps_pd(_mm256_unpackhi_ps(r0, r1)), d = _mm256_castps_pd(_mm256_unpackhi_ps(r2, r3));
+  columns[0] = {_mm256_castpd_ps(_mm256_unpacklo_pd(a, b))};
+  columns[1] = {_mm256_castpd_ps(_mm256_unpackhi_pd(a, b))};
+  columns[2] = {_mm256_castpd_ps(_mm256_unpacklo_pd(c, d))};
+  columns[3] = {_mm256_castpd_ps(_mm256_unpackhi_pd(c, d))};
 }

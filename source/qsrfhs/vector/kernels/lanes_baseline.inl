@@ -4,6 +4,11 @@ struct f8 {
   __m128 low, high;
 };
 
+// Where the builds differ on purpose; what follows from it is told where it is used.
+static constexpr std::size_t polynomial_coefficients = 16;
+static constexpr std::size_t polynomial_boundary = 0;
+static constexpr bool peak_sums_in_lanes = false;
+
 static inline f8 load(const float *p) {
   return {_mm_loadu_ps(p), _mm_loadu_ps(p + 4)};
 }
@@ -14,11 +19,65 @@ static inline void store(float *p, f8 a) {
 static inline f8 broadcast(float a) {
   return {_mm_set1_ps(a), _mm_set1_ps(a)};
 }
+/// Eight times the float with these bits.
+static inline f8 broadcast_bits(int bits) {
+  const __m128 four = _mm_castsi128_ps(_mm_set1_epi32(bits));
+  return {four, four};
+}
+/// Stores past the caches; p lies on a boundary of 32 bytes.
+static inline void stream(float *p, f8 a) {
+  _mm_stream_ps(p, a.low);
+  _mm_stream_ps(p + 4, a.high);
+}
 static inline f8 operator+(f8 a, f8 b) {
   return {_mm_add_ps(a.low, b.low), _mm_add_ps(a.high, b.high)};
 }
+static inline f8 operator-(f8 a, f8 b) {
+  return {_mm_sub_ps(a.low, b.low), _mm_sub_ps(a.high, b.high)};
+}
 static inline f8 operator*(f8 a, f8 b) {
   return {_mm_mul_ps(a.low, b.low), _mm_mul_ps(a.high, b.high)};
+}
+static inline f8 operator/(f8 a, f8 b) {
+  return {_mm_div_ps(a.low, b.low), _mm_div_ps(a.high, b.high)};
+}
+static inline f8 square_root(f8 a) {
+  return {_mm_sqrt_ps(a.low), _mm_sqrt_ps(a.high)};
+}
+/// a > b ? a : b, so b where one of them is a NaN.
+static inline f8 greater_of(f8 a, f8 b) {
+  return {_mm_max_ps(a.low, b.low), _mm_max_ps(a.high, b.high)};
+}
+
+// Comparisons give lanes of all ones or all zeros; a NaN compares false.
+static inline f8 operator>=(f8 a, f8 b) {
+  return {_mm_cmpge_ps(a.low, b.low), _mm_cmpge_ps(a.high, b.high)};
+}
+static inline f8 operator==(f8 a, f8 b) {
+  return {_mm_cmpeq_ps(a.low, b.low), _mm_cmpeq_ps(a.high, b.high)};
+}
+static inline f8 operator&(f8 a, f8 b) {
+  return {_mm_and_ps(a.low, b.low), _mm_and_ps(a.high, b.high)};
+}
+static inline f8 operator|(f8 a, f8 b) {
+  return {_mm_or_ps(a.low, b.low), _mm_or_ps(a.high, b.high)};
+}
+/// b without the bits of a.
+static inline f8 clear(f8 a, f8 b) {
+  return {_mm_andnot_ps(a.low, b.low), _mm_andnot_ps(a.high, b.high)};
+}
+static inline f8 select(f8 mask, f8 a, f8 b) {
+  return (mask & a) | clear(mask, b);
+}
+
+/// Bits of the integers that the lanes give when cut towards zero; the most negative integer for a NaN and for what
+/// does not fit.
+static inline f8 to_integers(f8 a) {
+  return {_mm_castsi128_ps(_mm_cvttps_epi32(a.low)), _mm_castsi128_ps(_mm_cvttps_epi32(a.high))};
+}
+/// Values of lanes that hold the bits of integers.
+static inline f8 from_integers(f8 a) {
+  return {_mm_cvtepi32_ps(_mm_castps_si128(a.low)), _mm_cvtepi32_ps(_mm_castps_si128(a.high))};
 }
 
 /// Eight complex values in a and b (four each) to eight real and eight imaginary parts, in the order 0 to 7.
@@ -36,4 +95,45 @@ static inline f8 order_lanes(f8 a) {
 static inline f8 load_twice(const float *p) {
   const __m128 a = _mm_loadu_ps(p);
   return {_mm_unpacklo_ps(a, a), _mm_unpackhi_ps(a, a)};
+}
+
+/// As split, in the order 0 to 7; join_in_lanes takes it back.
+static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
+  re = {_mm_shuffle_ps(a.low, a.high, 0x88), _mm_shuffle_ps(b.low, b.high, 0x88)};
+  im = {_mm_shuffle_ps(a.low, a.high, 0xdd), _mm_shuffle_ps(b.low, b.high, 0xdd)};
+}
+static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
+  a = {_mm_unpacklo_ps(re.low, im.low), _mm_unpackhi_ps(re.low, im.low)};
+  b = {_mm_unpacklo_ps(re.high, im.high), _mm_unpackhi_ps(re.high, im.high)};
+}
+
+/// Eight complex values, to eight real and eight imaginary parts in their order.
+static inline void load_complex(const float *p, f8 &re, f8 &im) {
+  split_in_lanes(load(p), load(p + 8), re, im);
+}
+static inline void store_complex(float *p, f8 re, f8 im) {
+  f8 a, b;
+  join_in_lanes(re, im, a, b);
+  store(p, a);
+  store(p + 8, b);
+}
+
+/// Four rows of four floats by index, turned into columns.
+static inline void load_four_columns(const float *rows, const int *index, __m128 *columns) {
+  const auto row = [=](int i) { return _mm_loadu_ps(rows + 4 * static_cast<std::size_t>(index[i])); };
+  const __m128 r0 = row(0), r1 = row(1), r2 = row(2), r3 = row(3);
+  const __m128 a = _mm_unpacklo_ps(r0, r1), b = _mm_unpacklo_ps(r2, r3);
+  const __m128 c = _mm_unpackhi_ps(r0, r1), d = _mm_unpackhi_ps(r2, r3);
+  columns[0] = _mm_movelh_ps(a, b);
+  columns[1] = _mm_movehl_ps(b, a);
+  columns[2] = _mm_movelh_ps(c, d);
+  columns[3] = _mm_movehl_ps(d, c);
+}
+
+/// Rows of four floats by index, turned into four columns.
+static inline void load_columns(const float *rows, const int *index, f8 *columns) {
+  __m128 low[4], high[4];
+  load_four_columns(rows, index, low);
+  load_four_columns(rows, index + 4, high);
+  for (int i = 0; i < 4; ++i) columns[i] = {low[i], high[i]};
 }

@@ -1,0 +1,118 @@
+// SPDX-License-Identifier: MIT
+#include <lumra/error_vector.h>
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <complex>
+#include <functional>
+#include <numbers>
+#include <random>
+
+#include "support/test_array.hpp"
+
+namespace {
+
+using cf32_matrix = tests::test_array<lumra_cf32_matrix_block>;
+using f32_matrix = tests::test_array<lumra_f32_matrix_block>;
+
+constexpr std::int32_t invalid_parameter = -312401;
+
+struct comparison {
+  const char *name;
+  decltype(&qsLumraAlgo_CalculateEVM2D) call;
+  double (*define)(std::complex<double> a, std::complex<double> b);
+};
+
+const comparison comparisons[] = {
+    {"EVM", &qsLumraAlgo_CalculateEVM2D, [](auto a, auto b) { return std::abs(b - a); }},
+    {"magnitude", &qsLumraAlgo_CalculateMagnitudeError2D, [](auto a, auto b) { return std::abs(b) - std::abs(a); }},
+    {"phase", &qsLumraAlgo_CalculatePhaseError2D, [](auto a, auto b) { return std::arg(b * std::conj(a)); }}};
+
+TEST(ErrorVector, MatchesItsDefinition) {
+  std::mt19937 random(1);
+  std::normal_distribution<float> normal;
+  for (const comparison &c : comparisons)
+    for (const auto &[rows, columns] : {std::pair{1, 1}, {7, 9}, {1, 2048}, {3, 683}, {64, 129}}) {
+      const auto n = static_cast<std::size_t>(rows * columns);
+      cf32_matrix a(rows, columns), b(columns, rows);  // only the number of elements matters
+      f32_matrix e(1, rows * columns);
+      for (std::size_t i = 0; i < n; ++i) {
+        a.block()->elements[i] = {normal(random), normal(random)};
+        b.block()->elements[i] = {normal(random), normal(random)};
+      }
+      // Units of the values: 2^-22 and 2^-23 of rounding, and half of the bits.
+      for (const auto &[mode, bound] : {std::pair{1, 4e-6}, {2, 2e-6}, {3, 4e-3}}) {
+        SCOPED_TRACE(testing::Message() << c.name << " n " << n << " mode " << mode);
+        ASSERT_EQ(0, c.call(a.handle(), b.handle(), e.handle(), mode));
+        for (std::size_t i = 0; i < n; ++i) {
+          const lumra_cf32 x = a.block()->elements[i], y = b.block()->elements[i];
+          ASSERT_NEAR(c.define({x.re, x.im}, {y.re, y.im}), e.block()->elements[i], bound) << i;
+        }
+      }
+    }
+}
+
+TEST(ErrorVector, ClosedForms) {
+  cf32_matrix a(1, 3), b(1, 3);
+  f32_matrix e(3, 1);
+  for (lumra_cf32 *value = a.block()->elements; value != a.block()->elements + 3; ++value) *value = {1, 0};
+  const lumra_cf32 values[] = {{1, 0}, {0, 1}, {-1, 0}};
+  std::memcpy(b.block()->elements, values, sizeof values);
+  constexpr float pi = std::numbers::pi_v<float>;
+  const float expected[][3] = {{0, std::numbers::sqrt2_v<float>, 2}, {0, 0, 0}, {0, pi / 2, pi}};
+  for (std::size_t c = 0; c < 3; ++c) {
+    ASSERT_EQ(0, comparisons[c].call(a.handle(), b.handle(), e.handle(), LUMRA_ACCURACY_HIGH));
+    for (std::size_t i = 0; i < 3; ++i) EXPECT_FLOAT_EQ(expected[c][i], e.block()->elements[i]) << comparisons[c].name;
+  }
+}
+
+TEST(ErrorVector, RefusesAndTouchesNothing) {
+  cf32_matrix a(2, 6), b(3, 4), small(2, 5), none;
+  f32_matrix e(4, 3), no_e, small_e(11, 1);
+  e.block()->elements[0] = 7;
+  const auto A = a.handle(), B = b.handle();
+  for (const comparison &c : comparisons) {
+    SCOPED_TRACE(c.name);
+    EXPECT_EQ(invalid_parameter, c.call(nullptr, B, e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(none.handle(), B, e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, nullptr, e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, none.handle(), e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, B, nullptr, 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, B, no_e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, small.handle(), e.handle(), 1));
+    EXPECT_EQ(invalid_parameter, c.call(A, B, small_e.handle(), 1));
+    for (const std::int32_t mode : {0, 4, -1, 1 << 20}) EXPECT_EQ(invalid_parameter, c.call(A, B, e.handle(), mode));
+    EXPECT_EQ(7, e.block()->elements[0]);
+    struct sizes {
+      std::int32_t rows, columns, code;
+    };
+    for (const sizes &s : {sizes{0, 5, 0},
+                           {-1, 5, invalid_parameter},
+                           {-2, -3, invalid_parameter},
+                           {65536, 65536, 0},
+                           {65536, 32768, invalid_parameter}}) {
+      cf32_matrix x(0, 0), y(0, 0);
+      f32_matrix out(0, 0);
+      x.block()->rows = y.block()->rows = out.block()->rows = s.rows;
+      x.block()->columns = y.block()->columns = out.block()->columns = s.columns;
+      EXPECT_EQ(s.code, c.call(x.handle(), y.handle(), out.handle(), 2)) << s.rows << " x " << s.columns;
+    }
+  }
+}
+
+TEST(ErrorVector, ScalesInPlace) {
+  for (const std::size_t n : {0U, 1U, 3U, 4U, 5U, 17U}) {
+    tests::cf32_array data(n);
+    for (std::size_t i = 0; i < n; ++i) data.elements()[i] = {static_cast<float>(i) + 0.1F, -3};
+    EXPECT_EQ(0, qsLumraAlgo_scale_cf(data.elements().data(), n, 0.3F));
+    for (std::size_t i = 0; i < n; ++i) {
+      EXPECT_EQ((static_cast<float>(i) + 0.1F) * 0.3F, data.elements()[i].re);
+      EXPECT_EQ(-3 * 0.3F, data.elements()[i].im);
+    }
+  }
+  EXPECT_EQ(0, qsLumraAlgo_scale_cf(nullptr, 0, 2));
+  EXPECT_EQ(-1, qsLumraAlgo_scale_cf(nullptr, 1, 2));
+}
+
+}  // namespace

@@ -1,0 +1,349 @@
+// Both builds of the element loops against their formulas, bit for bit. SPDX-License-Identifier: MIT
+#include "qsrfhs/vector/kernels/kernels.hpp"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <bit>
+#include <cmath>
+#include <cstdint>
+#include <functional>
+#include <limits>
+#include <memory>
+#include <random>
+#include <span>
+#include <vector>
+
+#include "platform/processor.hpp"
+
+namespace {
+
+using qsrfhs::kernels::kernel_table;
+
+struct build {
+  const char *name;
+  const kernel_table *table;
+};
+
+std::vector<build> builds() {
+  std::vector<build> all{{"baseline", &qsrfhs::kernels::baseline_kernels}};
+  if (platform::has_avx()) all.push_back({"avx", &qsrfhs::kernels::avx_kernels});
+  return all;
+}
+
+constexpr std::size_t lengths[] = {0, 1, 7, 8, 9, 15, 16, 17, 31, 32, 33, 63, 64, 65, 1003};
+constexpr std::size_t offsets[] = {0, 1, 2, 3, 5, 7};
+
+constexpr float inf = std::numeric_limits<float>::infinity();
+constexpr float nan = std::numeric_limits<float>::quiet_NaN();
+constexpr float tiny = std::numeric_limits<float>::denorm_min();
+constexpr float largest = std::numeric_limits<float>::max();
+
+/// Floats at an offset from a boundary of 64 bytes, in memory that ends with them.
+class placed {
+ public:
+  placed(std::size_t n, std::size_t offset) : memory_(new (std::align_val_t{64}) float[n + offset]), n_(n) {
+    values_ = memory_.get() + offset;
+  }
+  [[nodiscard]] float *data() const { return values_; }
+  [[nodiscard]] std::span<float> values() const { return {values_, n_}; }
+
+ private:
+  struct free_aligned {
+    void operator()(float *memory) const { ::operator delete[](memory, std::align_val_t{64}); }
+  };
+  std::unique_ptr<float[], free_aligned> memory_;
+  float *values_;
+  std::size_t n_;
+};
+
+/// Ordinary values of all magnitudes, among them every kind of special one.
+void fill(std::span<float> values, unsigned seed) {
+  constexpr float special[] = {0,   -0.0F, 1,   -1,   2,       0.5F,     tiny, -tiny,  1.17549435e-38F,
+                               inf, -inf,  nan, -nan, largest, -largest, 3,    1e-30F, -1e25F};
+  std::mt19937 random(seed);
+  std::uniform_real_distribution<float> mantissa(-2, 2);
+  std::uniform_int_distribution<int> kind(0, 99), exponent(-140, 126);
+  for (float &value : values) {
+    const int k = kind(random);
+    value = k < 12   ? special[random() % std::size(special)]
+            : k < 40 ? std::ldexp(mantissa(random), exponent(random))
+                     : mantissa(random) * 8;
+  }
+}
+
+bool same(float a, float b) {
+  return std::bit_cast<std::uint32_t>(a) == std::bit_cast<std::uint32_t>(b) || (std::isnan(a) && std::isnan(b));
+}
+
+::testing::AssertionResult same(std::span<const float> expected, std::span<const float> actual) {
+  for (std::size_t i = 0; i < expected.size(); ++i)
+    if (!same(expected[i], actual[i]))
+      return ::testing::AssertionFailure() << "float " << i << ": " << actual[i] << " instead of " << expected[i];
+  return ::testing::AssertionSuccess();
+}
+
+struct operation {
+  const char *name;
+  std::size_t x_width, y_width, out_width;  // floats an element
+  std::function<void(const kernel_table &, const float *x, const float *y, float *out, std::size_t n)> run;
+  std::function<void(const float *x, const float *y, float *out)> define;  // one element
+};
+
+void define_division(const float *a, const float *b, float *out) {
+  const float d = b[0] * b[0] + b[1] * b[1];
+  const float r = 1.0F / d;
+  const float re = (a[0] * b[0] + a[1] * b[1]) * r, im = (a[1] * b[0] - a[0] * b[1]) * r;
+  out[0] = re;
+  out[1] = im;
+}
+
+float define_log2(float v) {
+  const auto bits = std::bit_cast<std::uint32_t>(v) & 0x7FFFFFFF;
+  const auto coefficient = [](std::uint32_t pattern) { return std::bit_cast<float>(pattern); };
+  const float m = std::bit_cast<float>((bits & 0x7FFFFF) | 0x3F800000);
+  const auto e = static_cast<float>(bits >> 23);
+  float p = coefficient(0x3D31E3A8) * m;
+  p = p - coefficient(0x3ECF4B84);
+  p = p * m;
+  p = p + coefficient(0x3FCC0592);
+  p = p * m;
+  p = p - coefficient(0x405F858C);
+  p = p * m;
+  p = p + coefficient(0x40A18039);
+  p = p * m;
+  const float l = p - coefficient(0x40325B46);
+  return l - 127.0F + e;
+}
+
+/// The element (k, width) of an array of coefficients, by Horner's scheme in x.
+float define_polynomial(const std::vector<float> &c, std::size_t part, std::size_t width, float x) {
+  const std::size_t m = c.size() / width;
+  float acc = c[(m - 1) * width + part];
+  for (std::size_t k = m - 1; k-- > 0;) {
+    const float product = acc * x;
+    acc = product + c[k * width + part];
+  }
+  return acc;
+}
+
+std::int32_t define_truncation(float t) {
+  return t >= -2147483648.0F && t < 2147483648.0F ? static_cast<std::int32_t>(t)
+                                                  : std::numeric_limits<std::int32_t>::min();
+}
+
+void define_lookup(const qsrfhs::kernels::lookup_table &table, float key, const float *in, float *out) {
+  const float inverse = 1.0F / table.step;
+  const float t = (key - table.start) * inverse;
+  const std::int32_t k = define_truncation(t);
+  float g[2];
+  for (int part = 0; part < 2; ++part) {
+    const auto entry = [&](std::int32_t index) { return table.entries + 4 * static_cast<std::size_t>(index) + part; };
+    if (k < 0)
+      g[part] = *entry(0);
+    else if (k < table.count - 1)
+      g[part] = (t - static_cast<float>(k)) * entry(k)[2] + *entry(k);
+    else
+      g[part] = *entry(table.count - 1);
+  }
+  const float re = g[0] * in[0] - g[1] * in[1], im = g[0] * in[1] + g[1] * in[0];
+  out[0] = re;
+  out[1] = im;
+}
+
+std::vector<operation> operations() {
+  std::vector<operation> all;
+  all.push_back(
+      {"divide", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.divide(x, y, out, n); }, define_division});
+  for (const auto &v : {std::array{0.0F, 1.0F}, {3.0F, -4.0F}, {0.0F, 0.0F}, {1e30F, 1.0F}, {nan, 1.0F}})
+    all.push_back({"divide_by_value", 2, 0, 2,
+                   [v](auto &t, auto x, auto, auto out, auto n) { t.divide_by_value(x, v.data(), out, n); },
+                   [v](auto x, auto, auto out) { define_division(x, v.data(), out); }});
+  all.push_back({"magnitude", 2, 0, 1, [](auto &t, auto x, auto, auto out, auto n) { t.magnitude(x, out, n); },
+                 [](auto x, auto, auto out) { *out = std::sqrt(x[0] * x[0] + x[1] * x[1]); }});
+  all.push_back({"magnitude_squared", 2, 0, 1,
+                 [](auto &t, auto x, auto, auto out, auto n) { t.magnitude_squared(x, out, n); },
+                 [](auto x, auto, auto out) { *out = x[0] * x[0] + x[1] * x[1]; }});
+  for (const auto &[a, b] : {std::pair{1.0F, 0.0F}, {10.0F, 5.0F}, {-3.0103F, 1e-3F}, {0.0F, inf}}) {
+    all.push_back({"log2_scaled", 1, 0, 1,
+                   [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled(x, a, b, out, n); },
+                   [a, b](auto x, auto, auto out) {
+                     const float l = *x >= 0 ? define_log2(*x) : nan;
+                     *out = a * l + b;
+                   }});
+    all.push_back({"log2_scaled_or_infinity", 1, 0, 1,
+                   [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled_or_infinity(x, a, b, out, n); },
+                   [a, b](auto x, auto, auto out) {
+                     const float l = *x >= 0 ? define_log2(*x) : nan;
+                     *out = *x == 0 ? -inf : a * l + b;
+                   }});
+    all.push_back({"log2_scaled_power", 2, 0, 1,
+                   [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled_power(x, a, b, out, n); },
+                   [a, b](auto x, auto, auto out) { *out = a * define_log2(x[0] * x[0] + x[1] * x[1]) + b; }});
+  }
+  for (const std::size_t m : {1, 2, 9, 33}) {
+    std::vector<float> c(2 * m);
+    fill(c, static_cast<unsigned>(m));
+    std::replace_if(
+        c.begin(), c.end(), [](float v) { return !(std::abs(v) < 100); }, 0.75F);
+    const std::vector<float> real(c.begin(), c.begin() + static_cast<std::ptrdiff_t>(m));
+    all.push_back(
+        {"polynomial", 1, 0, 1,
+         [real](auto &t, auto x, auto, auto out, auto n) { t.polynomial(x, real.data(), real.size(), out, n); },
+         [real](auto x, auto, auto out) { *out = define_polynomial(real, 0, 1, *x); }});
+    all.push_back(
+        {"complex_polynomial", 1, 0, 2,
+         [c](auto &t, auto x, auto, auto out, auto n) { t.complex_polynomial(x, c.data(), c.size() / 2, out, n); },
+         [c](auto x, auto, auto out) {
+           out[0] = define_polynomial(c, 0, 2, *x);
+           out[1] = define_polynomial(c, 1, 2, *x);
+         }});
+  }
+  // Keys reach below, into and beyond the tables; an infinite and a negative zero value must come out as they are.
+  static const std::vector<float> entries{-0.0F, 1,  2, 3,     0.5F, -1, inf, nan, 2, -0.0F,
+                                          -1,    -2, 7, 0.25F, 1,    1,  inf, 1,   5, -6};
+  for (const auto &[start, step, count] : {std::tuple{0.0F, 1.0F, 5},
+                                           {-3.5F, 0.75F, 5},
+                                           {2.0F, -0.5F, 5},
+                                           {0.0F, nan, 5},
+                                           {0.0F, tiny, 4},
+                                           {0.0F, 1.0F, 1}})
+    all.push_back({"lookup", 1, 2, 2,
+                   [=](auto &t, auto x, auto y, auto out, auto n) {
+                     t.lookup({entries.data(), count, start, step}, x, y, out, n);
+                   },
+                   [=](auto x, auto y, auto out) {
+                     define_lookup({entries.data(), count, start, step}, *x, y, out);
+                   }});
+  return all;
+}
+
+std::vector<float> define(const operation &op, std::span<const float> x, std::span<const float> y, std::size_t n) {
+  std::vector<float> out(n * op.out_width);
+  for (std::size_t i = 0; i < n; ++i)
+    op.define(x.data() + i * op.x_width, y.data() + i * op.y_width, out.data() + i * op.out_width);
+  return out;
+}
+
+void check(const operation &op, std::size_t n, std::size_t offset) {
+  SCOPED_TRACE(testing::Message() << op.name << " n " << n << " offset " << offset);
+  const placed x(n * op.x_width, offset), y(n * op.y_width, (offset + 3) % 8), out(n * op.out_width, (offset * 5) % 16);
+  fill(x.values(), static_cast<unsigned>(n));
+  fill(y.values(), static_cast<unsigned>(n + 1));
+  const std::vector<float> expected = define(op, x.values(), y.values(), n);
+  for (const build &b : builds()) {
+    SCOPED_TRACE(b.name);
+    std::fill(out.values().begin(), out.values().end(), -77.0F);
+    op.run(*b.table, x.data(), y.data(), out.data(), n);
+    EXPECT_TRUE(same(expected, out.values()));
+  }
+}
+
+TEST(VectorKernels, BothBuildsFollowTheFormulas) {
+  for (const operation &op : operations())
+    for (const std::size_t n : lengths)
+      for (const std::size_t offset : offsets) check(op, n, offset);
+}
+
+TEST(VectorKernels, LongArraysComeOutTheSame) {
+  const char *before = "";
+  for (const operation &op : operations()) {
+    if (before == op.name) continue;  // one of each kind
+    before = op.name;
+    const std::size_t n = (std::size_t{24} << 20) / (4 * (op.x_width + op.y_width + op.out_width)) + 1003;
+    for (const std::size_t offset : {0, 1, 2}) check(op, n, offset);
+  }
+}
+
+TEST(VectorKernels, AnOutputMayBeAnInput) {
+  for (const operation &op : operations())
+    for (const std::size_t n : lengths)
+      for (const bool over_x : {true, false}) {
+        if (op.out_width > (over_x ? op.x_width : op.y_width)) continue;
+        SCOPED_TRACE(testing::Message() << op.name << " n " << n << (over_x ? " over x" : " over y"));
+        for (const build &b : builds()) {
+          SCOPED_TRACE(b.name);
+          const placed x(n * op.x_width, 1), y(n * op.y_width, 1);
+          fill(x.values(), 1);
+          fill(y.values(), 2);
+          const std::vector<float> expected = define(op, x.values(), y.values(), n);
+          float *out = over_x ? x.data() : y.data();
+          op.run(*b.table, x.data(), y.data(), out, n);
+          EXPECT_TRUE(same(expected, {out, expected.size()}));
+        }
+      }
+}
+
+TEST(VectorKernels, LookupIndicesBeyondTheExactFloats) {
+  constexpr int last = (1 << 24) + 1;  // no float
+  const std::unique_ptr<float, void (*)(void *)> entries(
+      static_cast<float *>(std::calloc(static_cast<std::size_t>(last) + 1, 16)), &std::free);
+  ASSERT_TRUE(entries);
+  for (const int k : {last - 1, last})
+    entries.get()[4 * static_cast<std::size_t>(k)] = static_cast<float>(k - last + 3);
+  for (const build &b : builds()) {
+    const float keys[] = {16777215, 16777216, 16777218, 2147483520.0F, 2147483648.0F, -1};
+    const float expected[] = {0, 2, 3, 3, 0, 0};
+    const float in[12] = {1, 0, 1, 0, 1, 0, 1, 0, 1, 0, 1, 0};
+    float out[12];
+    b.table->lookup({entries.get(), last + 1, 0, 1}, keys, in, out, 6);
+    for (int i = 0; i < 6; ++i) EXPECT_EQ(expected[i], out[2 * i]) << b.name << " key " << keys[i];
+  }
+}
+
+float define_sum(std::span<const float> x) {
+  float sums[32] = {}, sum = 0;
+  const std::size_t whole = x.size() / 32 * 32;
+  for (std::size_t i = 0; i < whole; ++i) sums[i % 32] += x[i] * x[i];
+  // Groups of four lanes: 6 + 4 + (2 + 0), then 7 + 5 + (3 + 1).
+  for (std::size_t j = 0; j < 8; ++j) sum += (sums[24 + j] + sums[16 + j]) + (sums[8 + j] + sums[j]);
+  for (std::size_t i = whole; i < x.size(); i += 2) sum += x[i] * x[i] + x[i + 1] * x[i + 1];
+  return sum;
+}
+
+TEST(VectorKernels, SumsKeepTheirOrder) {
+  for (const std::size_t n : lengths)
+    for (const std::size_t offset : offsets)
+      for (const bool with_specials : {false, true}) {
+        SCOPED_TRACE(testing::Message() << "n " << n << " offset " << offset);
+        const placed x(2 * n, offset);
+        fill(x.values(), static_cast<unsigned>(n + offset));
+        if (!with_specials)
+          for (float &v : x.values()) v = std::isfinite(v) && std::abs(v) < 1e15F ? v : 0.1F;
+        float sequential = 0, peak = -largest;
+        for (std::size_t i = 0; i < n; ++i) {
+          const float power = x.data()[2 * i] * x.data()[2 * i] + x.data()[2 * i + 1] * x.data()[2 * i + 1];
+          sequential += power;
+          if (power > peak) peak = power;
+        }
+        for (const build &b : builds()) {
+          SCOPED_TRACE(b.name);
+          EXPECT_TRUE(same(define_sum(x.values()), b.table->sum_power(x.data(), n)));
+          float sum = 0, highest = 0;
+          b.table->sum_power_and_peak(x.data(), n, &sum, &highest);
+          EXPECT_TRUE(same(peak, highest));
+          const bool in_lanes = b.table == &qsrfhs::kernels::avx_kernels;
+          EXPECT_TRUE(same(in_lanes ? define_sum(x.values()) : sequential, sum));
+        }
+      }
+}
+
+TEST(VectorKernels, PolynomialsReachAsFarAsTheirBuildGoes) {
+  const auto &baseline = qsrfhs::kernels::baseline_kernels;
+  const auto &avx = qsrfhs::kernels::avx_kernels;
+  alignas(32) static float out[64];
+  struct reach {
+    std::size_t offset, n, m, baseline, avx;
+  };
+  constexpr reach reaches[] = {{0, 40, 16, 40, 40}, {0, 40, 17, 8, 40}, {1, 40, 32, 8, 40}, {0, 40, 33, 8, 8},
+                               {1, 40, 33, 8, 8},   {2, 40, 33, 8, 8},  {1, 7, 33, 7, 7},   {7, 40, 33, 8, 8},
+                               {5, 19, 33, 3, 3},   {5, 35, 33, 3, 3},  {1, 32, 33, 0, 16}, {3, 36, 33, 4, 20},
+                               {0, 48, 33, 0, 0}};
+  for (const reach &r : reaches) {
+    SCOPED_TRACE(testing::Message() << "offset " << r.offset << " n " << r.n << " m " << r.m);
+    EXPECT_EQ(r.baseline, baseline.polynomial_reach(out + r.offset, r.n, r.m));
+    EXPECT_EQ(r.avx, avx.polynomial_reach(out + r.offset, r.n, r.m));
+  }
+}
+
+}  // namespace
