@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <cmath>
 #include <cstdint>
@@ -11,6 +12,7 @@
 #include <limits>
 #include <memory>
 #include <random>
+#include <set>
 #include <span>
 #include <vector>
 
@@ -64,12 +66,14 @@ void fill(std::span<float> values, unsigned seed) {
   std::mt19937 random(seed);
   std::uniform_real_distribution<float> mantissa(-2, 2);
   std::uniform_int_distribution<int> kind(0, 99), exponent(-140, 126);
-  for (float &value : values) {
+  constexpr std::size_t period = 5003;
+  for (float &value : values.first(std::min(period, values.size()))) {
     const int k = kind(random);
     value = k < 12   ? special[random() % std::size(special)]
             : k < 40 ? std::ldexp(mantissa(random), exponent(random))
                      : mantissa(random) * 8;
   }
+  for (std::size_t i = period; i < values.size(); ++i) values[i] = values[i - period];
 }
 
 bool same(float a, float b) {
@@ -245,13 +249,13 @@ TEST(VectorKernels, BothBuildsFollowTheFormulas) {
       for (const std::size_t offset : offsets) check(op, n, offset);
 }
 
+// Outputs that bypass the caches; how they are stored depends on the shape of the operation only.
 TEST(VectorKernels, LongArraysComeOutTheSame) {
-  const char *before = "";
+  std::set<std::array<std::size_t, 3>> shapes;
   for (const operation &op : operations()) {
-    if (before == op.name) continue;  // one of each kind
-    before = op.name;
+    if (!shapes.insert({op.x_width, op.y_width, op.out_width}).second) continue;
     const std::size_t n = (std::size_t{24} << 20) / (4 * (op.x_width + op.y_width + op.out_width)) + 1003;
-    for (const std::size_t offset : {0, 1, 2}) check(op, n, offset);
+    for (const std::size_t offset : {0, 1}) check(op, n, offset);
   }
 }
 
