@@ -29,7 +29,7 @@ static inline void go_over(const Step &step, const float *x, const float *y, flo
 /// front, as elements start at any multiple of 4 bytes and only whole aligned lines can be stored that way.
 template <class Step>
 static inline void go_over_streaming(const Step &step, const float *x, const float *y, float *out, std::size_t n) {
-  constexpr std::size_t line = 16, piece = 32 * Step::block;
+  constexpr std::size_t line = 16, piece = 256;
   alignas(64) float gathered[line + piece * Step::out_width];
   const std::size_t misplaced = reinterpret_cast<std::size_t>(out) % 64 / sizeof(float);
   std::size_t lead = misplaced == 0 ? 0 : line - misplaced;  // floats in front of the first whole line, once

@@ -13,43 +13,42 @@ static std::size_t polynomial_reach(const float *out, std::size_t n, std::size_t
   return lead + (n - lead) % 16;
 }
 
+// Several groups of eight run side by side: one alone would wait for each of its operations.
+
 struct polynomial_step {
-  static constexpr std::size_t block = 32, x_width = 1, y_width = 0, out_width = 1;
+  static constexpr std::size_t groups = 8, block = 8 * groups, x_width = 1, y_width = 0, out_width = 1;
   const float *c;
   std::size_t m;
   inline void operator()(const float *x, const float *, float *out) const {
-    const f8 x0 = load(x), x1 = load(x + 8), x2 = load(x + 16), x3 = load(x + 24);
-    f8 a0 = broadcast(c[m - 1]), a1 = a0, a2 = a0, a3 = a0;
+    f8 acc[groups];
+    for (f8 &a : acc) a = broadcast(c[m - 1]);
     for (std::size_t k = m - 1; k-- > 0;) {
       const f8 ck = broadcast(c[k]);
-      a0 = a0 * x0 + ck;
-      a1 = a1 * x1 + ck;
-      a2 = a2 * x2 + ck;
-      a3 = a3 * x3 + ck;
+      for (std::size_t j = 0; j < groups; ++j) acc[j] = acc[j] * load(x + 8 * j) + ck;
     }
-    store(out, a0);
-    store(out + 8, a1);
-    store(out + 16, a2);
-    store(out + 24, a3);
+    for (std::size_t j = 0; j < groups; ++j) store(out + 8 * j, acc[j]);
   }
 };
 
 struct complex_polynomial_step {
-  static constexpr std::size_t block = 16, x_width = 1, y_width = 0, out_width = 2;
+  static constexpr std::size_t groups = 4, block = 8 * groups, x_width = 1, y_width = 0, out_width = 2;
   const float *c;
   std::size_t m;
   inline void operator()(const float *x, const float *, float *out) const {
-    const f8 x0 = load(x), x1 = load(x + 8);
-    f8 re0 = broadcast(c[2 * m - 2]), im0 = broadcast(c[2 * m - 1]), re1 = re0, im1 = im0;
-    for (std::size_t k = m - 1; k-- > 0;) {
-      const f8 re = broadcast(c[2 * k]), im = broadcast(c[2 * k + 1]);
-      re0 = re0 * x0 + re;
-      im0 = im0 * x0 + im;
-      re1 = re1 * x1 + re;
-      im1 = im1 * x1 + im;
+    f8 re[groups], im[groups];
+    for (std::size_t j = 0; j < groups; ++j) {
+      re[j] = broadcast(c[2 * m - 2]);
+      im[j] = broadcast(c[2 * m - 1]);
     }
-    store_complex(out, re0, im0);
-    store_complex(out + 16, re1, im1);
+    for (std::size_t k = m - 1; k-- > 0;) {
+      const f8 ck_re = broadcast(c[2 * k]), ck_im = broadcast(c[2 * k + 1]);
+      for (std::size_t j = 0; j < groups; ++j) {
+        const f8 v = load(x + 8 * j);
+        re[j] = re[j] * v + ck_re;
+        im[j] = im[j] * v + ck_im;
+      }
+    }
+    for (std::size_t j = 0; j < groups; ++j) store_complex(out + 16 * j, re[j], im[j]);
   }
 };
 
