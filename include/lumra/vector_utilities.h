@@ -76,7 +76,7 @@ LUMRA_EXPORT int32_t qsRFHS_complex_magnitude_squared(lumra_cf32_array x, lumra_
  * coefficients    as x; may be the output too
  * output          a handle, not its address. One of another count than n, larger or smaller, is resized to n (size
  *                 argument n * 4, complex n * 8); n = 0 or m = 0 makes it empty. A refused resize is not reported: the
- *                 count stays and results are written as far as it goes. For a null handle the work is done for
+ *                 count stays and results are written as far as it goes. A null handle receives
  *                 nothing. With complex coefficients it must not be x (nothing is evaluated then)
  * elapsedSeconds  receives the time that sizing and evaluation took, except for n = 0 or m = 0; may be null
  *

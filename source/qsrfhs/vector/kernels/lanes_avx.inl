@@ -97,11 +97,7 @@ static inline f8 load_twice(const float *p) {
   return {_mm256_permutevar_ps(both, _mm256_setr_epi32(0, 0, 1, 1, 2, 2, 3, 3))};
 }
 
-/// As split, in the order 0 1 4 5 2 3 6 7; join_in_lanes takes it back.
-static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
-  re = {_mm256_shuffle_ps(a.v, b.v, 0x88)};
-  im = {_mm256_shuffle_ps(a.v, b.v, 0xdd)};
-}
+/// Takes split_in_lanes back.
 static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
   a = {_mm256_unpacklo_ps(re.v, im.v)};
   b = {_mm256_unpackhi_ps(re.v, im.v)};

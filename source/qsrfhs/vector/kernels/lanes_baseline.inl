@@ -97,11 +97,7 @@ static inline f8 load_twice(const float *p) {
   return {_mm_unpacklo_ps(a, a), _mm_unpackhi_ps(a, a)};
 }
 
-/// As split, in the order 0 to 7; join_in_lanes takes it back.
-static inline void split_in_lanes(f8 a, f8 b, f8 &re, f8 &im) {
-  re = {_mm_shuffle_ps(a.low, a.high, 0x88), _mm_shuffle_ps(b.low, b.high, 0x88)};
-  im = {_mm_shuffle_ps(a.low, a.high, 0xdd), _mm_shuffle_ps(b.low, b.high, 0xdd)};
-}
+/// Takes split_in_lanes back.
 static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
   a = {_mm_unpacklo_ps(re.low, im.low), _mm_unpackhi_ps(re.low, im.low)};
   b = {_mm_unpacklo_ps(re.high, im.high), _mm_unpackhi_ps(re.high, im.high)};
