@@ -249,11 +249,11 @@ TEST(VectorKernels, BothBuildsFollowTheFormulas) {
       for (const std::size_t offset : offsets) check(op, n, offset);
 }
 
-// Outputs that bypass the caches; how they are stored depends on the shape of the operation only.
+// Complex outputs that bypass the caches; how they are stored depends on the shape of the operation only.
 TEST(VectorKernels, LongArraysComeOutTheSame) {
   std::set<std::array<std::size_t, 3>> shapes;
   for (const operation &op : operations()) {
-    if (!shapes.insert({op.x_width, op.y_width, op.out_width}).second) continue;
+    if (op.out_width != 2 || !shapes.insert({op.x_width, op.y_width, op.out_width}).second) continue;
     const std::size_t n = (std::size_t{24} << 20) / (4 * (op.x_width + op.y_width + op.out_width)) + 1003;
     for (const std::size_t offset : {0, 1}) check(op, n, offset);
   }

@@ -5,27 +5,32 @@ static inline f8 reciprocal_power(f8 re, f8 im) {
   return broadcast(1.0F) / (re * re + im * im);
 }
 
+template <class Put>
 static inline void divide_8(const float *x, f8 br, f8 bi, f8 r, float *out) {
   f8 ar, ai, a, b;
   split_in_lanes(load(x), load(x + 8), ar, ai);
   join_in_lanes((ar * br + ai * bi) * r, (ai * br - ar * bi) * r, a, b);
-  store(out, a);
-  store(out + 8, b);
+  Put::put(out, a);
+  Put::put(out + 8, b);
 }
 
 struct divide_step {
   static constexpr std::size_t block = 8, x_width = 2, y_width = 2, out_width = 2;
-  inline void operator()(const float *x, const float *y, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *y, float *out) const {
     f8 br, bi;
     split_in_lanes(load(y), load(y + 8), br, bi);
-    divide_8(x, br, bi, reciprocal_power(br, bi), out);
+    divide_8<Put>(x, br, bi, reciprocal_power(br, bi), out);
   }
 };
 
 struct divide_by_value_step {
   static constexpr std::size_t block = 8, x_width = 2, y_width = 0, out_width = 2;
   f8 br, bi, r;
-  inline void operator()(const float *x, const float *, float *out) const { divide_8(x, br, bi, r, out); }
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
+    divide_8<Put>(x, br, bi, r, out);
+  }
 };
 
 static inline f8 power_8(const float *x) {
@@ -36,12 +41,18 @@ static inline f8 power_8(const float *x) {
 
 struct magnitude_step {
   static constexpr std::size_t block = 8, x_width = 2, y_width = 0, out_width = 1;
-  inline void operator()(const float *x, const float *, float *out) const { store(out, square_root(power_8(x))); }
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
+    Put::put(out, square_root(power_8(x)));
+  }
 };
 
 struct magnitude_squared_step {
   static constexpr std::size_t block = 8, x_width = 2, y_width = 0, out_width = 1;
-  inline void operator()(const float *x, const float *, float *out) const { store(out, power_8(x)); }
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
+    Put::put(out, power_8(x));
+  }
 };
 
 static void divide(const float *x, const float *y, float *out, std::size_t n) {

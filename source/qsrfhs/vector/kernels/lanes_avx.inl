@@ -63,8 +63,9 @@ static inline f8 operator|(f8 a, f8 b) {
 static inline f8 clear(f8 a, f8 b) {
   return {_mm256_andnot_ps(a.v, b.v)};
 }
+/// Not by the blend instruction: GCC 12 takes it apart into scalar code where there is no AVX2.
 static inline f8 select(f8 mask, f8 a, f8 b) {
-  return {_mm256_blendv_ps(b.v, a.v, mask.v)};
+  return (mask & a) | clear(mask, b);
 }
 
 /// Bits of the integers that the lanes give when cut towards zero; the most negative integer for a NaN and for what
@@ -113,10 +114,12 @@ static inline void load_complex(const float *p, f8 &re, f8 &im) {
   re = {_mm256_shuffle_ps(low, high, 0x88)};
   im = {_mm256_shuffle_ps(low, high, 0xdd)};
 }
-static inline void store_complex(float *p, f8 re, f8 im) {
+
+/// Takes the order of load_complex back.
+static inline void join(f8 re, f8 im, f8 &a, f8 &b) {
   const __m256 low = _mm256_unpacklo_ps(re.v, im.v), high = _mm256_unpackhi_ps(re.v, im.v);
-  _mm256_storeu_ps(p, _mm256_permute2f128_ps(low, high, 0x20));
-  _mm256_storeu_ps(p + 8, _mm256_permute2f128_ps(low, high, 0x31));
+  a = {_mm256_permute2f128_ps(low, high, 0x20)};
+  b = {_mm256_permute2f128_ps(low, high, 0x31)};
 }
 
 /// Rows of four floats by index, turned into four columns.

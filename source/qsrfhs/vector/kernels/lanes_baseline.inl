@@ -107,11 +107,10 @@ static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
 static inline void load_complex(const float *p, f8 &re, f8 &im) {
   split_in_lanes(load(p), load(p + 8), re, im);
 }
-static inline void store_complex(float *p, f8 re, f8 im) {
-  f8 a, b;
+
+/// Takes the order of load_complex back.
+static inline void join(f8 re, f8 im, f8 &a, f8 &b) {
   join_in_lanes(re, im, a, b);
-  store(p, a);
-  store(p + 8, b);
 }
 
 /// Four rows of four floats by index, turned into columns.

@@ -48,41 +48,45 @@ static inline log2_lanes scale_real(const log2_lanes &v, log2_lanes l, f8 a, f8 
   return l;
 }
 
+template <class Put>
 static inline void store_results(const log2_lanes &l, float *out) {
-  for (std::size_t j = 0; j < log2_groups; ++j) store(out + 8 * j, l.group[j]);
+  for (std::size_t j = 0; j < log2_groups; ++j) Put::put(out + 8 * j, l.group[j]);
 }
 
 struct log2_step {
   static constexpr std::size_t block = 8 * log2_groups, x_width = 1, y_width = 0, out_width = 1;
   f8 a, b;
-  inline void operator()(const float *x, const float *, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
     const log2_lanes v = load_values(x);
-    store_results(scale_real(v, log2_of(v), a, b), out);
+    store_results<Put>(scale_real(v, log2_of(v), a, b), out);
   }
 };
 
 struct log2_or_infinity_step {
   static constexpr std::size_t block = 8 * log2_groups, x_width = 1, y_width = 0, out_width = 1;
   f8 a, b;
-  inline void operator()(const float *x, const float *, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
     const log2_lanes v = load_values(x);
     log2_lanes l = scale_real(v, log2_of(v), a, b);
     const f8 minus_infinity = broadcast_bits(static_cast<int>(0xFF800000));
     for (std::size_t j = 0; j < log2_groups; ++j)
       l.group[j] = select(v.group[j] == broadcast(0.0F), minus_infinity, l.group[j]);
-    store_results(l, out);
+    store_results<Put>(l, out);
   }
 };
 
 struct log2_of_power_step {
   static constexpr std::size_t block = 8 * log2_groups, x_width = 2, y_width = 0, out_width = 1;
   f8 a, b;
-  inline void operator()(const float *x, const float *, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
     log2_lanes v;
     for (std::size_t j = 0; j < log2_groups; ++j) v.group[j] = power_8(x + 16 * j);
     log2_lanes l = log2_of(v);
     for (std::size_t j = 0; j < log2_groups; ++j) l.group[j] = a * l.group[j] + b;
-    store_results(l, out);
+    store_results<Put>(l, out);
   }
 };
 

@@ -5,7 +5,8 @@ struct lookup_step {
   const float *entries;
   f8 start, inverse_step;
   f8 last, last_bits;  // index of the last entry, as a value and as an integer
-  inline void operator()(const float *keys, const float *in, float *out) const {
+  template <class Put>
+  inline void run(const float *keys, const float *in, float *out) const {
     // In two passes, so that the loads of the second need not wait for the indices.
     int index[block];
     f8 fraction[groups], inside[groups];
@@ -27,7 +28,7 @@ struct lookup_step {
       const f8 gain_re = select(inside[j], fraction[j] * entry[2], nothing) + entry[0];
       const f8 gain_im = select(inside[j], fraction[j] * entry[3], nothing) + entry[1];
       load_complex(in + 16 * j, re, im);
-      store_complex(out + 16 * j, gain_re * re - gain_im * im, gain_re * im + gain_im * re);
+      store_complex<Put>(out + 16 * j, gain_re * re - gain_im * im, gain_re * im + gain_im * re);
     }
   }
 };

@@ -19,14 +19,15 @@ struct polynomial_step {
   static constexpr std::size_t groups = 8, block = 8 * groups, x_width = 1, y_width = 0, out_width = 1;
   const float *c;
   std::size_t m;
-  inline void operator()(const float *x, const float *, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
     f8 acc[groups];
     for (f8 &a : acc) a = broadcast(c[m - 1]);
     for (std::size_t k = m - 1; k-- > 0;) {
       const f8 ck = broadcast(c[k]);
       for (std::size_t j = 0; j < groups; ++j) acc[j] = acc[j] * load(x + 8 * j) + ck;
     }
-    for (std::size_t j = 0; j < groups; ++j) store(out + 8 * j, acc[j]);
+    for (std::size_t j = 0; j < groups; ++j) Put::put(out + 8 * j, acc[j]);
   }
 };
 
@@ -34,7 +35,8 @@ struct complex_polynomial_step {
   static constexpr std::size_t groups = 4, block = 8 * groups, x_width = 1, y_width = 0, out_width = 2;
   const float *c;
   std::size_t m;
-  inline void operator()(const float *x, const float *, float *out) const {
+  template <class Put>
+  inline void run(const float *x, const float *, float *out) const {
     f8 re[groups], im[groups];
     for (std::size_t j = 0; j < groups; ++j) {
       re[j] = broadcast(c[2 * m - 2]);
@@ -48,7 +50,7 @@ struct complex_polynomial_step {
         im[j] = im[j] * v + ck_im;
       }
     }
-    for (std::size_t j = 0; j < groups; ++j) store_complex(out + 16 * j, re[j], im[j]);
+    for (std::size_t j = 0; j < groups; ++j) store_complex<Put>(out + 16 * j, re[j], im[j]);
   }
 };
 
