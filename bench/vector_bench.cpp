@@ -113,7 +113,7 @@ void add(const std::string &name, std::size_t width, Work work) {
         benchmark::ClobberMemory();
       }
       state.SetBytesProcessed(static_cast<std::int64_t>(width * n) * state.iterations());
-    });
+    })->UseRealTime();
 }
 
 float *floats(host_array<complex> &a) {

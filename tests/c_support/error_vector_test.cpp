@@ -92,8 +92,8 @@ TEST(ErrorVector, RefusesAndTouchesNothing) {
                            {-2, -3, invalid_parameter},
                            {65536, 65536, 0},
                            {65536, 32768, invalid_parameter}}) {
-      cf32_matrix x(0, 0), y(0, 0);
-      f32_matrix out(0, 0);
+      cf32_matrix x(1, 1), y(1, 1);
+      f32_matrix out(1, 1);
       x.block()->rows = y.block()->rows = out.block()->rows = s.rows;
       x.block()->columns = y.block()->columns = out.block()->columns = s.columns;
       EXPECT_EQ(s.code, c.call(x.handle(), y.handle(), out.handle(), 2)) << s.rows << " x " << s.columns;

@@ -168,7 +168,8 @@ std::vector<operation> operations() {
   all.push_back({"magnitude_squared", 2, 0, 1,
                  [](auto &t, auto x, auto, auto out, auto n) { t.magnitude_squared(x, out, n); },
                  [](auto x, auto, auto out) { *out = x[0] * x[0] + x[1] * x[1]; }});
-  for (const auto &[a, b] : {std::pair{1.0F, 0.0F}, {10.0F, 5.0F}, {-3.0103F, 1e-3F}, {0.0F, inf}}) {
+  for (const auto &factors : {std::pair{1.0F, 0.0F}, {10.0F, 5.0F}, {-3.0103F, 1e-3F}, {0.0F, inf}}) {
+    const float a = factors.first, b = factors.second;
     all.push_back({"log2_scaled", 1, 0, 1,
                    [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled(x, a, b, out, n); },
                    [a, b](auto x, auto, auto out) {
@@ -185,7 +186,7 @@ std::vector<operation> operations() {
                    [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled_power(x, a, b, out, n); },
                    [a, b](auto x, auto, auto out) { *out = a * define_log2(x[0] * x[0] + x[1] * x[1]) + b; }});
   }
-  for (const std::size_t m : {1, 2, 9, 33}) {
+  for (const std::size_t m : {1U, 2U, 9U, 33U}) {
     std::vector<float> c(2 * m);
     fill(c, static_cast<unsigned>(m));
     std::replace_if(
@@ -206,19 +207,16 @@ std::vector<operation> operations() {
   // Keys reach below, into and beyond the tables; an infinite and a negative zero value must come out as they are.
   static const std::vector<float> entries{-0.0F, 1,  2, 3,     0.5F, -1, inf, nan, 2, -0.0F,
                                           -1,    -2, 7, 0.25F, 1,    1,  inf, 1,   5, -6};
-  for (const auto &[start, step, count] : {std::tuple{0.0F, 1.0F, 5},
-                                           {-3.5F, 0.75F, 5},
-                                           {2.0F, -0.5F, 5},
-                                           {0.0F, nan, 5},
-                                           {0.0F, tiny, 4},
-                                           {0.0F, 1.0F, 1}})
-    all.push_back({"lookup", 1, 2, 2,
-                   [=](auto &t, auto x, auto y, auto out, auto n) {
-                     t.lookup({entries.data(), count, start, step}, x, y, out, n);
-                   },
-                   [=](auto x, auto y, auto out) {
-                     define_lookup({entries.data(), count, start, step}, *x, y, out);
-                   }});
+  for (qsrfhs::kernels::lookup_table table : {qsrfhs::kernels::lookup_table{nullptr, 5, 0, 1},
+                                              {nullptr, 5, -3.5F, 0.75F},
+                                              {nullptr, 5, 2, -0.5F},
+                                              {nullptr, 5, 0, nan},
+                                              {nullptr, 4, 0, tiny},
+                                              {nullptr, 1, 0, 1}}) {
+    table.entries = entries.data();
+    all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
+                   [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
+  }
   return all;
 }
 
@@ -255,7 +253,7 @@ TEST(VectorKernels, LongArraysComeOutTheSame) {
   for (const operation &op : operations()) {
     if (op.out_width != 2 || !shapes.insert({op.x_width, op.y_width, op.out_width}).second) continue;
     const std::size_t n = (std::size_t{24} << 20) / (4 * (op.x_width + op.y_width + op.out_width)) + 1003;
-    for (const std::size_t offset : {0, 1}) check(op, n, offset);
+    for (const std::size_t offset : {0U, 1U}) check(op, n, offset);
   }
 }
 
