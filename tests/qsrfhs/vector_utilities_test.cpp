@@ -243,7 +243,7 @@ TEST(VectorUtilities, AHostThatThrowsHasRefused) {
 
 TEST(Polynomial, EvaluatesAndSizes) {
   fake_host host(fake_host::unit::bytes);
-  f32_array x{2, 3, 0}, c{1, 2, 3}, out{9, 9, 9, 9}, empty(0);
+  f32_array x{2, 3, 0}, c{1, 2, 3}, out{9, 9, 9, 9}, empty(0), no_block;
   ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), out.handle()));
   EXPECT_EQ((std::vector<float>{17, 34, 1}), out.copy());
   ASSERT_EQ(1U, host.calls.size());  // a larger output is resized, too
@@ -252,7 +252,7 @@ TEST(Polynomial, EvaluatesAndSizes) {
   ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), out.handle()));
   EXPECT_EQ(1U, host.calls.size());
 
-  for (const lumra_f32_array nothing : {empty.handle(), f32_array().handle(), lumra_f32_array{}}) {
+  for (const lumra_f32_array nothing : {empty.handle(), no_block.handle(), lumra_f32_array{}}) {
     f32_array emptied{5.F};
     ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), nothing, emptied.handle()));
     EXPECT_EQ(0U, emptied.elements().size());

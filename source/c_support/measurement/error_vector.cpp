@@ -24,7 +24,7 @@ static_assert(VML_LA == LUMRA_ACCURACY_LOW && VML_HA == LUMRA_ACCURACY_HIGH &&
               VML_EP == LUMRA_ACCURACY_ENHANCED_PERFORMANCE);
 
 /// Elements that go through all passes before the next ones: what lies between the passes stays in the first cache.
-constexpr std::int32_t piece = 2048;
+constexpr std::int32_t piece = 1024;
 
 using sample = MKL_Complex8;
 
