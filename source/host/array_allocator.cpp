@@ -49,6 +49,7 @@ std::int32_t array_allocator::resize(element_type type, std::int32_t dimensions,
   if (!handle) return array_no_memory;
   if (!is_valid(type, dimensions)) return array_bad_type;
   if (count > max_count) return array_no_memory;
+  if (count == 0 && *handle && **handle) return array_ok;  // every block has that room; scratch is emptied so
   const std::size_t header = header_size(type, dimensions);
   const std::size_t bytes = static_cast<std::size_t>(count) * element_size(type);
 

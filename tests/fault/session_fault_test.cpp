@@ -1,7 +1,9 @@
 // Sessions while memory runs out and MKL fails, at every place where they can. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
+#include <lumra/error_vector.h>
 #include <lumra/session.h>
 
+#include <algorithm>
 #include <vector>
 
 #include "c_support/base/session.hpp"
@@ -127,6 +129,22 @@ TEST(SessionFaults, ACallAllocatesItsTwoWorkBuffersOnly) {
     EXPECT_EQ(0, calls[3].run(session, in, out));
   }
   EXPECT_EQ(2, tests::memory_faults::calls());
+}
+
+TEST(ErrorVectorFaults, WithoutMemoryTheOutputIsUntouched) {
+  tests::test_array<lumra_cf32_matrix_block> a(2, 3), b(3, 2);
+  tests::test_array<lumra_f32_matrix_block> e(1, 6);
+  std::fill_n(e.block()->elements, 6, 7.F);
+  for (const auto function :
+       {&qsLumraAlgo_CalculateEVM2D, &qsLumraAlgo_CalculateMagnitudeError2D, &qsLumraAlgo_CalculatePhaseError2D}) {
+    std::int32_t code = 0;
+    {
+      const tests::memory_faults::fail_at fault(1);
+      code = function(a.handle(), b.handle(), e.handle(), LUMRA_ACCURACY_HIGH);
+    }
+    EXPECT_EQ(-312498, code);
+    EXPECT_EQ(6, std::count(e.block()->elements, e.block()->elements + 6, 7.F));
+  }
 }
 
 TEST(ArrayFaults, ARefusedAllocationLeavesTheArrayAsItWas) {
