@@ -1,10 +1,12 @@
-/* Core services: the process-wide list of failures. SPDX-License-Identifier: MIT
+/* Core services: the process-wide list of failures, and what the headers included here declare.
+ * SPDX-License-Identifier: MIT
  *
  * Every failure of a function named qsUtilHS_ or qsRFHS_ appends its code to one list for the whole process and writes
  * one line to the standard output. The list only grows. Any thread, any time. */
 #ifndef LUMRA_CORE_SERVICES_H
 #define LUMRA_CORE_SERVICES_H
 
+#include <lumra/array_store.h>
 #include <lumra/export.h>
 #include <stdint.h>
 
