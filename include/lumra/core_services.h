@@ -7,6 +7,7 @@
 #define LUMRA_CORE_SERVICES_H
 
 #include <lumra/array_store.h>
+#include <lumra/data_fifo.h>
 #include <lumra/export.h>
 #include <stdint.h>
 

@@ -1,0 +1,310 @@
+// SPDX-License-Identifier: MIT
+#include "qsrfhs/util/data_fifo.hpp"
+
+#include <lumra/data_fifo.h>
+#include <lumra/status.h>
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <new>
+#include <utility>
+
+#include "platform/immortal.hpp"
+
+namespace qsrfhs {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr std::chrono::milliseconds longest_wait = 100ms;
+constexpr std::int32_t internal_error = -312402;
+
+}  // namespace
+
+std::unique_lock<std::mutex> data_fifo::locked() noexcept {
+  // Held for a few instructions only: spinning beats sleeping.
+  constexpr int rounds = 50;
+  if (spin_until([this] { return mutex_.try_lock(); }, rounds)) return {mutex_, std::adopt_lock};
+  return std::unique_lock(mutex_);
+}
+
+void data_fifo::open(std::string_view name, memory buffer, std::uint32_t capacity, std::uint64_t handle) noexcept {
+  const auto lock = locked();
+  name_.fill('\0');
+  std::copy_n(name.begin(), std::min(name.size(), longest_name), name_.begin());
+  buffer_ = std::move(buffer);
+  capacity_ = capacity;
+  fill_ = 0;
+  for (end *side : {&writer_, &reader_}) {
+    side->event.reset();
+    side->want = 0;
+    side->position = 0;
+  }
+  handle_ = handle;
+  state_ = state::open;
+}
+
+void data_fifo::close() noexcept {
+  memory freed;
+  auto lock = locked();
+  state_ = state::closing;
+  for (end *side : {&writer_, &reader_})
+    if (std::exchange(side->want, 0) != 0) side->event.set();
+  idle_.wait(lock, [this] { return busy_ == 0; });
+  handle_ = 0;
+  freed.swap(buffer_);
+}
+
+bool data_fifo::forget() noexcept {
+  memory freed;
+  const auto lock = locked();
+  handle_ = 0;
+  if (busy_ != 0) return false;
+  state_ = state::closing;
+  freed.swap(buffer_);
+  return true;
+}
+
+/// Ends a transfer. The last one in a forgotten FIFO hands it back to the table.
+void data_fifo::leave(std::unique_lock<std::mutex> lock) noexcept {
+  if (--busy_ != 0) return;
+  if (state_ == state::closing) {
+    idle_.notify_all();
+  } else if (handle_ == 0) {
+    state_ = state::closing;
+    const memory freed = std::move(buffer_);
+    lock.unlock();
+    fifo_table::instance().recycle(*this);
+  }
+}
+
+template <class Copy>
+std::int32_t data_fifo::transfer(std::uint64_t handle, end &own, end &other, std::uint32_t count, Copy copy) noexcept {
+  auto lock = locked();
+  if (!is_open(handle)) return fifo_unknown;
+  if (count == 0) return 0;
+  ++busy_;
+  if (available(own) < count) {
+    own.want = count;
+    lock.unlock();
+    const bool woken = own.event.wait_for(longest_wait);
+    lock.lock();
+    const bool closing = state_ == state::closing;
+    // A second waiter on this side may have been woken in our place: what cannot fit never goes on.
+    if (closing || !woken || count > capacity_) {
+      own.want = 0;
+      own.event.reset();
+      leave(std::move(lock));
+      return closing ? fifo_unknown : fifo_timed_out;
+    }
+  }
+
+  // Being woken is enough; but where a flush came in between, nothing is taken from what came after it.
+  const bool counts = available(own) >= count;
+  const std::uint32_t flushes = flushes_, position = own.position;
+  const std::uint32_t first = std::min(count, capacity_ - position);
+  if (counts) own.position = first < count ? count - first : position + count;
+  lock.unlock();
+  copy(buffer_.get() + position, first, buffer_.get(), count - first);
+
+  lock = locked();
+  if (counts && flushes == flushes_) {
+    const std::uint32_t moved = std::min(count, available(own));
+    fill_ = &own == &reader_ ? fill_ - moved : fill_ + moved;
+  }
+  if (other.want != 0 && available(other) >= other.want) {
+    other.want = 0;
+    other.event.set();
+  }
+  leave(std::move(lock));
+  return static_cast<std::int32_t>(count);
+}
+
+std::int32_t data_fifo::write(std::uint64_t handle, const std::byte *source, std::uint32_t count) noexcept {
+  return transfer(handle, writer_, reader_, count,
+                  [source](std::byte *ring, std::uint32_t first, std::byte *start, std::uint32_t rest) {
+                    std::memcpy(ring, source, first);
+                    std::memcpy(start, source + first, rest);
+                  });
+}
+
+std::int32_t data_fifo::read(std::uint64_t handle, std::byte *destination, std::uint32_t count) noexcept {
+  return transfer(
+      handle, reader_, writer_, count,
+      [destination](const std::byte *ring, std::uint32_t first, const std::byte *start, std::uint32_t rest) {
+        std::memcpy(destination, ring, first);
+        std::memcpy(destination + first, start, rest);
+      });
+}
+
+std::int32_t data_fifo::flush(std::uint64_t handle) noexcept {
+  const auto lock = locked();
+  if (!is_open(handle)) return fifo_unknown;
+  fill_ = writer_.position = reader_.position = 0;
+  ++flushes_;
+  return fifo_ok;
+}
+
+std::int32_t data_fifo::get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &fill) noexcept {
+  const auto lock = locked();
+  if (handle_ != handle) return fifo_unknown;
+  capacity = capacity_;
+  fill = fill_;
+  return fifo_ok;
+}
+
+std::uint64_t data_fifo::handle() noexcept {
+  const auto lock = locked();
+  return handle_;
+}
+
+fifo_table &fifo_table::instance() noexcept {
+  static platform::immortal<fifo_table> table;
+  return table.get();
+}
+
+std::uint64_t fifo_table::create(std::string_view name, std::uint32_t capacity, bool reuse,
+                                 std::uint64_t **cell_out) noexcept try {
+  *cell_out = nullptr;
+  auto made = std::make_unique<std::uint64_t>(0);
+  const std::lock_guard lock(mutex_);
+  std::uint64_t &cell = *made;
+  cells_[&cell] = std::move(made);
+  *cell_out = &cell;
+
+  std::size_t chosen = slot_count;
+  for (std::size_t slot = 0; slot < slot_count; ++slot) {
+    data_fifo *const fifo = slots_[slot].load();
+    if (fifo && fifo->name() == name) {
+      chosen = slot;
+      break;
+    }
+    if (!fifo && chosen == slot_count) chosen = slot;
+  }
+  if (chosen == slot_count) return 0;
+
+  data_fifo *const existing = slots_[chosen].load();
+  bool replace = false;
+  if (existing) {
+    std::uint32_t unused = 0, fill = 0;
+    const std::uint64_t handle = existing->handle();
+    (void)existing->get_status(handle, unused, fill);
+    replace = fill < capacity;  // what it holds, not what it could hold: on purpose
+    if (!replace && reuse) {
+      (void)existing->flush(handle);
+      return cell = handle;
+    }
+  }
+  cell = open_in(chosen, name, capacity);
+  if (!existing || cell == 0) return cell;
+  if (replace) {
+    existing->close();
+  } else if (!existing->forget()) {
+    return cell;
+  }
+  existing->next_spare = std::exchange(spares_, existing);
+  return cell;
+} catch (const std::bad_alloc &) {
+  return 0;
+}
+
+/// Puts a new FIFO into a slot, in place of whatever is there. Returns its handle, 0 without memory.
+std::uint64_t fifo_table::open_in(std::size_t slot, std::string_view name, std::uint32_t capacity) {
+  // Zeros that take no memory until they are written to.
+  data_fifo::memory buffer(static_cast<std::byte *>(std::calloc(std::max(capacity, 1U), 1)));
+  if (!buffer) return 0;
+  data_fifo *fifo = spares_;
+  if (fifo) {
+    spares_ = fifo->next_spare;
+  } else {
+    fifo = new (std::nothrow) data_fifo;
+    if (!fifo) return 0;
+  }
+  const std::uint64_t handle = next_generation_++ * slot_count + slot;
+  fifo->open(name, std::move(buffer), capacity, handle);
+  slots_[slot].store(fifo, std::memory_order_release);
+  return handle;
+}
+
+void fifo_table::remove(std::uint64_t handle) noexcept {
+  data_fifo *removed = nullptr;
+  {
+    const std::lock_guard lock(mutex_);
+    std::atomic<data_fifo *> &slot = slots_[handle % slot_count];
+    data_fifo *const fifo = slot.load();
+    if (!fifo || handle == 0 || fifo->handle() != handle) return;
+    slot.store(nullptr);
+    removed = fifo;
+  }
+  removed->close();
+  recycle(*removed);
+}
+
+std::int32_t fifo_table::unreserve(std::uint64_t **cell) noexcept {
+  std::uint64_t handle = 0;
+  {
+    const std::lock_guard lock(mutex_);
+    const auto found = cells_.find(*cell);
+    if (found == cells_.end()) return fifo_unknown;
+    *cell = nullptr;
+    handle = *found->second;
+    cells_.erase(found);
+  }
+  remove(handle);
+  return fifo_ok;
+}
+
+void fifo_table::recycle(data_fifo &fifo) noexcept {
+  const std::lock_guard lock(mutex_);
+  fifo.next_spare = std::exchange(spares_, &fifo);
+}
+
+}  // namespace qsrfhs
+
+using namespace qsrfhs;
+
+uint64_t qsLTEHS_DataFIFOCreate(const char *name, uint32_t capacity, uint32_t flags, uint64_t **cellOut) {
+  if (!cellOut) return 0;
+  const std::string_view known_by(name ? name : "", name ? ::strnlen(name, data_fifo::longest_name) : 0);
+  return fifo_table::instance().create(known_by, capacity, (flags & LUMRA_FIFO_REUSE) != 0, cellOut);
+}
+
+int32_t qsLTEHS_DataFIFODelete(uint64_t handle) {
+  fifo_table::instance().remove(handle);
+  return fifo_ok;
+}
+
+int32_t qsLTEHS_DataFIFOUnreserve(uint64_t **cell) {
+  if (!cell || !*cell) return fifo_unknown;
+  return fifo_table::instance().unreserve(cell);
+}
+
+int32_t qsLTEHS_DataFIFO(uint64_t handle, int32_t direction, const void *source, void *destination, uint32_t offset,
+                         uint32_t count) {
+  constexpr std::uint32_t longest = std::numeric_limits<std::int32_t>::max();
+  const bool reads = direction != LUMRA_FIFO_WRITE;
+  data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
+  if (!fifo || count > longest) return fifo_unknown;
+  if (count != 0 && !(reads ? destination : source)) return fifo_unknown;
+  if (reads) return fifo->read(handle, static_cast<std::byte *>(destination) + offset, count);
+  return fifo->write(handle, static_cast<const std::byte *>(source) + offset, count);
+}
+
+int32_t qsLTEHS_DataFIFO_GetStatus(uint64_t handle, uint32_t *capacity, uint32_t *fill) {
+  std::uint32_t bytes = 0, held = 0;
+  data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
+  const std::int32_t status = fifo ? fifo->get_status(handle, bytes, held) : fifo_unknown;
+  if (capacity) *capacity = bytes;
+  if (fill) *fill = held;
+  return status;
+}
+
+int32_t qsLTEHS_DataFIFO_Flush(uint64_t handle) {
+  data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
+  return fifo ? fifo->flush(handle) : fifo_unknown;
+}
+
+int32_t qsLTEHS(void) {
+  return internal_error;
+}
