@@ -9,6 +9,7 @@
 #include <lumra/array_store.h>
 #include <lumra/data_fifo.h>
 #include <lumra/export.h>
+#include <lumra/fft_resampler.h>
 #include <lumra/filter_registry.h>
 #include <stdint.h>
 

@@ -7,7 +7,10 @@
 
 namespace qsrfhs {
 
-/// Throws mkl_error unless the status is 0 or of the class without error.
+/// True unless the status is 0 or of the class without error.
+[[nodiscard]] bool failed(MKL_LONG status) noexcept;
+
+/// Throws mkl_error where the status is a failure.
 void throw_if_failed(MKL_LONG status, source_position at);
 
 }  // namespace qsrfhs

@@ -8,6 +8,7 @@
 #include "lookup.inl"
 #include "polynomial.inl"
 #include "rms.inl"
+#include "resampler.inl"
 #include "spectrum.inl"
 
 static constexpr kernel_table table = {
@@ -30,4 +31,7 @@ static constexpr kernel_table table = {
     .sum_power = &sum_power,
     .sum_power_and_peak = &sum_power_and_peak,
     .lookup = &lookup,
+
+    .weigh = &weigh,
+    .weigh_and_rotate = &weigh_and_rotate,
 };

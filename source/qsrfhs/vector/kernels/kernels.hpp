@@ -61,6 +61,11 @@ struct kernel_table {
 
   /// out[k] = in[k] * (gain at keys[k]), n complex.
   void (*lookup)(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n);
+
+  /// out[k] = x[k] * w[k], real parts and imaginary parts each with their own weight, n complex.
+  void (*weigh)(const float *x, const float *w, float *out, std::size_t n);
+  /// weigh, then times (c + js).
+  void (*weigh_and_rotate)(const float *x, const float *w, float c, float s, float *out, std::size_t n);
 };
 
 extern const kernel_table avx_kernels;

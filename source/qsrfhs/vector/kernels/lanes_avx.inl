@@ -25,6 +25,14 @@ static inline f8 broadcast_bits(int bits) {
 /// Stores past the caches; p lies on a boundary of 32 bytes.
 static inline void stream(float *p, f8 a) {
   _mm256_stream_ps(p, a.v);
+
+/// a b a b a b a b.
+static inline f8 broadcast_pair(float a, float b) {
+  return {_mm256_setr_ps(a, b, a, b, a, b, a, b)};
+}
+/// 1 0 3 2 5 4 7 6.
+static inline f8 swap_pairs(f8 a) {
+  return {_mm256_permute_ps(a.v, 0xb1)};
 }
 static inline f8 operator+(f8 a, f8 b) {
   return {_mm256_add_ps(a.v, b.v)};

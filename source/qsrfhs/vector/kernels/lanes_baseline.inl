@@ -28,6 +28,15 @@ static inline f8 broadcast_bits(int bits) {
 static inline void stream(float *p, f8 a) {
   _mm_stream_ps(p, a.low);
   _mm_stream_ps(p + 4, a.high);
+
+/// a b a b a b a b.
+static inline f8 broadcast_pair(float a, float b) {
+  const __m128 pairs = _mm_setr_ps(a, b, a, b);
+  return {pairs, pairs};
+}
+/// 1 0 3 2 5 4 7 6.
+static inline f8 swap_pairs(f8 a) {
+  return {_mm_shuffle_ps(a.low, a.low, 0xb1), _mm_shuffle_ps(a.high, a.high, 0xb1)};
 }
 static inline f8 operator+(f8 a, f8 b) {
   return {_mm_add_ps(a.low, b.low), _mm_add_ps(a.high, b.high)};

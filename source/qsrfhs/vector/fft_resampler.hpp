@@ -1,0 +1,97 @@
+// Sample-rate changes in the frequency domain: transform descriptors, their cache, and one block of overlap-save.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <lumra/fft_resampler.h>
+
+#include <complex>
+#include <cstdint>
+#include <mutex>
+#include <span>
+
+namespace qsrfhs {
+
+using resampler_descriptor = lumra_resampler_descriptor;
+
+enum resampler_status : std::int32_t {
+  resampler_ok = 0,
+  resampler_free_failed_again = -50397436,  // 0xFCFEFF04
+  resampler_length_query = -50397466,       // 0xFCFEFEE6
+  resampler_free_failed = -50397473,        // 0xFCFEFEDF
+  resampler_create = -50397485,             // 0xFCFEFED3
+  resampler_scale = -50397494,              // 0xFCFEFECA
+  resampler_in_place = -50397499,           // 0xFCFEFEC5
+  resampler_out_of_place = -50397506,       // 0xFCFEFEBE
+  resampler_commit = -50397513,             // 0xFCFEFEB7
+  resampler_no_buffer = -50397544,          // 0xFCFEFE98
+  resampler_released = -50397566,           // 0xFCFEFE82
+  resampler_no_descriptor = -50397684,      // 0xFCFEFE0C
+  resampler_forward = -50397767,            // 0xFCFEFDB9
+  resampler_backward = -50397840            // 0xFCFEFD70
+};
+
+/// Makes sure that the descriptor holds a committed transform of the length. One that has it is kept as it is, whatever
+/// its direction. Failures are recorded, and leave no transform.
+std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, bool inverse) noexcept;
+
+/// Frees transform and buffer and marks the descriptor as released, which is recorded as a code of its own.
+void release(resampler_descriptor &descriptor) noexcept;
+
+/// Descriptors that were handed out, newest first. They are never freed, only handed out again. Each time adds a node;
+/// what comes back is found by its newest, the older ones stay taken.
+class descriptor_cache {
+ public:
+  static descriptor_cache &instance() noexcept;
+
+  /// Failures are recorded; *out is null then.
+  std::int32_t create(resampler_descriptor **out, std::uint32_t length, std::uint32_t buffer_flag,
+                      std::uint32_t inverse_flag, std::uint64_t owner) noexcept;
+
+ private:
+  struct node {
+    node *next = nullptr;
+    resampler_descriptor *descriptor = nullptr;
+    std::uint32_t length = 0, buffer_flag = 0, inverse_flag = 0;
+    bool available = false;
+  };
+
+  resampler_descriptor *take(const node &like) noexcept;
+  void push(node &added) noexcept;
+  void withdraw(node &added, bool available) noexcept;
+  static void give_back(std::uint64_t owner, void *descriptor) noexcept;
+
+  std::mutex mutex_;
+  node *newest_ = nullptr;  // under mutex_
+};
+
+/// Sizes of a resampler: n points forward, m backward, 1 <= m <= n; `overlap` samples at the output rate are dropped at
+/// either end of a block, 2 * overlap < m. n is even, so that a middle bin exists.
+struct resampler_plan {
+  std::uint32_t n, m, overlap;
+  /// Input samples from one block to the next.
+  [[nodiscard]] std::uint32_t hop() const noexcept { return n - 2 * (n / m) * overlap; }
+};
+
+struct resampler_channel {
+  std::int64_t centre = 0;                // bin, centred numbering: n / 2 is 0 Hz
+  std::uint32_t divisor = 1;              // every m / divisor-th sample is kept; 1 to m
+  const float *weights = nullptr;         // 2 * m: for each bin one for the real and one for the imaginary part
+  std::span<std::complex<float>> output;  // nothing is written beyond it
+  std::uint64_t output_offset = 0;
+  double phase_start = 0;      // in radians
+  double phase_step = 0;       // in radians for an input sample
+  std::uint64_t produced = 0;  // samples so far, before every m / divisor-th is taken
+};
+
+/// One block: n input samples through one forward transform, then each channel's band through a backward one.
+///
+/// forward, inverse  descriptors for the plan's lengths, prepared here; inverse with a work buffer
+/// spectrum          n samples of work memory
+/// block             number of the block, from 0. Block b starts b * hop() samples into the input
+///
+/// A transform that fails is recorded, and the block goes on with what the buffers hold.
+void process_block(const resampler_plan &plan, resampler_descriptor &forward, resampler_descriptor &inverse,
+                   const std::complex<float> *input, std::complex<float> *spectrum, std::uint64_t block, bool first,
+                   std::span<resampler_channel> channels) noexcept;
+
+}  // namespace qsrfhs

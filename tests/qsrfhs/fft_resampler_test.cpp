@@ -1,0 +1,294 @@
+// FFT resampler: descriptors and the block step. SPDX-License-Identifier: MIT
+#include "qsrfhs/vector/fft_resampler.hpp"
+
+#include <lumra/array_store.h>
+
+#include <gtest/gtest.h>
+#include <mkl_dfti.h>
+
+#include <cmath>
+#include <cstring>
+#include <numbers>
+#include <random>
+#include <thread>
+#include <vector>
+
+#include "platform/processor.hpp"
+#include "qsrfhs/math/filter_design.hpp"
+#include "qsrfhs/vector/kernels/kernels.hpp"
+#include "support/near.hpp"
+#include "support/recorded.hpp"
+
+namespace {
+
+using std::numbers::pi;
+using sample = std::complex<float>;
+using exact = std::complex<double>;
+constexpr std::uint64_t owner = 4711;
+
+// A descriptor that goes back to the cache.
+struct lent {
+  lumra_resampler_descriptor *descriptor = nullptr;
+  std::uint64_t key;
+
+  lent(std::uint32_t length, std::uint32_t buffer, std::uint32_t inverse, std::uint64_t of = owner) : key(of) {
+    EXPECT_EQ(0, qsUtilHS_FFTResampler_CSG_CreateDescriptor(&descriptor, length, buffer, inverse, key));
+  }
+  lent(const lent &) = delete;
+  lent &operator=(const lent &) = delete;
+  ~lent() { qsUtilHS_FreeArrayIDH_CSG(key); }
+};
+
+std::vector<sample> noise(std::size_t n, unsigned seed) {
+  std::mt19937 random(seed);
+  std::normal_distribution<float> value;
+  std::vector<sample> x(n);
+  for (sample &s : x) s = {value(random), value(random)};
+  return x;
+}
+
+std::vector<exact> transform(const std::vector<exact> &x, double sign) {
+  const std::size_t n = x.size();
+  std::vector<exact> y(n);
+  for (std::size_t k = 0; k < n; ++k)
+    for (std::size_t i = 0; i < n; ++i)
+      y[k] += x[i] * std::polar(1.0, sign * 2 * pi * static_cast<double>(k * i % n) / static_cast<double>(n));
+  return y;
+}
+
+// Bin j of a channel, bin by bin, as it is defined.
+exact channel_bin(const std::vector<exact> &spectrum, std::int64_t m, std::int64_t centre, std::int64_t j) {
+  const auto n = static_cast<std::int64_t>(spectrum.size());
+  const std::int64_t start = centre - m / 2, end = centre + m / 2, c = start + j;
+  std::int64_t natural = c >= n / 2 ? c - n / 2 : c + n / 2;
+  if (start < 0) natural = end + n / 2 + c;
+  const bool missing = start < 0 ? c < 0 || natural >= n : c >= n;
+  return missing ? exact(0) : spectrum[static_cast<std::size_t>(natural)];
+}
+
+TEST(FftResampler, ABlockIsTheDirectComputation) {
+  struct row {
+    std::uint32_t n, m, overlap;
+  };
+  for (const row &r : {row{64, 16, 3}, row{64, 64, 5}, row{60, 12, 2}, row{64, 48, 0}, row{50, 13, 4}}) {
+    const qsrfhs::resampler_plan plan{r.n, r.m, r.overlap};
+    const lent forward(r.n, 0, 0), inverse(r.m, 1, 1);
+    const auto x = noise(r.n, r.n + r.m), w = noise(r.m, 9);
+    std::vector<sample> work(r.n);
+    const auto spectrum = transform({x.begin(), x.end()}, -1);
+    const auto *const weights = reinterpret_cast<const float *>(w.data());
+    const auto n = static_cast<std::int64_t>(r.n), m = static_cast<std::int64_t>(r.m);
+    std::vector<std::int64_t> centres;
+    for (std::int64_t centre = -m; centre <= n + m; ++centre) centres.push_back(centre);
+    centres.insert(centres.end(), {std::int64_t{-1} << 40, std::int64_t{1} << 40});
+    for (const bool first : {true, false}) {
+      std::vector<std::vector<sample>> out(centres.size(), std::vector<sample>(r.m, sample(77)));
+      std::vector<qsrfhs::resampler_channel> channels;
+      for (std::size_t i = 0; i < centres.size(); ++i)
+        channels.push_back({centres[i], r.m, weights, out[i], 0, i % 2 ? 0.3 : 0.0, i % 2 ? 0.01 : 0.0, 0});
+      qsrfhs::process_block(plan, *forward.descriptor, *inverse.descriptor, x.data(), work.data(), 5, first, channels);
+      for (std::size_t i = 0; i < centres.size(); ++i) {
+        SCOPED_TRACE(testing::Message() << r.n << " " << r.m << " centre " << centres[i] << " first " << first);
+        const double phase = 5.0 * plan.hop() * channels[i].phase_step + channels[i].phase_start;
+        std::vector<exact> bins(r.m);
+        for (std::int64_t j = 0; j < m; ++j) {
+          const exact bin = channel_bin(spectrum, m, centres[i], j);
+          const sample weight = w[static_cast<std::size_t>(j)];
+          const std::int64_t half = m / 2, swapped = j < half ? j + half : j < 2 * half ? j - half : j;
+          bins[static_cast<std::size_t>(swapped)] =
+              exact(bin.real() * weight.real(), bin.imag() * weight.imag()) * std::polar(1.0, phase);
+        }
+        const auto block = transform(bins, 1);
+        const std::size_t from = first ? 0 : r.overlap, kept = r.m - r.overlap - from;
+        EXPECT_EQ(kept, channels[i].produced);
+        for (std::size_t k = 0; k < kept; ++k)
+          EXPECT_NEAR(0, std::abs(exact(out[i][k]) - block[from + k] / static_cast<double>(m)), 2e-5);
+        for (std::size_t k = kept; k < r.m; ++k) EXPECT_EQ(sample(77), out[i][k]);
+      }
+    }
+  }
+}
+
+// Blocks of noise against one long convolution with the filter that the weights stand for: what is aliased, or does not
+// fit together from block to block, would show.
+TEST(FftResampler, BlocksJoinWithoutSeamAndAlias) {
+  constexpr std::uint32_t n = 256, m = 32, overlap = 8, rate = n / m;
+  constexpr std::size_t blocks = 12;
+  const qsrfhs::resampler_plan plan{n, m, overlap};
+  ASSERT_EQ(128U, plan.hop());
+  const auto filter = qsrfhs::design_filter({1, {}, {1, .028, .0625, 60}}, nullptr, 2 * overlap * rate + 1);
+  const auto h = filter->coefficients();
+  const auto reach = static_cast<std::int64_t>(h.size() / 2);
+  std::vector<sample> weights(m);
+  for (std::size_t j = 0; j < m; ++j) {
+    double sum = 0;
+    for (std::size_t i = 0; i < h.size(); ++i)
+      sum += static_cast<double>(h[i]) * std::cos(2 * pi / n * (static_cast<double>(j) - m / 2) *
+                                                  (static_cast<double>(i) - static_cast<double>(reach)));
+    weights[j] = {static_cast<float>(sum), static_cast<float>(sum)};
+  }
+  struct row {
+    std::int64_t centre;
+    std::uint32_t divisor;
+    double phase;
+  };
+  const row rows[] = {{128, 32, 0}, {128, 16, 0.7}, {40, 32, 0}, {200, 8, -2}, {16, 32, 0}, {239, 32, 1}, {120, 4, 0}};
+  const auto x = noise(n + blocks * plan.hop(), 5);
+  std::vector<std::vector<sample>> out(std::size(rows), std::vector<sample>(1000));
+  std::vector<qsrfhs::resampler_channel> channels;
+  for (std::size_t i = 0; i < std::size(rows); ++i)
+    channels.push_back({rows[i].centre, rows[i].divisor, reinterpret_cast<const float *>(weights.data()), out[i], 3,
+                        rows[i].phase, -2 * pi * static_cast<double>(rows[i].centre - n / 2) / n, 0});
+  const lent forward(n, 0, 0), inverse(m, 1, 1);
+  std::vector<sample> work(n);
+  for (std::size_t b = 0; b < blocks; ++b)
+    qsrfhs::process_block(plan, *forward.descriptor, *inverse.descriptor, x.data() + b * plan.hop(), work.data(), b,
+                          b == 0, channels);
+  for (std::size_t i = 0; i < std::size(rows); ++i) {
+    SCOPED_TRACE(i);
+    const std::size_t produced = channels[i].produced, stride = m / rows[i].divisor;
+    EXPECT_EQ(m - overlap + (blocks - 1) * (m - 2 * overlap), produced);
+    std::vector<exact> expected, got;
+    // The first `overlap` samples of all reach back before the input.
+    for (std::size_t p = (overlap + stride - 1) / stride * stride; p < produced; p += stride) {
+      exact sum = 0;
+      for (std::int64_t k = -reach; k <= reach; ++k) {
+        const std::int64_t t = static_cast<std::int64_t>(p * rate) - k;
+        sum += static_cast<double>(h[static_cast<std::size_t>(k + reach)]) * exact(x[static_cast<std::size_t>(t)]) *
+               std::polar(1.0, -2 * pi * static_cast<double>((rows[i].centre - n / 2) * t) / n);
+      }
+      expected.push_back(sum * static_cast<double>(rate) * std::polar(1.0, rows[i].phase));
+      got.emplace_back(out[i][3 + p / stride]);
+    }
+    // 60 dB over the seven eighths of the spectrum that are folded.
+    EXPECT_LT(tests::relative_error(got, expected), 1e-3 * std::sqrt(7.0));
+    EXPECT_EQ(sample(0), out[i][2]);
+    EXPECT_EQ(sample(0), out[i][3 + (produced + stride - 1) / stride]);
+  }
+}
+
+TEST(FftResampler, NothingIsWrittenBeyondTheOutput) {
+  const qsrfhs::resampler_plan plan{32, 16, 4};
+  const lent forward(32, 0, 0), inverse(16, 1, 1);
+  const auto x = noise(32, 1), w = noise(16, 2);
+  std::vector<sample> work(32), out(16, sample(5));
+  const auto *const weights = reinterpret_cast<const float *>(w.data());
+  for (const std::uint64_t offset : {std::uint64_t{0}, std::uint64_t{2}, std::uint64_t{3}, ~std::uint64_t{0} / 2}) {
+    qsrfhs::resampler_channel channel{16, 16, weights, std::span(out).first(3), offset, 0, 0, 0};
+    qsrfhs::process_block(plan, *forward.descriptor, *inverse.descriptor, x.data(), work.data(), 0, true,
+                          {&channel, 1});
+  }
+  for (std::size_t k = 3; k < 16; ++k) EXPECT_EQ(sample(5), out[k]);
+}
+
+TEST(FftResamplerKernels, BuildsAgreeBitForBit) {
+  std::vector<const qsrfhs::kernels::kernel_table *> tables = {&qsrfhs::kernels::baseline_kernels};
+  if (platform::has_avx()) tables.push_back(&qsrfhs::kernels::avx_kernels);
+  for (const auto *table : tables)
+    for (const std::size_t n : {0U, 1U, 3U, 7U, 8U, 9U, 15U, 17U, 1003U}) {
+      const auto x = noise(n + 1, 1), w = noise(n + 1, 2);
+      const float c = 0.6F, s = -0.8F;
+      std::vector<sample> weighed(n + 1, sample(9)), rotated(n + 1, sample(9)), out(n + 1, sample(9));
+      for (std::size_t k = 0; k < n; ++k) {
+        const float re = x[k].real() * w[k].real(), im = x[k].imag() * w[k].imag();
+        weighed[k] = {re, im};
+        const float re_c = re * c, im_s = im * s, im_c = im * c, re_s = re * s;
+        rotated[k] = {re_c - im_s, im_c + re_s};
+      }
+      const auto floats = [](auto &v) { return reinterpret_cast<float *>(v.data()); };
+      const auto *const px = reinterpret_cast<const float *>(x.data()), *const pw =
+                                                                            reinterpret_cast<const float *>(w.data());
+      table->weigh(px, pw, floats(out), n);
+      EXPECT_EQ(weighed, out);
+      table->weigh_and_rotate(px, pw, c, s, floats(out), n);
+      EXPECT_EQ(rotated, out);
+    }
+}
+
+TEST(ResamplerDescriptors, AreLentAgainOnceTheirOwnerIsReleased) {
+  const lumra_resampler_descriptor *first = nullptr;
+  {
+    const lent a(240, 1, 1), b(240, 1, 1, owner + 1);
+    first = a.descriptor;
+    EXPECT_NE(a.descriptor, b.descriptor);
+    EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(a.descriptor->aligned_buffer) % 4096);
+    std::memset(a.descriptor->aligned_buffer, 1, 240 * 8 + 4096);
+    EXPECT_EQ(0, a.descriptor->status);
+    qsUtilHS_FreeArrayIDH_CSG(owner);
+    for (int i = 0; i < 3; ++i) {
+      const lent again(240, 1, 1, owner + 2);
+      EXPECT_EQ(first, again.descriptor);
+      EXPECT_NE(first, lent(240, 2, 1, owner + 3).descriptor);  // flags count by value
+      EXPECT_NE(first, lent(240, 1, 0, owner + 3).descriptor);
+      EXPECT_NE(first, lent(241, 1, 1, owner + 3).descriptor);
+    }
+    const lent again(240, 1, 1, owner + 2);
+    EXPECT_NE(again.descriptor, lent(240, 1, 1, owner + 3).descriptor);  // taken
+  }
+  for (const std::uint32_t inverse : {0U, 1U}) {
+    const lent bare(240, 1 - inverse, inverse);
+    EXPECT_EQ(nullptr, bare.descriptor->aligned_buffer);
+    EXPECT_EQ(nullptr, bare.descriptor->buffer_block);
+  }
+}
+
+TEST(ResamplerDescriptors, PrepareKeepsATransformOfTheLength) {
+  lumra_resampler_descriptor descriptor{};
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, true));
+  const void *const inverse = descriptor.transform;
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, false));
+  EXPECT_EQ(inverse, descriptor.transform);
+  MKL_LONG placement = 0;
+  float scale = 0;
+  const auto transform = [&] { return static_cast<DFTI_DESCRIPTOR_HANDLE>(descriptor.transform); };
+  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_PLACEMENT, &placement));
+  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_BACKWARD_SCALE, &scale));
+  EXPECT_EQ(DFTI_INPLACE, placement);
+  EXPECT_EQ(1.F / 64, scale);
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, false));
+  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_PLACEMENT, &placement));
+  EXPECT_EQ(DFTI_NOT_INPLACE, placement);
+  const tests::recorded list;
+  EXPECT_EQ(-50397485, qsrfhs::prepare(descriptor, 0, false));
+  EXPECT_EQ(nullptr, descriptor.transform);
+  qsrfhs::release(descriptor);
+  EXPECT_EQ(-50397566, descriptor.status);
+  EXPECT_EQ((std::vector<std::int32_t>{-50397485, -50397566}), list.codes());
+}
+
+TEST(ResamplerDescriptors, RefusesAndRecords) {
+  lumra_resampler_descriptor stale{};
+  for (const std::uint32_t length : {0U, (1U << 27) + 1, 0x7FFFFFFFU, 0xFFFFFFFFU}) {
+    lumra_resampler_descriptor *out = &stale;
+    const tests::recorded list;
+    EXPECT_EQ(-50397485, qsUtilHS_FFTResampler_CSG_CreateDescriptor(&out, length, 1, 1, owner));
+    EXPECT_EQ(nullptr, out);
+    EXPECT_EQ((std::vector<std::int32_t>{-50397485, -50397566}), list.codes());
+  }
+  const tests::recorded list;
+  EXPECT_EQ(-50397684, qsUtilHS_FFTResampler_CSG_CreateDescriptor(nullptr, 16, 1, 1, owner));
+  EXPECT_EQ((std::vector<std::int32_t>{-50397684}), list.codes());
+  // A descriptor is no array.
+  const lent d(16, 1, 1);
+  lumra_array_ref forged{1, reinterpret_cast<lumra_array_block *>(d.descriptor)};
+  lumra_array_ref *pointer = &forged;
+  std::uint32_t length = 0;
+  EXPECT_EQ(-33620126, qsUtilHS_ArrayLength_CSG(&pointer, &length));
+  EXPECT_EQ(0, qsUtilHS_FreeArray_CSG(&pointer));
+  EXPECT_NE(d.descriptor, lent(16, 1, 1, owner + 1).descriptor);  // still lent
+}
+
+TEST(ResamplerDescriptorsConcurrency, NoTwoThreadsHoldTheSame) {
+  std::vector<std::jthread> threads;
+  for (std::uint64_t t = 0; t < 4; ++t)
+    threads.emplace_back([t] {
+      for (int i = 0; i < 300; ++i) {
+        const lent d(96, 1, 1, 9000 + t);
+        auto *const data = static_cast<sample *>(d.descriptor->aligned_buffer);
+        std::fill_n(data, 96, sample(static_cast<float>(t)));
+        EXPECT_EQ(sample(static_cast<float>(t)), data[95]);
+      }
+    });
+}
+
+}  // namespace
