@@ -4,8 +4,8 @@
  * At most 16 FIFOs exist at a time. They are found by name when they are created, and by handle afterwards; a handle is
  * never used again, so that stale ones are refused. No code is recorded anywhere.
  *
- * Any thread may call any function at any time, also delete a FIFO while both ends transfer. One thread at a time may
- * write and one at a time may read; with more, bytes may be lost or doubled. */
+ * Any thread may call any function at any time, also delete a FIFO while both ends transfer. One thread is to write and
+ * one to read; with several on one side, bytes may be lost, or read that were not written. */
 #ifndef LUMRA_DATA_FIFO_H
 #define LUMRA_DATA_FIFO_H
 
@@ -63,8 +63,8 @@ LUMRA_EXPORT int32_t qsLTEHS_DataFIFO(uint64_t handle, int32_t direction, const 
 /* Writes capacity and fill in bytes; either pointer may be null. Returns 0; -2 for an unknown handle (both are 0). */
 LUMRA_EXPORT int32_t qsLTEHS_DataFIFO_GetStatus(uint64_t handle, uint32_t *capacity, uint32_t *fill);
 
-/* Empties a FIFO. Bytes being written at that moment are dropped, bytes being read may be mixed with what is written
- * next. A writer that waits for room is not woken. Returns 0; -2 for an unknown handle or a FIFO that closes. */
+/* Empties a FIFO; a transfer that copies at that moment finishes first, a writer that waits for room is not woken.
+ * Returns 0; -2 for an unknown handle or a FIFO that closes. */
 LUMRA_EXPORT int32_t qsLTEHS_DataFIFO_Flush(uint64_t handle);
 
 /* Returns -312402, always. */

@@ -22,102 +22,119 @@ constexpr std::int32_t internal_error = -312402;
 
 }  // namespace
 
-std::unique_lock<std::mutex> data_fifo::locked() noexcept {
-  // Held for a few instructions only: spinning beats sleeping.
-  constexpr int rounds = 50;
-  if (spin_until([this] { return mutex_.try_lock(); }, rounds)) return {mutex_, std::adopt_lock};
-  return std::unique_lock(mutex_);
-}
-
 void data_fifo::open(std::string_view name, memory buffer, std::uint32_t capacity, std::uint64_t handle) noexcept {
-  const auto lock = locked();
+  const std::scoped_lock lock(writer_.mutex, reader_.mutex);
   name_.fill('\0');
   std::copy_n(name.begin(), std::min(name.size(), longest_name), name_.begin());
   buffer_ = std::move(buffer);
   capacity_ = capacity;
-  fill_ = 0;
   for (end *side : {&writer_, &reader_}) {
-    side->event.reset();
-    side->want = 0;
     side->position = 0;
+    side->seen = 0;
+    side->moved = 0;
   }
-  handle_ = handle;
   state_ = state::open;
+  handle_ = handle;
 }
 
 void data_fifo::close() noexcept {
-  memory freed;
-  auto lock = locked();
   state_ = state::closing;
-  for (end *side : {&writer_, &reader_})
-    if (std::exchange(side->want, 0) != 0) side->event.set();
-  idle_.wait(lock, [this] { return busy_ == 0; });
   handle_ = 0;
-  freed.swap(buffer_);
+  // Who takes an end's lock from here on finds the FIFO closed.
+  for (end *side : {&writer_, &reader_}) {
+    std::unique_lock lock(side->mutex);
+    side->wish.grant_if([](std::uint32_t) { return true; });
+    side->idle.wait(lock, [side] { return side->waiting == 0; });
+  }
+  const std::scoped_lock lock(writer_.mutex, reader_.mutex);
+  buffer_.reset();
 }
 
 bool data_fifo::forget() noexcept {
-  memory freed;
-  const auto lock = locked();
+  const std::scoped_lock lock(writer_.mutex, reader_.mutex);
   handle_ = 0;
-  if (busy_ != 0) return false;
-  state_ = state::closing;
-  freed.swap(buffer_);
-  return true;
+  return retire() != nullptr;
 }
 
-/// Ends a transfer. The last one in a forgotten FIFO hands it back to the table.
-void data_fifo::leave(std::unique_lock<std::mutex> lock) noexcept {
-  if (--busy_ != 0) return;
-  if (state_ == state::closing) {
-    idle_.notify_all();
-  } else if (handle_ == 0) {
-    state_ = state::closing;
-    const memory freed = std::move(buffer_);
-    lock.unlock();
-    fifo_table::instance().recycle(*this);
+/// The buffer of a forgotten FIFO that nobody waits in, to be freed; null while there is somebody. Under both locks.
+data_fifo::memory data_fifo::retire() noexcept {
+  if (handle_ != 0 || state_ == state::closing || writer_.waiting != 0 || reader_.waiting != 0) return nullptr;
+  state_ = state::closing;
+  return std::move(buffer_);
+}
+
+void data_fifo::hand_back_if_forgotten() noexcept {
+  if (handle_ != 0) return;
+  memory freed;
+  {
+    const std::scoped_lock lock(writer_.mutex, reader_.mutex);
+    freed = retire();
   }
+  if (freed) fifo_table::instance().recycle(*this);
+}
+
+std::uint64_t data_fifo::fill() const noexcept {
+  // In this order: what was read had been written before.
+  const std::uint64_t read = reader_.moved, written = writer_.moved;
+  return written - read;
+}
+
+/// Whether there are bytes to read, or room to write. Looks at the other end's count only where it has to.
+bool data_fifo::has(end &own, const end &other, std::uint32_t count) noexcept {
+  const auto enough = [&] {
+    const std::uint64_t moved = own.moved.load(std::memory_order_relaxed);
+    return &own == &reader_ ? own.seen - moved >= count : capacity_ - (moved - own.seen) >= count;
+  };
+  if (enough()) return true;
+  own.seen = other.moved;
+  return enough();
+}
+
+/// Waits for bytes or room. The other end first publishes its count, then looks for a wish; here it is the other way
+/// round, so that one of the two sees the other.
+std::int32_t data_fifo::wait(std::unique_lock<std::mutex> &lock, end &own, const end &other,
+                             std::uint32_t count) noexcept {
+  own.wish.want(count);
+  if (has(own, other, count)) {
+    (void)own.wish.withdraw();
+    return fifo_ok;
+  }
+  ++own.waiting;
+  lock.unlock();
+  const bool granted = own.wish.wait_for(longest_wait);
+  lock.lock();
+  if (--own.waiting == 0) own.idle.notify_all();
+  if (state_ == state::closing) return fifo_unknown;
+  // A second waiter on this side may have been meant: what cannot fit never goes on.
+  return granted && count <= capacity_ ? fifo_ok : fifo_timed_out;
 }
 
 template <class Copy>
 std::int32_t data_fifo::transfer(std::uint64_t handle, end &own, end &other, std::uint32_t count, Copy copy) noexcept {
-  auto lock = locked();
-  if (!is_open(handle)) return fifo_unknown;
+  std::unique_lock lock(own.mutex);
+  if (handle_ != handle) return fifo_unknown;
   if (count == 0) return 0;
-  ++busy_;
-  if (available(own) < count) {
-    own.want = count;
-    lock.unlock();
-    const bool woken = own.event.wait_for(longest_wait);
-    lock.lock();
-    const bool closing = state_ == state::closing;
-    // A second waiter on this side may have been woken in our place: what cannot fit never goes on.
-    if (closing || !woken || count > capacity_) {
-      own.want = 0;
-      own.event.reset();
-      leave(std::move(lock));
-      return closing ? fifo_unknown : fifo_timed_out;
+  const bool waits = !has(own, other, count);
+  if (waits) {
+    if (const std::int32_t status = wait(lock, own, other, count); status != fifo_ok) {
+      lock.unlock();
+      hand_back_if_forgotten();
+      return status;
     }
   }
 
-  // Being woken is enough; but where a flush came in between, nothing is taken from what came after it.
-  const bool counts = available(own) >= count;
-  const std::uint32_t flushes = flushes_, position = own.position;
-  const std::uint32_t first = std::min(count, capacity_ - position);
-  if (counts) own.position = first < count ? count - first : position + count;
-  lock.unlock();
+  const std::uint32_t position = own.position, first = std::min(count, capacity_ - position);
   copy(buffer_.get() + position, first, buffer_.get(), count - first);
-
-  lock = locked();
-  if (counts && flushes == flushes_) {
-    const std::uint32_t moved = std::min(count, available(own));
-    fill_ = &own == &reader_ ? fill_ - moved : fill_ + moved;
+  // A wish that was granted is enough; but where a flush came in between, nothing is taken from what comes after it.
+  if (has(own, other, count)) {
+    own.position = first < count ? count - first : position + count;
+    own.moved = own.moved.load(std::memory_order_relaxed) + count;
   }
-  if (other.want != 0 && available(other) >= other.want) {
-    other.want = 0;
-    other.event.set();
+  other.wish.grant_if([&](std::uint32_t bytes) { return (&other == &reader_ ? fill() : capacity_ - fill()) >= bytes; });
+  if (waits) {
+    lock.unlock();
+    hand_back_if_forgotten();
   }
-  leave(std::move(lock));
   return static_cast<std::int32_t>(count);
 }
 
@@ -139,24 +156,22 @@ std::int32_t data_fifo::read(std::uint64_t handle, std::byte *destination, std::
 }
 
 std::int32_t data_fifo::flush(std::uint64_t handle) noexcept {
-  const auto lock = locked();
-  if (!is_open(handle)) return fifo_unknown;
-  fill_ = writer_.position = reader_.position = 0;
-  ++flushes_;
-  return fifo_ok;
-}
-
-std::int32_t data_fifo::get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &fill) noexcept {
-  const auto lock = locked();
+  const std::scoped_lock lock(writer_.mutex, reader_.mutex);
   if (handle_ != handle) return fifo_unknown;
-  capacity = capacity_;
-  fill = fill_;
+  const std::uint64_t written = writer_.moved;
+  reader_.moved = reader_.seen = writer_.seen = written;
+  writer_.position = reader_.position = 0;
   return fifo_ok;
 }
 
-std::uint64_t data_fifo::handle() noexcept {
-  const auto lock = locked();
-  return handle_;
+std::int32_t data_fifo::get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &held) const noexcept {
+  const std::uint32_t bytes = capacity_;
+  // More than fits may have gone through while we looked.
+  const auto in_it = static_cast<std::uint32_t>(std::min<std::uint64_t>(fill(), bytes));
+  if (handle_ != handle) return fifo_unknown;
+  capacity = bytes;
+  held = in_it;
+  return fifo_ok;
 }
 
 fifo_table &fifo_table::instance() noexcept {

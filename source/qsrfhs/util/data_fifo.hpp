@@ -12,14 +12,15 @@
 #include <string_view>
 #include <unordered_map>
 
-#include "qsrfhs/util/auto_reset_event.hpp"
+#include "qsrfhs/util/wanted_bytes.hpp"
 
 namespace qsrfhs {
 
 enum fifo_status : std::int32_t { fifo_ok = 0, fifo_timed_out = -1, fifo_unknown = -2 };
 
-/// A ring of bytes. The object itself is never freed, only used again, so that a thread which looked it up while it was
-/// being closed finds a lock to take and, behind it, another handle.
+/// A ring of bytes between two ends, each with a lock of its own that is held while it transfers, so that the ends meet
+/// only in the counts of what they moved. The object itself is never freed, only used again, so that a thread which
+/// looked it up while it was being closed finds a lock to take and, behind it, another handle.
 class data_fifo {
  public:
   static constexpr std::size_t longest_name = 255;
@@ -38,41 +39,39 @@ class data_fifo {
   std::int32_t write(std::uint64_t handle, const std::byte *source, std::uint32_t count) noexcept;
   std::int32_t read(std::uint64_t handle, std::byte *destination, std::uint32_t count) noexcept;
   std::int32_t flush(std::uint64_t handle) noexcept;
-  std::int32_t get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &fill) noexcept;
+  std::int32_t get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &held) const noexcept;
 
   // For the table, under its lock.
   [[nodiscard]] std::string_view name() const noexcept { return name_.data(); }
-  [[nodiscard]] std::uint64_t handle() noexcept;
+  [[nodiscard]] std::uint64_t handle() const noexcept { return handle_; }
   data_fifo *next_spare = nullptr;
 
  private:
   enum class state : std::uint32_t { open = 1, closing = 2 };
-  struct end {
-    auto_reset_event event;      // a waiting transfer's want is met
-    std::uint32_t want = 0;      // bytes that it waits for, 0 for none
-    std::uint32_t position = 0;  // up to and including the capacity
+  struct alignas(64) end {
+    std::mutex mutex;
+    std::uint32_t position = 0;  // under mutex; up to and including the capacity
+    std::uint32_t waiting = 0;   // under mutex; transfers that wait
+    std::uint64_t seen = 0;      // under mutex; what the other end had moved when this one last looked
+    std::condition_variable idle;
+    alignas(64) std::atomic<std::uint64_t> moved{0};  // bytes ever; only rises, under mutex
+    alignas(64) wanted_bytes wish;
   };
 
   template <class Copy>
   std::int32_t transfer(std::uint64_t handle, end &own, end &other, std::uint32_t count, Copy copy) noexcept;
-  [[nodiscard]] std::unique_lock<std::mutex> locked() noexcept;
-  [[nodiscard]] bool is_open(std::uint64_t handle) const noexcept { return handle_ == handle && state_ == state::open; }
-  [[nodiscard]] std::uint32_t available(const end &side) const noexcept {
-    return &side == &reader_ ? fill_ : capacity_ - fill_;
-  }
-  void leave(std::unique_lock<std::mutex> lock) noexcept;
+  bool has(end &own, const end &other, std::uint32_t count) noexcept;
+  std::int32_t wait(std::unique_lock<std::mutex> &lock, end &own, const end &other, std::uint32_t count) noexcept;
+  [[nodiscard]] std::uint64_t fill() const noexcept;
+  [[nodiscard]] memory retire() noexcept;
+  void hand_back_if_forgotten() noexcept;
 
-  std::mutex mutex_;
-  // All of these under mutex_; the bytes in the buffer are copied without it.
-  std::uint64_t handle_ = 0;  // 0 once forgotten
-  state state_ = state::closing;
-  std::uint32_t capacity_ = 0;
-  std::uint32_t fill_ = 0;  // at most the capacity
-  std::uint32_t busy_ = 0;  // transfers in progress
-  std::uint32_t flushes_ = 0;
+  // Changed under both ends' mutexes, or while no transfer is in here.
+  std::atomic<std::uint64_t> handle_{0};  // 0 unless open
+  std::atomic<state> state_{state::closing};
+  std::atomic<std::uint32_t> capacity_{0};
   memory buffer_;
-  end writer_, reader_;
-  std::condition_variable idle_;
+  end writer_, reader_;  // their mutexes in this order
   std::array<char, longest_name + 1> name_{};
 };
 
