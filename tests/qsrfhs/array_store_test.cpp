@@ -226,7 +226,9 @@ TEST(ArrayStoreConcurrency, EveryThreadHasBlocksOfItsOwn) {
         EXPECT_EQ(0, qsUtilHS_ReadArray_CSG(a.address(), out.address(), 0, 8));
         EXPECT_EQ(static_cast<float>(t), out.elements()[0].re);
         EXPECT_EQ(static_cast<float>(t), b.block()->data[0].re);
-        if (i % 10 == 0) qsUtilHS_FreeArrayIDH_CSG(1000 + t);
+        if (i % 10 != 0) continue;
+        qsUtilHS_FreeArrayIDH_CSG(1000 + t);
+        a.record.block = b.record.block = nullptr;  // another thread may have the blocks by now
       }
     });
 }

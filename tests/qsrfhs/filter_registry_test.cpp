@@ -128,7 +128,8 @@ TEST(FilterDesign, TakesGivenCoefficientsAndWantedCounts) {
 
 TEST(FilterDesign, RefusesWhatMakesNoFilter) {
   constexpr double nan = std::numeric_limits<double>::quiet_NaN(), inf = std::numeric_limits<double>::infinity();
-  tests::f32_array given{1.F, 2.F}, empty(0), negative(1), none;
+  tests::f32_array given{1.F, 2.F}, empty(1), negative(1), none;
+  empty.block()->count = 0;
   negative.block()->count = -1;
   struct row {
     lumra_filter_key key;

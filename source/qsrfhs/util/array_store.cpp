@@ -41,7 +41,8 @@ array_block &make_block(std::uint32_t units) {
   constexpr std::size_t lead = 512, boundary = 256;
   void *const raw = ::operator new (std::size_t{units} * unit + lead + boundary);
   auto *const block = ::new (raw) array_block{};
-  const auto data = (reinterpret_cast<std::uintptr_t>(raw) + lead) / boundary * boundary;
+  char *const beyond = static_cast<char *>(raw) + lead;
+  char *const data = beyond - reinterpret_cast<std::uintptr_t>(beyond) % boundary;
   block->units = units;
   block->raw = raw;
   block->count_field = reinterpret_cast<lumra_cf32_block *>(data - host::header_size(host::element_type::cf32, 1));

@@ -94,14 +94,14 @@ bool data_fifo::has(end &own, const end &other, std::uint32_t count) noexcept {
 /// round, so that one of the two sees the other.
 std::int32_t data_fifo::wait(std::unique_lock<std::mutex> &lock, end &own, const end &other,
                              std::uint32_t count) noexcept {
-  own.wish.want(count);
+  const wanted_bytes::wish made = own.wish.want(count);
   if (has(own, other, count)) {
-    (void)own.wish.withdraw();
+    (void)own.wish.withdraw(made);
     return fifo_ok;
   }
   ++own.waiting;
   lock.unlock();
-  const bool granted = own.wish.wait_for(longest_wait);
+  const bool granted = own.wish.wait_for(made, longest_wait);
   lock.lock();
   if (--own.waiting == 0) own.idle.notify_all();
   if (state_ == state::closing) return fifo_unknown;

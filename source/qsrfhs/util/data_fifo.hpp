@@ -53,8 +53,8 @@ class data_fifo {
     std::uint32_t position = 0;  // under mutex; up to and including the capacity
     std::uint32_t waiting = 0;   // under mutex; transfers that wait
     std::uint64_t seen = 0;      // under mutex; what the other end had moved when this one last looked
-    std::condition_variable idle;
     alignas(64) std::atomic<std::uint64_t> moved{0};  // bytes ever; only rises, under mutex
+    std::condition_variable idle;
     alignas(64) wanted_bytes wish;
   };
 

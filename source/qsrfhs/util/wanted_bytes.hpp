@@ -13,47 +13,56 @@
 
 namespace qsrfhs {
 
-/// The number waited for is the event, too: it is 0 once granted. A wait that ends early therefore leaves nothing
-/// behind that could end the next one.
+/// The wish is the event, too: it is gone once granted. A wait that ends early therefore leaves nothing behind that
+/// could end the next one; and wishes are numbered, so that a late grant does not hit a later wish for as many bytes.
 class wanted_bytes {
  public:
-  void want(std::uint32_t bytes) noexcept { bytes_.store(bytes); }
-  /// Takes the wish back; true when it had been granted.
-  bool withdraw() noexcept { return bytes_.exchange(0) == 0; }
+  using wish = std::uint64_t;
+
+  /// Not by two threads at once. bytes is not 0.
+  wish want(std::uint32_t bytes) noexcept {
+    const wish made = std::uint64_t{++number_} << 32 | bytes;
+    wish_.store(made);
+    return made;
+  }
+  /// Takes a wish back; true when it had been granted.
+  bool withdraw(wish made) noexcept { return !wish_.compare_exchange_strong(made, 0); }
 
   /// Grants a wish that `available(bytes)` agrees with.
   template <class Available>
   void grant_if(Available available) noexcept {
-    std::uint32_t bytes = bytes_.load();
-    if (bytes == 0 || !available(bytes) || !bytes_.compare_exchange_strong(bytes, 0)) return;
-    // Either the waiter has announced itself by now, or it has not looked at the number yet.
+    wish made = wish_.load();
+    if (made == 0 || !available(static_cast<std::uint32_t>(made))) return;
+    if (!wish_.compare_exchange_strong(made, 0)) return;
+    // Either the waiter has announced itself by now, or it has not looked at its wish yet.
     if (sleepers_.load() == 0) return;
     { const std::lock_guard lock(mutex_); }
     granted_.notify_all();
   }
 
   /// True once granted; false when time is over, and then the wish is gone.
-  bool wait_for(std::chrono::milliseconds time) noexcept {
-    if (granted_soon()) return true;
+  bool wait_for(wish made, std::chrono::milliseconds time) noexcept {
+    if (granted_soon(made)) return true;
     std::unique_lock lock(mutex_);
     ++sleepers_;
-    const bool granted = granted_.wait_for(lock, time, [this] { return bytes_.load() == 0; });
+    const bool granted = granted_.wait_for(lock, time, [&] { return wish_.load() != made; });
     --sleepers_;
-    return granted || withdraw();
+    return granted || withdraw(made);
   }
 
  private:
   /// Looks for some microseconds before going to sleep, which costs more. Not worth it on a single processor.
-  bool granted_soon() const noexcept {
+  bool granted_soon(wish made) const noexcept {
     static const int rounds = platform::processor_count() > 1 ? 100 : 1;
     for (int round = 0; round < rounds; ++round) {
-      if (bytes_.load() == 0) return true;
+      if (wish_.load() != made) return true;
       _mm_pause();
     }
     return false;
   }
 
-  std::atomic<std::uint32_t> bytes_{0};
+  std::atomic<wish> wish_{0};  // 0 for none
+  std::uint32_t number_ = 0;   // of the latest wish
   std::atomic<int> sleepers_{0};
   std::mutex mutex_;
   std::condition_variable granted_;

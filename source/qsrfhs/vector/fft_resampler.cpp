@@ -60,8 +60,8 @@ bool make_buffer(resampler_descriptor &descriptor) noexcept {
   constexpr std::uintptr_t page = 4096;
   descriptor.buffer_block = ::operator new (std::size_t{descriptor.length} * sizeof(sample) + 2 * page, std::nothrow);
   if (!descriptor.buffer_block) return false;
-  const auto start = reinterpret_cast<std::uintptr_t>(descriptor.buffer_block);
-  descriptor.aligned_buffer = reinterpret_cast<void *>(start / page * page + page);
+  auto *const start = static_cast<char *>(descriptor.buffer_block);
+  descriptor.aligned_buffer = start + (page - reinterpret_cast<std::uintptr_t>(start) % page);
   return true;
 }
 
