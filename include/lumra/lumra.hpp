@@ -9,8 +9,8 @@
 #include <cstddef>
 #include <cstdint>
 #include <limits>
-#include <new>
 #include <memory>
+#include <new>
 #include <optional>
 #include <span>
 #include <stdexcept>

@@ -7,8 +7,8 @@
 #include "log2.inl"
 #include "lookup.inl"
 #include "polynomial.inl"
-#include "rms.inl"
 #include "resampler.inl"
+#include "rms.inl"
 #include "spectrum.inl"
 
 static constexpr kernel_table table = {

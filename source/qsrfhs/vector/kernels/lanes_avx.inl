@@ -25,6 +25,7 @@ static inline f8 broadcast_bits(int bits) {
 /// Stores past the caches; p lies on a boundary of 32 bytes.
 static inline void stream(float *p, f8 a) {
   _mm256_stream_ps(p, a.v);
+}
 
 /// a b a b a b a b.
 static inline f8 broadcast_pair(float a, float b) {

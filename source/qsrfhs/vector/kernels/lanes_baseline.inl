@@ -28,6 +28,7 @@ static inline f8 broadcast_bits(int bits) {
 static inline void stream(float *p, f8 a) {
   _mm_stream_ps(p, a.low);
   _mm_stream_ps(p + 4, a.high);
+}
 
 /// a b a b a b a b.
 static inline f8 broadcast_pair(float a, float b) {
