@@ -9,6 +9,7 @@
 #include <lumra/session.h>
 #include <lumra/status.h>
 #include <lumra/vector_utilities.h>
+#include <lumra/toolkit.h>
 #include <lumra/version.h>
 
 #endif

@@ -1,0 +1,93 @@
+// Discrete Fourier transforms of one record. SPDX-License-Identifier: MIT
+#include <lumra/toolkit.h>
+
+#include <algorithm>
+#include <cstdint>
+
+#include "toolkit/frame.hpp"
+#include "toolkit/transform_slot.hpp"
+
+namespace toolkit {
+namespace {
+
+/// Writes the upper half of a real record's spectrum, the mirrored conjugate of the lower one.
+template <class Complex>
+void complete_spectrum(Complex *bins, std::int64_t n) noexcept {
+  for (std::int64_t k = n / 2 + 1; k < n; ++k) bins[k] = std::conj(bins[n - k]);
+}
+
+template <class E>
+void forward_fft(input<E> x, output<complex_of<E>> &y, std::int32_t size, bool centred, scratch<E> pad,
+                 transform_slot slot) {
+  require(x.count() >= 1, empty_input);
+  const std::int32_t n = size < 1 ? x.count() : size;
+  check_transform_size(n);
+  pad.keep_apart_from(x, y);
+  x.keep_apart_from(y);
+  const auto bins = y.resize(n);
+
+  auto record = x.values();
+  if (n > x.count()) {
+    const auto padded = pad.resize(n);
+    std::fill(std::copy(record.begin(), record.end(), padded.begin()), padded.end(), value_of<E>{});
+    record = padded;
+  }
+  slot.get(vector_transform<E>(n, scaling::none)).forward(record.data(), bins.data());
+  if constexpr (!is_complex<E>) complete_spectrum(bins.data(), n);
+  if (centred) std::rotate(bins.begin(), bins.end() - n / 2, bins.end());
+}
+
+/// Bins of a spectrum in the order in which the transform takes them: 0 to n / 2 for a real record, else all.
+template <class E>
+std::span<const value_of<complex_of<E>>> natural_order(std::span<const value_of<complex_of<E>>> centred,
+                                                       scratch<complex_of<E>> &gathered) {
+  const auto n = static_cast<std::int64_t>(centred.size());
+  const std::int64_t zero = n / 2;  // index of bin 0
+  const auto bins = gathered.resize(is_complex<E> ? n : n / 2 + 1);
+  const auto rest = std::copy(centred.begin() + zero, centred.end(), bins.begin());
+  std::copy_n(centred.begin(), bins.end() - rest, rest);
+  if constexpr (!is_complex<E>) {
+    if (n % 2 == 0) {  // for even n two bins have no imaginary part
+      bins.front() = bins.front().real();
+      bins.back() = bins.back().real();
+    }
+  }
+  return bins;
+}
+
+template <class E>
+void inverse_fft(input<complex_of<E>> x, output<E> &y, bool centred, scratch<complex_of<E>> gathered,
+                 transform_slot slot) {
+  const std::int32_t n = x.count();
+  require(n >= 1, empty_input);
+  check_transform_size(n);
+  gathered.keep_apart_from(x, y);
+  x.keep_apart_from(y);
+  const auto record = y.resize(n);
+
+  auto bins = x.values();
+  if (centred) bins = natural_order<E>(bins, gathered);
+  slot.get(vector_transform<E>(n, scaling::backward)).backward(bins.data(), record.data());
+}
+
+}  // namespace
+}  // namespace toolkit
+
+using namespace toolkit;
+
+#define FFT(E)                                                                                        \
+  int32_t qsRFPELTA_##E##1DFFTH(handle<E> in, handle<complex_of<E>> out, int32_t size, int32_t shift, \
+                                handle<E> workspace, void **slot) {                                   \
+    output<complex_of<E>> y(out);                                                                     \
+    return toolkit_call([&] { forward_fft<E>(in, y, size, shift != 0, workspace, slot); }, y);        \
+  }                                                                                                   \
+  int32_t qsRFPELTA_##E##1DInvFFTH(handle<complex_of<E>> spectrum, handle<E> out, int32_t shift,      \
+                                   handle<complex_of<E>> workspace, void **slot) {                    \
+    output<E> y(out);                                                                                 \
+    return toolkit_call([&] { inverse_fft<E>(spectrum, y, shift != 0, workspace, slot); }, y);        \
+  }
+FFT(s)
+FFT(d)
+FFT(c)
+FFT(z)
+#undef FFT

@@ -1,0 +1,273 @@
+// What all toolkit functions share: how arrays are read and sized, and what a failure leaves behind.
+//
+// An operation throws `failure`; toolkit_call turns that into the status and empties the outputs. Scratch arrays empty
+// themselves. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <algorithm>
+#include <cstdint>
+#include <exception>
+#include <limits>
+#include <span>
+#include <utility>
+
+#include "host/resize_service.hpp"
+#include "qsrfhs/math/mkl_runtime.hpp"
+#include "qsrfhs/util/aligned_buffer.hpp"
+#include "toolkit/element.hpp"
+
+namespace toolkit {
+
+enum status : std::int32_t {
+  success = 0,
+  no_memory = -20001,
+  lengths_differ = -20002,
+  empty_input = -20003,
+  negative_dimension = -20004,
+  too_few_points = -20006,
+  empty_result = -20008,
+  bad_ratio = -20016,
+  bad_factor = -20022,
+  inner_dimensions_differ = -20039,
+  destination_too_small = -20046,
+  negative_delay = -20059,
+  bad_option = -20061,
+  not_finite = -20068,
+  history_too_short = -20075,
+  no_scratch = -20999,
+  transform_failed = -359501,
+  no_transform = -359502,
+  transform_not_freed = -359503,
+};
+
+class failure : public std::exception {
+ public:
+  explicit failure(status code) noexcept : code_(code) {}
+  [[nodiscard]] status code() const noexcept { return code_; }
+  [[nodiscard]] const char *what() const noexcept override { return "toolkit failure"; }
+
+ private:
+  status code_;
+};
+
+/// Throws the failure unless the condition holds.
+inline void require(bool condition, status otherwise) {
+  if (!condition) throw failure(otherwise);
+}
+
+/// Status of the exception being handled. What a host's resize service throws counts as a refusal.
+std::int32_t status_of_current_exception() noexcept;
+
+namespace detail {
+
+template <class E>
+std::span<value_of<E>> values(handle<E> array) noexcept {
+  const auto elements = host::elements(array);
+  return {reinterpret_cast<value_of<E> *>(elements.data()), elements.size()};
+}
+
+template <class Block>
+std::int64_t product(const Block &matrix) noexcept {
+  return matrix.rows < 0 || matrix.columns < 0 ? -1 : std::int64_t{matrix.rows} * matrix.columns;
+}
+
+/// Empties an array; its sizes become 0 even when the resize is refused.
+template <class Block>
+void clear_vector(Block **array) noexcept {
+  if (!host::has_block(array)) return;
+  try {
+    host::resize_vector(&array, 0, 0);
+  } catch (...) {  // a refusal, below
+  }
+  if (host::has_block(array)) (*array)->count = 0;
+}
+
+}  // namespace detail
+
+/// A rectangle of elements, row by row.
+template <class T>
+struct matrix_view {
+  T *data = nullptr;
+  std::int32_t rows = 0, columns = 0;
+
+  [[nodiscard]] std::size_t size() const noexcept {
+    return static_cast<std::size_t>(rows) * static_cast<std::size_t>(columns);
+  }
+  [[nodiscard]] T *row(std::int32_t r) const noexcept { return data + std::int64_t{r} * columns; }
+};
+
+/// A vector that is only read. A null handle and a null block are empty.
+template <class E>
+class input {
+ public:
+  input(handle<E> array) noexcept : array_(array), values_(detail::values<E>(array)) {}
+
+  [[nodiscard]] std::span<const value_of<E>> values() const noexcept { return values_; }
+  [[nodiscard]] std::int32_t count() const noexcept { return static_cast<std::int32_t>(values_.size()); }
+  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+
+  /// Reads a copy from here on if `written`, which is about to be sized, is the same array.
+  template <class Array>
+  void keep_apart_from(const Array &written) {
+    if (!block() || written.block() != block()) return;
+    copy_ = qsrfhs::aligned_buffer<value_of<E>>(values_.size());
+    std::copy(values_.begin(), values_.end(), copy_.data());
+    values_ = copy_.elements();
+  }
+
+ private:
+  handle<E> array_;
+  std::span<value_of<E>> values_;
+  qsrfhs::aligned_buffer<value_of<E>> copy_;
+};
+
+/// A matrix that is only read. A null handle, a null block and a negative size are empty.
+template <class E>
+class input_matrix {
+ public:
+  input_matrix(matrix_handle<E> array) noexcept : array_(array) {
+    if (!host::has_block(array)) return;
+    view_ = {reinterpret_cast<const value_of<E> *>((*array)->elements), (*array)->rows, (*array)->columns};
+  }
+
+  [[nodiscard]] const matrix_view<const value_of<E>> &view() const noexcept { return view_; }
+  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+
+  /// Reads a copy from here on if `written`, which is about to be sized, is the same array. Sizes above 0 only.
+  template <class Array>
+  void keep_apart_from(const Array &written) {
+    if (!block() || written.block() != block()) return;
+    copy_ = qsrfhs::aligned_buffer<value_of<E>>(view_.size());
+    std::copy(view_.data, view_.data + view_.size(), copy_.data());
+    view_.data = copy_.data();
+  }
+
+ private:
+  matrix_handle<E> array_;
+  matrix_view<const value_of<E>> view_;
+  qsrfhs::aligned_buffer<value_of<E>> copy_;
+};
+
+/// A vector that the call sizes and writes: a result, a state, or data changed in place. A failure empties it.
+template <class E>
+class output {
+ public:
+  explicit output(handle<E> array) noexcept : array_(array) {}
+
+  [[nodiscard]] bool present() const noexcept { return array_ != nullptr; }
+  /// The elements there are.
+  [[nodiscard]] std::span<value_of<E>> values() const noexcept { return detail::values<E>(array_); }
+  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+
+  /// Makes it `count` elements; one that has them is left alone. What they hold is not defined.
+  std::span<value_of<E>> resize(std::int64_t count) {
+    require(array_ && count <= std::numeric_limits<std::int32_t>::max(), no_memory);
+    handle<E> array = array_;
+    require(host::resize_vector(&array, static_cast<std::int32_t>(count), static_cast<std::uint64_t>(count)),
+            no_memory);
+    return values();
+  }
+  void clear() noexcept { detail::clear_vector(array_); }
+
+ private:
+  handle<E> array_;
+};
+
+/// A matrix that the call sizes and writes. A failure empties it.
+template <class E>
+class output_matrix {
+ public:
+  explicit output_matrix(matrix_handle<E> array) noexcept : array_(array) {}
+
+  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+  [[nodiscard]] matrix_view<value_of<E>> view() const noexcept {
+    if (!host::has_block(array_)) return {};
+    return {reinterpret_cast<value_of<E> *>((*array_)->elements), (*array_)->rows, (*array_)->columns};
+  }
+
+  /// Makes it rows times columns elements, none of them negative; a block of that product is left where it is.
+  matrix_view<value_of<E>> resize(std::int64_t rows, std::int64_t columns) {
+    constexpr std::int64_t most = std::numeric_limits<std::int32_t>::max();
+    require(array_ && rows <= most && columns <= most && rows * columns <= most, no_memory);
+    require(set_product(rows * columns), no_memory);
+    (*array_)->rows = static_cast<std::int32_t>(rows);
+    (*array_)->columns = static_cast<std::int32_t>(columns);
+    return view();
+  }
+  void clear() noexcept {
+    if (!host::has_block(array_)) return;
+    try {
+      (void)set_product(0);
+    } catch (...) {  // a refusal: the sizes become 0 nevertheless
+    }
+    if (host::has_block(array_)) (*array_)->rows = (*array_)->columns = 0;
+  }
+
+ private:
+  bool set_product(std::int64_t count) {
+    if (host::has_block(array_) && detail::product(**array_) == count) return true;
+    matrix_handle<E> array = array_;
+    const auto size = static_cast<std::uint64_t>(count);
+    using element = host::element_of<typename E::matrix_block>;
+    return host::request_resize(host::type_of<element>, 2, &array, size, size) && host::has_block(array_);
+  }
+
+  matrix_handle<E> array_;
+};
+
+/// A scalar result. A failure makes it NaN. A null address is allowed.
+template <class T>
+class result {
+ public:
+  explicit result(T *address) noexcept : address_(address) {}
+  void set(T value) noexcept {
+    if (address_) *address_ = value;
+  }
+  void clear() noexcept { set(std::numeric_limits<T>::quiet_NaN()); }
+
+ private:
+  T *address_;
+};
+
+/// Workspace of the caller, empty again whenever the call ends.
+template <class E>
+class scratch {
+ public:
+  scratch(handle<E> array) noexcept : array_(array) {}
+  scratch(const scratch &) = delete;
+  scratch &operator=(const scratch &) = delete;
+  ~scratch() { array_.clear(); }
+
+  /// Throws no_scratch for a null handle. `count` elements, undefined.
+  std::span<value_of<E>> resize(std::int64_t count) {
+    require(present(), no_scratch);
+    return array_.resize(count);
+  }
+  [[nodiscard]] bool present() const noexcept { return array_.present(); }
+  [[nodiscard]] const void *block() const noexcept { return array_.block(); }
+
+  /// Refuses workspace that is also another array of the call: sizing it would pull that away.
+  template <class... Arrays>
+  void keep_apart_from(const Arrays &...others) const {
+    require(!block() || ((others.block() != block()) && ...), bad_option);
+  }
+
+ private:
+  output<E> array_;
+};
+
+/// Runs an operation: its failure, or whatever else it throws, becomes the status, and the outputs are emptied.
+template <class Work, class... Outputs>
+std::int32_t toolkit_call(Work &&work, Outputs &...outputs) noexcept {
+  std::int32_t code = success;
+  try {
+    const qsrfhs::mkl_runtime::use computing;
+    std::forward<Work>(work)();
+  } catch (...) {
+    code = status_of_current_exception();
+  }
+  if (code < 0) (outputs.clear(), ...);
+  return code;
+}
+
+}  // namespace toolkit
