@@ -1,0 +1,140 @@
+// Linear convolution of plain vectors and matrices, directly and through Fourier transforms. The families of
+// convolution and correlation are this plus sizes and orders. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <algorithm>
+#include <cstdint>
+#include <span>
+
+#include "toolkit/arithmetic.hpp"
+#include "toolkit/frame.hpp"
+#include "toolkit/transform_slot.hpp"
+
+namespace toolkit {
+
+enum class method : std::int32_t { direct = 0, fourier = 1 };
+
+/// How a record enters a convolution: as it stands, or, for a correlation, reversed and conjugated.
+enum class order { forward, reversed };
+
+/// Throws bad_option for a number that is no method.
+inline method checked_method(std::int32_t number) {
+  require(number == 0 || number == 1, bad_option);
+  return static_cast<method>(number);
+}
+
+/// Smallest number not below `least` without prime factors above 7.
+constexpr std::int64_t smooth_length(std::int64_t least) noexcept {
+  for (std::int64_t n = least;; ++n) {
+    std::int64_t rest = n;
+    for (const int prime : {7, 5, 3, 2})
+      while (rest % prime == 0) rest /= prime;
+    if (rest == 1) return n;
+  }
+}
+
+/// Copies a record, of the same or of the real type, to the front of `to` and returns what lies behind it.
+template <class T, class U>
+T *copy_record(const U *x, std::int64_t n, order order, T *to) noexcept {
+  if (order == order::forward) return std::copy_n(x, n, to);
+  for (std::int64_t i = 0; i < n; ++i) to[i] = conjugate(x[n - 1 - i]);
+  return to + n;
+}
+
+inline constexpr std::int32_t default_block = 100'000;
+
+/// out += a * b (convolution), the shorter record sample by sample over the longer one in pieces of `block` samples.
+/// The order of the sums in one element does not depend on the block.
+template <class T>
+void add_convolution(std::span<const T> a, std::span<const T> b, std::int32_t block, T *out) noexcept {
+  constexpr std::size_t worth_a_call = 25;
+  if (a.size() > b.size()) std::swap(a, b);
+  if (block < 1) block = default_block;
+  for (std::size_t i = 0; i < a.size(); ++i) {
+    if (b.size() < worth_a_call) {
+      for (std::size_t j = 0; j < b.size(); ++j) out[i + j] += product(a[i], b[j]);
+      continue;
+    }
+    for (std::size_t done = 0; done < b.size(); done += static_cast<std::size_t>(block)) {
+      const std::size_t piece = std::min(b.size() - done, static_cast<std::size_t>(block));
+      axpy(static_cast<std::int32_t>(piece), a[i], b.data() + done, out + i + done);
+    }
+  }
+}
+
+/// The zero-padded record, both spectra, and the result of a Fourier convolution, all in the caller's scratch. Matrices
+/// have rows, vectors one row.
+template <class E>
+class fourier_convolution {
+ public:
+  using value = value_of<E>;
+  using bin = value_of<complex_of<E>>;
+
+  /// Throws no_transform when there are more points than a transform may have. Sizes nothing.
+  explicit fourier_convolution(std::int64_t length)
+      : rows_(1), columns_(checked(length)), kind_(vector_transform<E>(columns_, scaling::backward)) {}
+  fourier_convolution(std::int64_t rows, std::int64_t columns)
+      : rows_(checked(rows)), columns_(checked(columns)), kind_(matrix_transform<E>(rows_, columns_)) {
+    check_transform_size(rows_ * columns_);
+  }
+
+  /// load_x and load_y fill a zero-padded record: load(first element, elements per row). Without load_y, x is
+  /// convolved with itself. Returns the first element of the result, which has as many columns as the padded record.
+  template <class LoadX, class LoadY>
+  const value *run(scratch<E> &room, transform_slot &slot, LoadX load_x, LoadY load_y, bool with_itself) const {
+    const std::int64_t record_size = padded(rows_ * columns_);
+    const std::int64_t spectrum_size =
+        is_complex<E> ? record_size : padded(rows_ == 1 ? columns_ + 2 : 2 * record_size);
+    const auto memory = room.resize(record_size + (with_itself ? 1 : 2) * spectrum_size);
+    value *const record = memory.data();
+    bin *const first = reinterpret_cast<bin *>(record + record_size);
+    bin *const second = with_itself ? first : reinterpret_cast<bin *>(record + record_size + spectrum_size);
+
+    const transform &fourier = slot.get(kind_);
+    load_x(record, columns_);
+    fourier.forward(record, first);
+    if (!with_itself) {
+      load_y(record, columns_);
+      fourier.forward(record, second);
+    }
+    const std::int64_t used = is_complex<E> ? columns_ : columns_ / 2 + 1;
+    for (std::int64_t r = 0; r < rows_; ++r) multiply(first + r * columns_, second + r * columns_, used);
+    fourier.backward(first, record);
+    return record;
+  }
+  [[nodiscard]] std::int64_t rows() const noexcept { return rows_; }
+  [[nodiscard]] std::int64_t columns() const noexcept { return columns_; }
+
+ private:
+  static std::int64_t checked(std::int64_t length) {
+    check_transform_size(length);
+    length = smooth_length(length);
+    check_transform_size(length);
+    return length;
+  }
+  /// Keeps what follows on a 64-byte boundary.
+  static std::int64_t padded(std::int64_t n) noexcept { return (n + 15) / 16 * 16; }
+
+  static void multiply(bin *a, const bin *b, std::int64_t n) noexcept {
+    for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);
+  }
+
+  std::int64_t rows_, columns_;
+  transform_kind kind_;
+};
+
+/// Full convolution of two vectors through transforms, x in the given order, to `out`.
+template <class E, class U, class V>
+void fourier_convolve(const fourier_convolution<E> &plan, std::span<const U> x, order order_of_x, std::span<const V> y,
+                      bool with_itself, scratch<E> &room, transform_slot &slot, std::span<value_of<E>> out) {
+  const auto load = [](const auto &from, order order) {
+    return [from, order](value_of<E> *to, std::int64_t columns) {
+      value_of<E> *rest = copy_record(from.data(), static_cast<std::int64_t>(from.size()), order, to);
+      std::fill(rest, to + columns, value_of<E>{});
+    };
+  };
+  const value_of<E> *result = plan.run(room, slot, load(x, order_of_x), load(y, order::forward), with_itself);
+  std::copy_n(result, out.size(), out.begin());
+}
+
+}  // namespace toolkit
