@@ -1,11 +1,13 @@
-// Products as they are defined, without the recovery of infinities that std::complex does, and BLAS by type.
-// SPDX-License-Identifier: MIT
+// Loops and BLAS calls by type. Products are as they are defined, without the recovery of infinities that std::complex
+// does. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <mkl_cblas.h>
 
 #include <complex>
 #include <cstdint>
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
 
 namespace toolkit {
 
@@ -58,6 +60,40 @@ inline void scale(std::int32_t n, float a, std::complex<float> *x) noexcept {
 }
 inline void scale(std::int32_t n, double a, std::complex<double> *x) noexcept {
   cblas_zdscal(n, a, x, 1);
+}
+
+/// out[k] = conj(x[n - 1 - k]); x and out share no memory.
+inline void reverse_conjugate(const std::complex<float> *x, std::complex<float> *out, std::int64_t n) noexcept {
+  qsrfhs::kernels::active().reverse_conjugate(reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out),
+                                              static_cast<std::size_t>(n));
+}
+template <class T>
+void reverse_conjugate(const T *x, T *out, std::int64_t n) noexcept {
+  for (std::int64_t k = 0; k < n; ++k) out[k] = conjugate(x[n - 1 - k]);
+}
+
+/// a[k] *= b[k]; a and b may be the same.
+inline void multiply(std::complex<float> *a, const std::complex<float> *b, std::int64_t n) noexcept {
+  qsrfhs::kernels::active().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b),
+                                     static_cast<std::size_t>(n));
+}
+inline void multiply(std::complex<double> *a, const std::complex<double> *b, std::int64_t n) noexcept {
+  for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);
+}
+
+/// out[k] = |x[k]|^2 * factor: the sum in the element's type, the product in double. `mirror`, unless null, receives
+/// the same in reverse order.
+inline void scaled_power(const std::complex<float> *x, float *out, float *mirror, double factor,
+                         std::int64_t n) noexcept {
+  qsrfhs::kernels::active().scaled_power(reinterpret_cast<const float *>(x), out, mirror, factor,
+                                         static_cast<std::size_t>(n));
+}
+inline void scaled_power(const std::complex<double> *x, double *out, double *mirror, double factor,
+                         std::int64_t n) noexcept {
+  for (std::int64_t k = 0; k < n; ++k) {
+    out[k] = (x[k].real() * x[k].real() + x[k].imag() * x[k].imag()) * factor;
+    if (mirror) mirror[n - 1 - k] = out[k];
+  }
 }
 
 }  // namespace toolkit

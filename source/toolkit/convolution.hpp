@@ -37,7 +37,10 @@ constexpr std::int64_t smooth_length(std::int64_t least) noexcept {
 template <class T, class U>
 T *copy_record(const U *x, std::int64_t n, order order, T *to) noexcept {
   if (order == order::forward) return std::copy_n(x, n, to);
-  for (std::int64_t i = 0; i < n; ++i) to[i] = conjugate(x[n - 1 - i]);
+  if constexpr (std::is_same_v<T, U>)
+    reverse_conjugate(x, to, n);
+  else
+    std::reverse_copy(x, x + n, to);
   return to + n;
 }
 
@@ -114,10 +117,6 @@ class fourier_convolution {
   }
   /// Keeps what follows on a 64-byte boundary.
   static std::int64_t padded(std::int64_t n) noexcept { return (n + 15) / 16 * 16; }
-
-  static void multiply(bin *a, const bin *b, std::int64_t n) noexcept {
-    for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);
-  }
 
   std::int64_t rows_, columns_;
   transform_kind kind_;

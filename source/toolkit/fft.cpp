@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstdint>
 
+#include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
 #include "toolkit/transform_slot.hpp"
 
@@ -13,7 +14,8 @@ namespace {
 /// Writes the upper half of a real record's spectrum, the mirrored conjugate of the lower one.
 template <class Complex>
 void complete_spectrum(Complex *bins, std::int64_t n) noexcept {
-  for (std::int64_t k = n / 2 + 1; k < n; ++k) bins[k] = std::conj(bins[n - k]);
+  const std::int64_t mirrored = (n - 1) / 2;
+  reverse_conjugate(bins + 1, bins + n - mirrored, mirrored);
 }
 
 template <class E>

@@ -82,27 +82,36 @@ struct rotations {
   }
 };
 
-/// Multiplies samples by the window whose polynomial is given; n is the window's period and the number of samples.
+/// Multiplies samples by the window whose polynomial is given; n is the window's period and the number of samples. As
+/// w[i] = w[n - i], half of the window is computed.
 template <int terms, class T, class Real = decltype(std::real(T{}))>
 void apply_polynomial(const double *coefficients, T *data, std::int64_t n) noexcept {
   double p[terms];
   std::copy_n(coefficients, terms, p);
+  const auto at = [&p](double u) {
+    double w = p[terms - 1];
+    for (int k = terms - 2; k >= 0; --k) w = w * u + p[k];
+    return w;
+  };
   const double step = std::numbers::pi / static_cast<double>(n);
   const rotations table(step, std::min(n, rotations::block));
-  for (std::int64_t first = 0; first < n; first += rotations::block) {
-    // Every block starts from an angle of its own, so that errors do not add up; the nearer end of the period keeps
-    // the angle small where the window is.
-    const double angle = step * static_cast<double>(2 * first > n ? first - n : first);
+  const std::int64_t pairs = (n - 1) / 2;
+  data[0] *= static_cast<Real>(at(0.0));
+  if (n % 2 == 0) data[n / 2] *= static_cast<Real>(at(1.0));
+  for (std::int64_t first = 1; first <= pairs; first += rotations::block) {
+    // Every block starts from an angle of its own, so that errors do not add up.
+    const double angle = step * static_cast<double>(first);
     const double c = std::cos(angle), s = std::sin(angle);
-    const std::int64_t count = std::min(n - first, rotations::block);
-    T *const block = data + first;
+    const std::int64_t count = std::min(pairs - first + 1, rotations::block);
+    Real w[rotations::block];
     for (std::int64_t j = 0; j < count; ++j) {
       const double sine = s * table.cosine[j] + c * table.sine[j];
-      const double u = sine * sine;
-      double w = p[terms - 1];
-      for (int k = terms - 2; k >= 0; --k) w = w * u + p[k];
-      block[j] *= static_cast<Real>(w);
+      w[j] = static_cast<Real>(at(sine * sine));
     }
+    T *const rising = data + first;
+    T *const falling = data + n - first;
+    for (std::int64_t j = 0; j < count; ++j) rising[j] *= w[j];
+    for (std::int64_t j = 0; j < count; ++j) falling[-j] *= w[j];
   }
 }
 

@@ -28,15 +28,19 @@ class test_array {
   static constexpr std::size_t header = offsetof(Block, elements);
 
   test_array() = default;  // a null block
-  explicit test_array(std::size_t count) : block_(make(count)) { block_->count = static_cast<std::int32_t>(count); }
+  explicit test_array(std::size_t count) : block_(make(count)) {
+    // Not through the member: a block of few elements is shorter than its type.
+    const auto word = static_cast<std::int32_t>(count);
+    std::memcpy(block_, &word, sizeof word);
+  }
   test_array(std::initializer_list<element> values) : test_array(std::span(values.begin(), values.size())) {}
   explicit test_array(std::span<const element> values) : test_array(values.size()) {
     if (!values.empty()) std::memcpy(block_->elements, values.data(), values.size_bytes());
   }
   test_array(std::int32_t rows, std::int32_t columns)
       : block_(make(static_cast<std::size_t>(rows) * static_cast<std::size_t>(columns))) {
-    block_->rows = rows;
-    block_->columns = columns;
+    const std::int32_t words[] = {rows, columns};
+    std::memcpy(block_, words, sizeof words);
   }
   test_array(const test_array &) = delete;
   test_array &operator=(const test_array &) = delete;

@@ -10,6 +10,7 @@
 #include "resampler.inl"
 #include "rms.inl"
 #include "spectrum.inl"
+#include "transform.inl"
 
 static constexpr kernel_table table = {
     .copy = &copy,
@@ -17,6 +18,10 @@ static constexpr kernel_table table = {
     .accumulate_power = &accumulate_power,
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
     .order_power = &order_power,
+
+    .reverse_conjugate = &reverse_conjugate,
+    .scaled_power = &scaled_power,
+    .multiply = &multiply,
     .scale = &scale,
     .divide = &divide,
     .divide_by_value = &divide_by_value,

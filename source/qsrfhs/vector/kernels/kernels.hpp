@@ -29,6 +29,15 @@ struct kernel_table {
                                              const float *ahead, std::size_t ahead_count, std::size_t n);
   /// Puts accumulated powers into their order, n real.
   void (*order_power)(float *power, std::size_t n);
+
+                                             const float *ahead, std::size_t n);
+  /// out[k] = conj(x[n - 1 - k]), n complex. x and out share no memory.
+  void (*reverse_conjugate)(const float *x, float *out, std::size_t n);
+  /// out[k] = (re(x[k])^2 + im(x[k])^2) * factor, n complex, the product in double precision. `mirror`, unless null,
+  /// receives the same values in reverse order.
+  void (*scaled_power)(const float *x, float *out, float *mirror, double factor, std::size_t n);
+  /// a[k] *= b[k], n complex. a and b may be the same.
+  void (*multiply)(float *a, const float *b, std::size_t n);
   /// x[k] *= factor, n real.
   void (*scale)(float *x, float factor, std::size_t n);
 

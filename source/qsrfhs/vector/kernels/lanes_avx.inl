@@ -142,4 +142,30 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   columns[1] = {_mm256_castpd_ps(_mm256_unpackhi_pd(a, b))};
   columns[2] = {_mm256_castpd_ps(_mm256_unpacklo_pd(c, d))};
   columns[3] = {_mm256_castpd_ps(_mm256_unpackhi_pd(c, d))};
+
+/// The eight floats in reverse order.
+static inline f8 reverse(f8 a) {
+  return {_mm256_permute_ps(_mm256_permute2f128_ps(a.v, a.v, 0x01), 0x1b)};
+}
+
+// Four complex values, real parts first.
+
+static inline f8 reverse_pairs(f8 a) {
+  return {_mm256_permute_ps(_mm256_permute2f128_ps(a.v, a.v, 0x01), 0x4e)};
+}
+static inline f8 conjugate(f8 a) {
+  return {_mm256_xor_ps(a.v, _mm256_setr_ps(0.F, -0.F, 0.F, -0.F, 0.F, -0.F, 0.F, -0.F))};
+}
+static inline f8 multiply_pairs(f8 a, f8 b) {
+  const __m256 by_re = _mm256_mul_ps(a.v, _mm256_moveldup_ps(b.v));
+  const __m256 by_im = _mm256_mul_ps(_mm256_permute_ps(a.v, 0xb1), _mm256_movehdup_ps(b.v));
+  return {_mm256_addsub_ps(by_re, by_im)};
+}
+
+/// Each float times `factor`, rounded once more than the product in double is.
+static inline f8 multiply_in_double(f8 a, double factor) {
+  const __m256d factors = _mm256_set1_pd(factor);
+  const __m256d low = _mm256_mul_pd(_mm256_cvtps_pd(_mm256_castps256_ps128(a.v)), factors);
+  const __m256d high = _mm256_mul_pd(_mm256_cvtps_pd(_mm256_extractf128_ps(a.v, 1)), factors);
+  return {_mm256_insertf128_ps(_mm256_castps128_ps256(_mm256_cvtpd_ps(low)), _mm256_cvtpd_ps(high), 1)};
 }

@@ -141,4 +141,36 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   load_four_columns(rows, index, low);
   load_four_columns(rows, index + 4, high);
   for (int i = 0; i < 4; ++i) columns[i] = {low[i], high[i]};
+
+/// The eight floats in reverse order.
+static inline f8 reverse(f8 a) {
+  return {_mm_shuffle_ps(a.high, a.high, 0x1b), _mm_shuffle_ps(a.low, a.low, 0x1b)};
+}
+
+// Four complex values, real parts first.
+
+static inline f8 reverse_pairs(f8 a) {
+  return {_mm_shuffle_ps(a.high, a.high, 0x4e), _mm_shuffle_ps(a.low, a.low, 0x4e)};
+}
+static inline f8 conjugate(f8 a) {
+  const __m128 signs = _mm_setr_ps(0.F, -0.F, 0.F, -0.F);
+  return {_mm_xor_ps(a.low, signs), _mm_xor_ps(a.high, signs)};
+}
+static inline __m128 multiply_two(__m128 a, __m128 b) {
+  const __m128 by_re = _mm_mul_ps(a, _mm_shuffle_ps(b, b, 0xa0));
+  const __m128 by_im = _mm_mul_ps(_mm_shuffle_ps(a, a, 0xb1), _mm_shuffle_ps(b, b, 0xf5));
+  return _mm_add_ps(by_re, _mm_xor_ps(by_im, _mm_setr_ps(-0.F, 0.F, -0.F, 0.F)));
+}
+static inline f8 multiply_pairs(f8 a, f8 b) {
+  return {multiply_two(a.low, b.low), multiply_two(a.high, b.high)};
+}
+
+static inline __m128 multiply_four_in_double(__m128 a, __m128d factors) {
+  const __m128 low = _mm_cvtpd_ps(_mm_mul_pd(_mm_cvtps_pd(a), factors));
+  return _mm_movelh_ps(low, _mm_cvtpd_ps(_mm_mul_pd(_mm_cvtps_pd(_mm_movehl_ps(a, a)), factors)));
+}
+/// Each float times `factor`, rounded once more than the product in double is.
+static inline f8 multiply_in_double(f8 a, double factor) {
+  const __m128d factors = _mm_set1_pd(factor);
+  return {multiply_four_in_double(a.low, factors), multiply_four_in_double(a.high, factors)};
 }
