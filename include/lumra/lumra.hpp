@@ -4,6 +4,7 @@
 
 #include <lumra/lumra.h>
 
+#include <algorithm>
 #include <array>
 #include <complex>
 #include <cstddef>
@@ -537,5 +538,195 @@ class resampler_descriptor {
   detail::private_owner owner_;
   lumra_resampler_descriptor *descriptor_ = nullptr;
 };
+
+// The typed toolkit over spans. T is float, double or std::complex of one of them; the export is chosen by it.
+
+enum class part : std::int32_t { full = 0, same = 1, valid = 2 };
+enum class method : std::int32_t { direct = 0, fourier = 1 };
+enum class normalisation : std::int32_t { none = 0, unbiased = 1, biased = 2 };
+enum class shift : std::int32_t { none = 0, centred = 1 };
+
+/// Sum-of-cosines windows of apply_window.
+enum class cosine_window : std::int32_t {
+  rectangular = 0,
+  hann = 1,
+  hamming = 2,
+  blackman_harris_3 = 3,
+  exact_blackman = 4,
+  blackman = 5,
+  flat_top = 6,
+  blackman_harris_4 = 7,
+  blackman_harris_7 = 8,
+  low_sidelobe = 9,
+  blackman_nuttall = 11,
+};
+
+namespace detail {
+template <class T>
+struct parts {
+  using real = T;
+  using complex = std::complex<T>;
+};
+template <class T>
+struct parts<std::complex<T>> {
+  using real = T;
+  using complex = std::complex<T>;
+};
+template <class T>
+using real_of = typename parts<T>::real;
+template <class T>
+using complex_of = typename parts<T>::complex;
+template <class T, class U>
+using common_of = std::conditional_t<std::is_floating_point_v<T>, U, T>;
+
+template <class T>
+inline constexpr int letter = std::is_same_v<T, float>    ? 0
+                              : std::is_same_v<T, double> ? 1
+                              : sizeof(T) == 8            ? 2
+                                                          : 3;
+
+/// The one of four exports that has T's letter: s, d, c, z.
+template <class T, class S, class D, class C, class Z>
+constexpr auto choose(S s, D d, C c, Z z) noexcept {
+  if constexpr (letter<T> == 0)
+    return s;
+  else if constexpr (letter<T> == 1)
+    return d;
+  else if constexpr (letter<T> == 2)
+    return c;
+  else
+    return z;
+}
+}  // namespace detail
+
+/// What the toolkit keeps between calls: work arrays and the latest transform. Calls of equal lengths and types with
+/// one plan make no new transform and, once the arrays have grown, no new memory. One thread at a time.
+template <class T>
+class plan {
+ public:
+  plan() = default;
+  plan(plan &&other) noexcept
+      : x(std::move(other.x)),
+        y(std::move(other.y)),
+        out(std::move(other.out)),
+        bins(std::move(other.bins)),
+        magnitudes(std::move(other.magnitudes)),
+        scratch(std::move(other.scratch)),
+        transform_scratch(std::move(other.transform_scratch)),
+        bins_scratch(std::move(other.bins_scratch)),
+        tables(std::move(other.tables)),
+        slot_(std::exchange(other.slot_, nullptr)) {}
+  plan &operator=(plan &&) = delete;
+  ~plan() { qsHost_ReleaseTransform(&slot_); }
+
+  [[nodiscard]] void **slot() noexcept { return &slot_; }
+
+  // Results of the functions below lie in out, bins and magnitudes until the next call with the plan.
+  host_array<T> x{0}, y{0}, out{0};
+  host_array<detail::complex_of<T>> bins{0};
+  host_array<detail::real_of<T>> magnitudes{0};
+  host_array<T> scratch{0}, transform_scratch{0};
+  host_array<detail::complex_of<T>> bins_scratch{0};
+  host_array<double> tables{0};
+
+ private:
+  void *slot_ = nullptr;
+};
+
+namespace detail {
+template <class T>
+void load(host_array<T> &to, std::type_identity_t<std::span<const T>> from) {
+  to.resize(from.size());
+  std::copy(from.begin(), from.end(), to.elements().begin());
+}
+}  // namespace detail
+
+/// Bins of the discrete Fourier transform of size points (0: as many as samples).
+template <class T>
+std::span<const detail::complex_of<T>> fft(plan<T> &plan, std::type_identity_t<std::span<const T>> samples,
+                                           std::int32_t size = 0, shift order = shift::none) {
+  constexpr auto run =
+      detail::choose<T>(&qsRFPELTA_s1DFFTH, &qsRFPELTA_d1DFFTH, &qsRFPELTA_c1DFFTH, &qsRFPELTA_z1DFFTH);
+  detail::load(plan.x, samples);
+  check(run(plan.x.get(), plan.bins.get(), size, static_cast<std::int32_t>(order), plan.scratch.get(), plan.slot()));
+  return plan.bins.elements();
+}
+
+/// The record, of type T, that has these bins.
+template <class T>
+std::span<const T> inverse_fft(plan<T> &plan, std::type_identity_t<std::span<const detail::complex_of<T>>> spectrum,
+                               shift order = shift::none) {
+  constexpr auto run =
+      detail::choose<T>(&qsRFPELTA_s1DInvFFTH, &qsRFPELTA_d1DInvFFTH, &qsRFPELTA_c1DInvFFTH, &qsRFPELTA_z1DInvFFTH);
+  // A spectrum that the plan itself holds needs no copy.
+  if (spectrum.data() != plan.bins.elements().data() || spectrum.size() != plan.bins.size())
+    detail::load(plan.bins, spectrum);
+  check(run(plan.bins.get(), plan.out.get(), static_cast<std::int32_t>(order), plan.bins_scratch.get(), plan.slot()));
+  return plan.out.elements();
+}
+
+template <class T>
+std::span<const T> convolve(plan<T> &plan, std::type_identity_t<std::span<const T>> x,
+                            std::type_identity_t<std::span<const T>> y, part kept = part::full,
+                            method how = method::fourier, std::int32_t block_size = 0) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_s1DConvolutionH, &qsRFPELTA_d1DConvolutionH,
+                                         &qsRFPELTA_c1DConvolutionH, &qsRFPELTA_z1DConvolutionH);
+  detail::load(plan.x, x);
+  detail::load(plan.y, y);
+  check(run(plan.x.get(), plan.y.get(), plan.out.get(), static_cast<std::int32_t>(kept), static_cast<std::int32_t>(how),
+            block_size, plan.scratch.get(), plan.transform_scratch.get(), plan.slot()));
+  return plan.out.elements();
+}
+
+/// Cross-correlation; the plan has the type of the lags. One of the two records may be real where the lags are complex.
+template <class T, class X, class Y>
+std::span<const T> correlate(plan<T> &plan, std::span<X> x, std::span<Y> y, normalisation norm = normalisation::none,
+                             method how = method::fourier, std::int32_t block_size = 0) {
+  using first = std::remove_const_t<X>;
+  using second = std::remove_const_t<Y>;
+  static_assert(std::is_same_v<T, detail::common_of<first, second>>, "the plan must have the type of the lags");
+  host_array<first> real_x(0);
+  host_array<second> real_y(0);
+  const auto call = [&](auto run, auto &from_x, auto &from_y) {
+    detail::load(from_x, x);
+    detail::load(from_y, y);
+    check(run(from_x.get(), from_y.get(), plan.out.get(), static_cast<std::int32_t>(how),
+              static_cast<std::int32_t>(norm), block_size, plan.scratch.get(), plan.transform_scratch.get(),
+              plan.slot()));
+  };
+  if constexpr (std::is_same_v<first, second>) {
+    call(detail::choose<T>(&qsRFPELTA_s1DCorrelationH, &qsRFPELTA_d1DCorrelationH, &qsRFPELTA_c1DCorrelationH,
+                           &qsRFPELTA_z1DCorrelationH),
+         plan.x, plan.y);
+  } else if constexpr (std::is_floating_point_v<first>) {
+    static_assert(std::is_same_v<std::complex<first>, second>, "one precision");
+    call(detail::choose<T>(0, 0, &qsRFPELTA_sc1DCorrelationH, &qsRFPELTA_dz1DCorrelationH), real_x, plan.y);
+  } else {
+    static_assert(std::is_same_v<first, std::complex<second>>, "one precision");
+    call(detail::choose<T>(0, 0, &qsRFPELTA_cs1DCorrelationH, &qsRFPELTA_zd1DCorrelationH), plan.x, real_y);
+  }
+  return plan.out.elements();
+}
+
+/// |X[k]|^2 / N^2, bin 0 first.
+template <class T>
+std::span<const detail::real_of<T>> power_spectrum(plan<T> &plan, std::type_identity_t<std::span<const T>> samples) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sPowerSpectrumH, &qsRFPELTA_dPowerSpectrumH,
+                                         &qsRFPELTA_cPowerSpectrumH, &qsRFPELTA_zPowerSpectrumH);
+  detail::load(plan.x, samples);
+  check(run(plan.x.get(), plan.magnitudes.get(), plan.scratch.get(), plan.slot()));
+  return plan.magnitudes.elements();
+}
+
+/// The samples times a window; with `normalised` its first coefficient is 1.
+template <class T>
+std::span<const T> apply_window(plan<T> &plan, std::type_identity_t<std::span<const T>> samples, cosine_window type,
+                                bool normalised = false) {
+  constexpr auto run =
+      detail::choose<T>(&qsRFPELTA_sAllCosWinH, &qsRFPELTA_dAllCosWinH, &qsRFPELTA_cAllCosWinH, &qsRFPELTA_zAllCosWinH);
+  detail::load(plan.out, samples);
+  check(run(plan.out.get(), static_cast<std::int32_t>(type), normalised, plan.tables.get()));
+  return plan.out.elements();
+}
 
 }  // namespace lumra
