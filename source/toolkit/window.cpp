@@ -128,7 +128,7 @@ void apply_window(output<E> &data, std::int32_t type, bool normalised, scratch<d
     return;
   }
   room.keep_apart_from(data);
-  const auto tables = room.resize(4 * window.terms);
+  const auto tables = room.resize(std::int64_t{4} * window.terms);
   expand(window, divisor, tables);
   switch (window.terms) {
     case 2:
