@@ -15,7 +15,7 @@
 #include <random>
 #include <vector>
 
-#ifdef LUMRA_PEER_FFTW_VOLK
+#if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 #include <fftw3.h>
 #include <volk/volk.h>
 #endif
@@ -87,7 +87,7 @@ void mkl_transforms_alone(benchmark::State &state) {
   report(state, count);
 }
 
-#ifdef LUMRA_PEER_FFTW_VOLK
+#if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 void fftw_with_volk(benchmark::State &state) {
   const auto n = static_cast<unsigned>(state.range(0));
   const aligned<sample> work(n), spectrum(n);
@@ -148,7 +148,7 @@ double best(const std::vector<double> &times) {
   ->Arg(256)->Arg(1024)->Arg(4096)->Arg(65536)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best)
 BENCHMARK(lumra_windowed_fft) SIZES;
 BENCHMARK(mkl_transforms_alone) SIZES;
-#ifdef LUMRA_PEER_FFTW_VOLK
+#if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 BENCHMARK(fftw_with_volk) SIZES;
 #endif
 #ifdef LUMRA_PEER_LIQUID

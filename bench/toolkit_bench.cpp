@@ -4,7 +4,7 @@
 #include <mkl_cblas.h>
 #include <mkl_dfti.h>
 #include <lumra/lumra.hpp>
-#ifdef LUMRA_BENCH_FFTW
+#ifdef LUMRA_PEER_FFTW
 #include <fftw3.h>
 #endif
 
@@ -121,7 +121,7 @@ void fft_mkl_in_place(benchmark::State &state) {
   rate(state, n);
 }
 
-#ifdef LUMRA_BENCH_FFTW
+#ifdef LUMRA_PEER_FFTW
 template <class T>
 void fft_fftw(benchmark::State &state) {
   const auto size = static_cast<int>(state.range(0));
@@ -238,7 +238,7 @@ void transform_sizes(benchmark::internal::Benchmark *b) {
   for (const int n : {16, 1024, 4096, 16384, 65536, 105000, 1 << 20}) b->Arg(n);
 }
 
-#ifdef LUMRA_BENCH_FFTW
+#ifdef LUMRA_PEER_FFTW
 #define FFT(T)                                            \
   BENCHMARK(fft_mkl_in_place<T>)->Apply(transform_sizes); \
   BENCHMARK(fft_mkl<T>)->Apply(transform_sizes);          \

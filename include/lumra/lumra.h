@@ -8,8 +8,8 @@
 #include <lumra/library_info.h>
 #include <lumra/session.h>
 #include <lumra/status.h>
-#include <lumra/vector_utilities.h>
 #include <lumra/toolkit.h>
+#include <lumra/vector_utilities.h>
 #include <lumra/version.h>
 
 #endif

@@ -18,7 +18,6 @@ static constexpr kernel_table table = {
     .accumulate_power = &accumulate_power,
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
     .order_power = &order_power,
-
     .reverse_conjugate = &reverse_conjugate,
     .scaled_power = &scaled_power,
     .multiply = &multiply,
@@ -36,7 +35,6 @@ static constexpr kernel_table table = {
     .sum_power = &sum_power,
     .sum_power_and_peak = &sum_power_and_peak,
     .lookup = &lookup,
-
     .weigh = &weigh,
     .weigh_and_rotate = &weigh_and_rotate,
 };

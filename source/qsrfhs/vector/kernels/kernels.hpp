@@ -30,7 +30,6 @@ struct kernel_table {
   /// Puts accumulated powers into their order, n real.
   void (*order_power)(float *power, std::size_t n);
 
-                                             const float *ahead, std::size_t n);
   /// out[k] = conj(x[n - 1 - k]), n complex. x and out share no memory.
   void (*reverse_conjugate)(const float *x, float *out, std::size_t n);
   /// out[k] = (re(x[k])^2 + im(x[k])^2) * factor, n complex, the product in double precision. `mirror`, unless null,

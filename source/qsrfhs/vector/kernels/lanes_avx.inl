@@ -142,6 +142,7 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   columns[1] = {_mm256_castpd_ps(_mm256_unpackhi_pd(a, b))};
   columns[2] = {_mm256_castpd_ps(_mm256_unpacklo_pd(c, d))};
   columns[3] = {_mm256_castpd_ps(_mm256_unpackhi_pd(c, d))};
+}
 
 /// The eight floats in reverse order.
 static inline f8 reverse(f8 a) {

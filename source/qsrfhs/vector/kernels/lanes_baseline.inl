@@ -141,6 +141,7 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   load_four_columns(rows, index, low);
   load_four_columns(rows, index + 4, high);
   for (int i = 0; i < 4; ++i) columns[i] = {low[i], high[i]};
+}
 
 /// The eight floats in reverse order.
 static inline f8 reverse(f8 a) {

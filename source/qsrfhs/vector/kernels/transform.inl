@@ -35,7 +35,7 @@ static void scaled_power(const float *x, float *out, float *mirror, double facto
   for (; k < n && !is_aligned(out + k); ++k) scaled_power_1(x + 2 * k, out + k, last ? last - k : nullptr, factor);
   for (; k + 8 <= n; k += 8) {
     f8 re, im;
-    split(load(x + 2 * k), load(x + 2 * k + 8), re, im);
+    load_complex(x + 2 * k, re, im);
     const f8 power = re * re + im * im;
     const f8 scaled = exact ? power * factors : multiply_in_double(power, factor);
     store(out + k, scaled);
