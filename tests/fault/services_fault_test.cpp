@@ -56,7 +56,7 @@ TEST(ServicesFaults, AnArrayIsHadOrNot) {
   for_every_allocation([&] { return qsUtilHS_AllocateArray_CSG(&array, 1 << 20, 1); },
                        [&](std::int64_t status, bool, const std::vector<std::int32_t> &codes) {
                          if (status == 0) return;
-                         EXPECT_EQ(nullptr, record.block);
+                         EXPECT_EQ(nullptr, +record.block);
                          seen_no_block |= status == -33620079;
                          seen_unregistered |= status == -46;
                          if (status == -33620079 && !codes.empty()) {
@@ -71,7 +71,7 @@ TEST(ServicesFaults, AnArrayIsHadOrNot) {
   const lumra_array_block *const block = record.block;
   EXPECT_EQ(0, qsUtilHS_FreeArray_CSG(&array));
   EXPECT_EQ(0, qsUtilHS_AllocateArray_CSG(&array, 1 << 20, 1));
-  EXPECT_EQ(block, record.block);  // the one block that was made: none got lost
+  EXPECT_EQ(block, +record.block);  // the one block that was made: none got lost
   EXPECT_EQ(0, qsUtilHS_FreeArray_CSG(&array));
 }
 

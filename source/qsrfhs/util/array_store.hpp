@@ -10,6 +10,8 @@
 #include <mutex>
 #include <unordered_map>
 
+#include "qsrfhs/util/brief_mutex.hpp"
+
 namespace qsrfhs {
 
 using array_block = lumra_array_block;
@@ -36,7 +38,7 @@ class recycler {
   array_block *take_free(std::uint32_t units) noexcept;
   array_block *take_free_large(std::uint32_t units) noexcept;
 
-  std::mutex mutex_;
+  brief_mutex mutex_;
   std::array<array_block *, large_class + 1> free_{};  // under mutex_; lists through `next`
 };
 
@@ -77,7 +79,7 @@ class cleanup_registry {
 
   void unlink(registration &entry) noexcept;
 
-  mutable std::mutex mutex_;
+  mutable brief_mutex mutex_;
   registration *newest_ = nullptr;                                // under mutex_
   std::unordered_map<const void *, registration> registrations_;  // under mutex_, by object
 };
