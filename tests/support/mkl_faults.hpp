@@ -17,7 +17,7 @@ class [[nodiscard]] fail_at {
 /// DFTI calls since the last fail_at was made.
 int calls() noexcept;
 
-/// Descriptors made and not freed.
+/// Descriptors made and not freed since the test began.
 int live_descriptors() noexcept;
 
 }  // namespace tests::mkl_faults
