@@ -90,21 +90,25 @@ struct element;
 template <>
 struct element<float> {
   using block = lumra_f32_block;
+  using matrix_block = lumra_f32_matrix_block;
   static constexpr std::int32_t code = LUMRA_TYPE_F32;
 };
 template <>
 struct element<double> {
   using block = lumra_f64_block;
+  using matrix_block = lumra_f64_matrix_block;
   static constexpr std::int32_t code = LUMRA_TYPE_F64;
 };
 template <>
 struct element<std::complex<float>> {
   using block = lumra_cf32_block;
+  using matrix_block = lumra_cf32_matrix_block;
   static constexpr std::int32_t code = LUMRA_TYPE_CF32;
 };
 template <>
 struct element<std::complex<double>> {
   using block = lumra_cf64_block;
+  using matrix_block = lumra_cf64_matrix_block;
   static constexpr std::int32_t code = LUMRA_TYPE_CF64;
 };
 }  // namespace detail
@@ -150,6 +154,54 @@ class host_array {
   [[nodiscard]] handle get() const noexcept { return handle_; }
   [[nodiscard]] handle *address() noexcept { return &handle_; }
   [[nodiscard]] handle release() noexcept { return std::exchange(handle_, nullptr); }
+
+ private:
+  [[nodiscard]] bool has_block() const noexcept { return handle_ && *handle_; }
+  [[nodiscard]] T *data() const noexcept { return has_block() ? reinterpret_cast<T *>((*handle_)->elements) : nullptr; }
+
+  handle handle_ = nullptr;
+};
+
+/// An owned matrix in the library's own memory, row by row; T as for host_array.
+template <class T>
+class host_matrix {
+ public:
+  using handle = typename detail::element<T>::matrix_block **;
+
+  host_matrix() = default;
+  host_matrix(std::size_t rows, std::size_t columns) { resize(rows, columns); }
+  host_matrix(host_matrix &&other) noexcept : handle_(std::exchange(other.handle_, nullptr)) {}
+  host_matrix &operator=(host_matrix &&other) noexcept {
+    std::swap(handle_, other.handle_);
+    return *this;
+  }
+  ~host_matrix() { qsHost_ArrayFree(&handle_); }
+
+  /// The elements, row after row; valid until the matrix is resized.
+  [[nodiscard]] std::span<T> elements() noexcept { return {data(), size()}; }
+  [[nodiscard]] std::span<const T> elements() const noexcept { return {data(), size()}; }
+  [[nodiscard]] std::size_t rows() const noexcept {
+    return has_block() ? static_cast<std::size_t>((*handle_)->rows) : 0;
+  }
+  [[nodiscard]] std::size_t columns() const noexcept {
+    return has_block() ? static_cast<std::size_t>((*handle_)->columns) : 0;
+  }
+  [[nodiscard]] std::size_t size() const noexcept { return rows() * columns(); }
+
+  /// The first elements, row after row, stay the first ones whatever the new rows are; new ones are zero.
+  void resize(std::size_t rows, std::size_t columns) {
+    constexpr auto most = static_cast<std::size_t>(std::numeric_limits<std::int32_t>::max());
+    if (rows > most || columns > most || (columns > 0 && rows > most / columns)) throw std::length_error("host_matrix");
+    const std::size_t before = size();
+    const std::size_t count = rows * columns;
+    check(qsHost_ArrayResize(detail::element<T>::code, 2, &handle_, count));
+    (*handle_)->rows = static_cast<std::int32_t>(rows);
+    (*handle_)->columns = static_cast<std::int32_t>(columns);
+    for (T &fresh : elements().subspan(before < count ? before : count)) fresh = T{};
+  }
+
+  /// The handle that C functions take.
+  [[nodiscard]] handle get() const noexcept { return handle_; }
 
  private:
   [[nodiscard]] bool has_block() const noexcept { return handle_ && *handle_; }
@@ -727,6 +779,32 @@ std::span<const T> apply_window(plan<T> &plan, std::type_identity_t<std::span<co
   detail::load(plan.out, samples);
   check(run(plan.out.get(), static_cast<std::int32_t>(type), normalised, plan.tables.get()));
   return plan.out.elements();
+
+// Error vectors, as their C functions document them: b is compared with the reference a. The matrices must agree in the
+// number of elements; e is not resized.
+
+enum class accuracy : std::int32_t {
+  low = LUMRA_ACCURACY_LOW,
+  high = LUMRA_ACCURACY_HIGH,
+  enhanced_performance = LUMRA_ACCURACY_ENHANCED_PERFORMANCE
+};
+
+/// e[i] = |b[i] - a[i]|.
+inline void error_magnitude(const host_matrix<std::complex<float>> &a, const host_matrix<std::complex<float>> &b,
+                            host_matrix<float> &e, accuracy mode = accuracy::high) {
+  check(qsLumraAlgo_CalculateEVM2D(a.get(), b.get(), e.get(), static_cast<std::int32_t>(mode)));
+}
+
+/// e[i] = |b[i]| - |a[i]|.
+inline void magnitude_error(const host_matrix<std::complex<float>> &a, const host_matrix<std::complex<float>> &b,
+                            host_matrix<float> &e, accuracy mode = accuracy::high) {
+  check(qsLumraAlgo_CalculateMagnitudeError2D(a.get(), b.get(), e.get(), static_cast<std::int32_t>(mode)));
+}
+
+/// e[i] = arg(b[i] * conj(a[i])) in radians.
+inline void phase_error(const host_matrix<std::complex<float>> &a, const host_matrix<std::complex<float>> &b,
+                        host_matrix<float> &e, accuracy mode = accuracy::high) {
+  check(qsLumraAlgo_CalculatePhaseError2D(a.get(), b.get(), e.get(), static_cast<std::int32_t>(mode)));
 }
 
 }  // namespace lumra

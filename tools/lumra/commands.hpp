@@ -6,6 +6,7 @@
 
 namespace tool {
 
+void add_evm(CLI::App &program);
 void add_info(CLI::App &program);
 void add_spectrum(CLI::App &program);
 

@@ -96,12 +96,12 @@ picture_type picture_type_of(const std::filesystem::path &file) {
   return suffix == ".png" ? picture_type::png : picture_type::svg;
 }
 
-std::string picture_preamble(picture_type type) {
+std::string picture_preamble(picture_type type, picture_size size) {
   const bool png = type == picture_type::png;
   return fmt::format(
       "set encoding utf8\n"
       "set terminal {} size {},{} font '{}' background rgb 'white'\n",
-      png ? "pngcairo" : "svg dynamic", picture_width, picture_height, png ? "DejaVu Sans,12" : "sans-serif,16");
+      png ? "pngcairo" : "svg dynamic", size.width, size.height, png ? "DejaVu Sans,12" : "sans-serif,16");
 }
 
 std::string gnuplot_text(std::string_view text) {

@@ -11,14 +11,15 @@ namespace tool {
 
 enum class picture_type { png, svg };
 
-/// Pixels of every picture.
-inline constexpr int picture_width = 1280, picture_height = 720;
+struct picture_size {
+  int width, height;  // pixels
+};
 
 /// By the suffix, .png or .svg; throws failure for another one, and when gnuplot is not there.
 picture_type picture_type_of(const std::filesystem::path &file);
 
 /// The beginning of a script: terminal, fonts, encoding.
-std::string picture_preamble(picture_type type);
+std::string picture_preamble(picture_type type, picture_size size);
 
 /// A text as a quoted string of gnuplot; bytes that it or a picture could not show become '?'.
 std::string gnuplot_text(std::string_view text);

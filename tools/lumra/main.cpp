@@ -21,17 +21,19 @@ int fail(int code, std::string text) {
 }
 
 int run(int count, char **arguments) {
-  CLI::App program("Spectra of recorded radio signals", "lumra");
+  CLI::App program("Spectra and error vectors of recorded radio signals", "lumra");
   program.require_subcommand(1);
   program.set_version_flag("--version", "lumra " + lumra::library().version_text);
   tool::add_spectrum(program);
+  tool::add_evm(program);
   tool::add_info(program);
   try {
     program.parse(count, arguments);
   } catch (const CLI::ParseError &error) {
     if (error.get_exit_code() == 0) return program.exit(error);  // help
-    return fail(
-        2, fmt::format("{}; see lumra {}--help", error.what(), program.got_subcommand("spectrum") ? "spectrum " : ""));
+    const auto called = program.get_subcommands();
+    const std::string name = called.empty() ? "" : called.front()->get_name() + " ";
+    return fail(2, fmt::format("{}; see lumra {}--help", error.what(), name));
   }
   if (std::fflush(stdout) != 0)
     throw tool::failure("cannot write the summary: {}", std::generic_category().message(errno));
@@ -45,7 +47,7 @@ int main(int count, char **arguments) {
   try {
     return run(count, arguments);
   } catch (const std::bad_alloc &) {
-    return fail(1, "not enough memory; use a smaller --fft");
+    return fail(1, "not enough memory; a spectrum needs less with a smaller --fft");
   } catch (const std::exception &error) {
     return fail(1, error.what());
   }

@@ -1,12 +1,12 @@
 // lumra spectrum: averaged power spectrum of a recording as summary, CSV and picture. SPDX-License-Identifier: MIT
 #include <fmt/format.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cmath>
 #include <map>
 #include <memory>
 
+#include "arguments.hpp"
 #include "averaged_spectrum.hpp"
 #include "commands.hpp"
 #include "failure.hpp"
@@ -15,6 +15,7 @@
 #include "progress.hpp"
 #include "recording.hpp"
 #include "spectrum_picture.hpp"
+#include "summary.hpp"
 #include "units.hpp"
 
 namespace tool {
@@ -52,31 +53,30 @@ void write_csv(output_file &csv, const averaged_spectrum &spectrum, double centr
 
 void print_summary(const spectrum_command &command, const recording &source, const averaged_spectrum &spectrum,
                    std::size_t peak) {
-  const bool styled = ::isatty(STDOUT_FILENO) == 1;
-  const auto line = [&](const char *label, const std::string &text) {
-    fmt::print("{}{:<22}{}{}\n", styled ? "\033[1m" : "", label, styled ? "\033[0m" : "", text);
-  };
   const double rbw = spectrum.resolution_bandwidth();
-  line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
-  line("Samples", fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
-  line("Sample rate", exact_text(source.rate));
-  line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
-  line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
-  line("Window",
-       fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window), spectrum.noise_bandwidth));
-  line("Averaged", fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
-  line("Resolution bandwidth",
-       fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
+  summary_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  summary_line("Samples",
+               fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
+  summary_line("Sample rate", exact_text(source.rate));
+  summary_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
+  summary_line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
+  summary_line("Window", fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window),
+                                     spectrum.noise_bandwidth));
+  summary_line("Averaged",
+               fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
+  summary_line("Resolution bandwidth",
+               fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
   const double offset = spectrum.offset(peak);
   const double centre = source.frequency.value_or(0);
   std::string where = frequency_text(centre + offset, spectrum.df);
   if (source.frequency) where += fmt::format(" (offset {})", offset_text(offset, spectrum.df, unit_for(offset)));
-  line("Peak", spectrum.power[peak] > 0 ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
-                                        : "none: all samples are zero");
+  summary_line("Peak", spectrum.power[peak] > 0
+                           ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
+                           : "none: all samples are zero");
   if (spectrum.power[peak] > 1.01)
-    line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
-  if (!command.csv.empty()) line("CSV", command.csv);
-  if (!command.plot.empty()) line("Picture", command.plot);
+    summary_line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
+  if (!command.csv.empty()) summary_line("CSV", command.csv);
+  if (!command.plot.empty()) summary_line("Picture", command.plot);
 }
 
 void run(spectrum_command &command) {
@@ -110,16 +110,6 @@ void run(spectrum_command &command) {
   print_summary(command, source, spectrum, peak);
 }
 
-/// An option's value must satisfy `holds`; NaN satisfies nothing.
-template <class Holds>
-CLI::Validator number_where(const char *what, Holds holds) {
-  return {[=](std::string &text) {
-            double value = 0;
-            return CLI::detail::lexical_cast(text, value) && holds(value) ? std::string() : text + " is not " + what;
-          },
-          ""};
-}
-
 }  // namespace
 
 void add_spectrum(CLI::App &program) {
@@ -141,12 +131,7 @@ void add_spectrum(CLI::App &program) {
       ->check(number_where("at least 0 and below 100", [](double value) { return value >= 0 && value < 100; }));
   app->add_option("--csv", command->csv, "Write frequency and level of every bin")->option_text("FILE");
   app->add_option("--plot", command->plot, "Draw the spectrum")->option_text("FILE.png|.svg");
-  app->add_option("--rate", command->options.rate, "Sample rate; needed for raw files, overrides the metadata")
-      ->option_text("HZ")
-      ->check(number_where("a positive number", [](double value) { return value > 0 && std::isfinite(value); }));
-  app->add_option("--format", command->options.format,
-                  "Sample type (cf32, cf64, ci32, ci16, ci8, cu32, cu16, cu8; _le or _be); overrides the metadata")
-      ->option_text("NAME");
+  add_recording_options(*app, command->options.rate, command->options.format);
   app->add_option("--capture", command->options.capture, "Use this capture of a SigMF recording alone, from 0")
       ->option_text("INDEX");
   // For tests: how much is read at a time must not change the result.

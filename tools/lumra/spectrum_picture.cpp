@@ -80,7 +80,7 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
                                                            std::round(static_cast<double>(bins) / columns))
                                              : "";
   const bool png = type == picture_type::png;
-  return picture_preamble(type) +
+  return picture_preamble(type, {1280, 720}) +
          fmt::format(
              "set title {} noenhanced offset 0,1.6 font '{}'\n"
              "set label 1 {} at graph 0.5,1.035 center noenhanced tc rgb '#505050'\n"
