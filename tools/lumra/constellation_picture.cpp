@@ -72,12 +72,15 @@ std::string constellation_script(const constellation &points, const std::string 
   const std::string measured_plot =
       fmt::format("$measured using 1:2 with points pt 7 ps {} lc rgb '#1f4e8c' notitle", point_size);
   const std::string reference_plot =
-      fmt::format("$reference using 1:2 with points pt 2 ps {} lw {} lc rgb '#d02020' notitle", symbols ? 1.1 : 0.4,
-                  symbols ? 1.8 : 0.8);
+      fmt::format("$reference using 1:2 with points pt 2 ps {} lw {} lc rgb '#d02020' notitle", symbols ? 1.4 : 0.4,
+                  symbols ? 2.0 : 0.8);
+  const std::string share =
+      points.is_partial() ? fmt::format("{} of {} samples drawn", points.measured().size(), points.samples()) : "";
   return picture_preamble(type, {900, 960}) +
          fmt::format(
              "set title {} noenhanced offset 0,1.6 font '{}'\n"
              "set label 1 {} at graph 0.5,1.025 center noenhanced tc rgb '#505050'\n"
+             "set label 2 {} at graph 1,-0.113 right noenhanced tc rgb '#505050'\n"
              "set tmargin 5\nset rmargin 3\nset lmargin 9\nset bmargin 5.5\n"
              "set size ratio -1\nset border lw 1 lc rgb '#404040'\n"
              "set xlabel 'In phase (reference RMS = 1)' offset 0,-0.3\n"
@@ -87,16 +90,16 @@ std::string constellation_script(const constellation &points, const std::string 
              "set grid xtics ytics mxtics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
              "set xzeroaxis lt 1 lw 1 lc rgb '#909090'\nset yzeroaxis lt 1 lw 1 lc rgb '#909090'\n"
              "set key below center horizontal samplen 1 width 2\n",
-             gnuplot_text(title), png ? "DejaVu Sans:Bold,14" : "sans-serif,20", gnuplot_text(figures), -limit, limit,
-             -limit, limit, mark_distance(limit), mark_distance(limit)) +
+             gnuplot_text(title), png ? "DejaVu Sans:Bold,14" : "sans-serif,20",
+             gnuplot_text(with_minus_signs(figures)), gnuplot_text(share), -limit, limit, -limit, limit,
+             mark_distance(limit), mark_distance(limit)) +
          fmt::format(
              "$measured << end_of_measured\n{}end_of_measured\n"
              "$reference << end_of_reference\n{}end_of_reference\n"
              "plot {}, \\\n  {}, \\\n"
-             "  NaN with points pt 7 ps 0.7 lc rgb '#1f4e8c' title 'Measured{}', \\\n"
+             "  NaN with points pt 7 ps 0.7 lc rgb '#1f4e8c' title 'Measured', \\\n"
              "  NaN with points pt 2 ps 1.1 lw 1.8 lc rgb '#d02020' title 'Reference'\n",
-             measured, reference, symbols ? measured_plot : reference_plot, symbols ? reference_plot : measured_plot,
-             points.is_partial() ? fmt::format(" ({} of the samples)", points.measured().size()) : "");
+             measured, reference, symbols ? measured_plot : reference_plot, symbols ? reference_plot : measured_plot);
 }
 
 }  // namespace tool

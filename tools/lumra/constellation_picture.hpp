@@ -21,6 +21,7 @@ class constellation {
 
   [[nodiscard]] const std::vector<std::complex<double>> &reference() const noexcept { return reference_; }
   [[nodiscard]] const std::vector<std::complex<double>> &measured() const noexcept { return measured_; }
+  [[nodiscard]] std::uint64_t samples() const noexcept { return samples_; }
   [[nodiscard]] bool is_partial() const noexcept { return wanted_ < samples_; }
 
  private:

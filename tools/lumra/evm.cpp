@@ -82,8 +82,9 @@ void collect(constellation &points, const evm_block &block) {
   }
 }
 
-std::string gain_text(std::complex<double> gain) {
-  return fmt::format("{:+.4f} dB, {:+.4f} deg", level(std::abs(gain)), degrees * std::arg(gain));
+std::string gain_text(std::complex<double> gain, int decimals, const char *unit) {
+  return fmt::format("{:+.{}f} dB, {:+.{}f}{}", level(std::abs(gain)), decimals, degrees * std::arg(gain), decimals,
+                     unit);
 }
 
 void print_summary(const evm_command &command, const recording &reference, const recording &measured,
@@ -100,7 +101,7 @@ void print_summary(const evm_command &command, const recording &reference, const
   summary_line("Sample rate", exact_text(rate));
   summary_line("Reference level", fmt::format("{:.2f} dBFS RMS, which is 100 %", level(result.reference_rms)));
   summary_line("Alignment", command.settings.align
-                                ? "least-squares complex gain " + gain_text(result.gain) + ", divided out"
+                                ? "least-squares complex gain " + gain_text(result.gain, 4, " deg") + ", divided out"
                                 : "none; a difference in gain or phase is an error (see --align)");
   summary_line("EVM RMS", ratio_text(result.error.rms));
   summary_line("EVM peak", ratio_text(result.error.peak) + " " + place_text(result.error.peak_at, rate));
@@ -141,7 +142,7 @@ void run(evm_command &command) {
   if (plot) {
     std::string figures = fmt::format("EVM {:.4g} % RMS ({:.2f} dB)  ·  {:.4g} % peak", 100 * result.error.rms,
                                       level(result.error.rms), 100 * result.error.peak);
-    if (command.settings.align) figures += "  ·  gain " + gain_text(result.gain) + " removed";
+    if (command.settings.align) figures += "  ·  gain " + gain_text(result.gain, 2, "°") + " removed";
     draw(constellation_script(points, measured.name + " against " + reference.name, figures, type), type, *plot);
   }
   if (csv) csv->commit();

@@ -119,6 +119,11 @@ std::string gnuplot_text(std::string_view text) {
   return result + "'";
 }
 
+std::string with_minus_signs(std::string text) {
+  for (std::size_t at = 0; (at = text.find('-', at)) != std::string::npos;) text.replace(at, 1, "−");
+  return text;
+}
+
 void draw(const std::string &script, picture_type type, output_file &out) {
   const scratch_file input = make_scratch();
   const scratch_file errors = make_scratch();

@@ -24,6 +24,9 @@ std::string picture_preamble(picture_type type, picture_size size);
 /// A text as a quoted string of gnuplot; bytes that it or a picture could not show become '?'.
 std::string gnuplot_text(std::string_view text);
 
+/// Hyphens of numbers as the minus signs that pictures show.
+std::string with_minus_signs(std::string text);
+
 /// Runs a script and stores the picture that it draws. Throws failure with gnuplot's own reason.
 void draw(const std::string &script, picture_type type, output_file &out);
 

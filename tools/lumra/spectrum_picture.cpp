@@ -73,8 +73,7 @@ std::string spectrum_script(const recording &source, const averaged_spectrum &sp
   const int lean = x < -0.8 * half ? 1 : x > 0.8 * half ? -1 : 0;
   const char *side = lean > 0 ? "left" : lean < 0 ? "right" : "center";
   const std::string where = frequency_text(source.frequency.value_or(0) + offset, spectrum.df);
-  std::string label = fmt::format("{}   {:.2f} dBFS", where, level);
-  for (std::size_t at = 0; (at = label.find('-', at)) != std::string::npos;) label.replace(at, 1, "−");
+  const std::string label = with_minus_signs(fmt::format("{}   {:.2f} dBFS", where, level));
 
   const std::string detector = points < bins ? fmt::format("  ·  highest of {:.0f} bins per column",
                                                            std::round(static_cast<double>(bins) / columns))
