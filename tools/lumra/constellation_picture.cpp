@@ -80,7 +80,7 @@ std::string constellation_script(const constellation &points, const std::string 
          fmt::format(
              "set title {} noenhanced offset 0,1.6 font '{}'\n"
              "set label 1 {} at graph 0.5,1.025 center noenhanced tc rgb '#505050'\n"
-             "set label 2 {} at graph 1,-0.113 right noenhanced tc rgb '#505050'\n"
+             "set label 2 {} at graph 1,-0.108 right noenhanced tc rgb '#505050'\n"
              "set tmargin 5\nset rmargin 3\nset lmargin 9\nset bmargin 5.5\n"
              "set size ratio -1\nset border lw 1 lc rgb '#404040'\n"
              "set xlabel 'In phase (reference RMS = 1)' offset 0,-0.3\n"
@@ -89,7 +89,7 @@ std::string constellation_script(const constellation &points, const std::string 
              "set tics scale 0.8,0.4\nset minussign\nset format x '%h'\nset format y '%h'\n"
              "set grid xtics ytics mxtics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
              "set xzeroaxis lt 1 lw 1 lc rgb '#909090'\nset yzeroaxis lt 1 lw 1 lc rgb '#909090'\n"
-             "set key below center horizontal samplen 1 width 2\n",
+             "set key at graph 0,-0.095 left top horizontal Left reverse samplen 1 width 2\n",
              gnuplot_text(title), png ? "DejaVu Sans:Bold,14" : "sans-serif,20",
              gnuplot_text(with_minus_signs(figures)), gnuplot_text(share), -limit, limit, -limit, limit,
              mark_distance(limit), mark_distance(limit)) +
