@@ -18,9 +18,18 @@
  *
  * Codes, besides 0:
  *    -20001  an array cannot be resized or is too large, an output handle is null, or memory is missing
+ *    -20002  lengths that must agree differ
  *    -20003  an input has no element
- *    -20008  the lengths leave no output
+ *    -20004  a size of a matrix is negative
+ *    -20006  too few points for a line
+ *    -20008  the lengths leave no output, or a filter has reverse coefficients alone
+ *    -20016  a resampling ratio is not above 0, or above 2^30
+ *    -20022  a decimation factor is below 1 or above the number of samples
+ *    -20039  the inner sizes of a product differ
+ *    -20059  a resampling delay is negative, or a resampler's state is not one
  *    -20061  an option is outside its range, or scratch is shared
+ *    -20068  values are not finite, or an iteration does not converge
+ *    -20075  a resampling filter has more taps than its history
  *    -20999  a scratch handle that is needed is null
  *   -359501  a transform could not be computed
  *   -359502  a transform could not be made, or has more than 2^27 points
@@ -233,5 +242,10 @@ LUMRA_EXPORT int32_t qsRFPELTA_zPowerSpectrumH(lumra_cf64_array in, lumra_f64_ar
 #ifdef __cplusplus
 }
 #endif
+
+#include <lumra/toolkit_iir.h>
+#include <lumra/toolkit_matrix.h>
+#include <lumra/toolkit_resampling.h>
+#include <lumra/toolkit_statistics.h>
 
 #endif

@@ -1,0 +1,69 @@
+// Decimation on plain memory. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <cstdint>
+#include <span>
+
+#include "toolkit/frame.hpp"
+
+namespace toolkit {
+
+enum class decimation { pick, average };
+
+namespace detail {
+
+/// Sum of `factor` samples, over several lanes where that pays.
+template <class T>
+T block_sum(const T *x, std::int64_t factor) noexcept {
+  constexpr std::int64_t lanes = 64 / sizeof(T);
+  T sum[lanes] = {};
+  std::int64_t i = 0;
+  for (; i + lanes <= factor; i += lanes)
+    for (std::int64_t l = 0; l < lanes; ++l) sum[l] += x[i + l];
+  for (std::int64_t half = lanes / 2; half > 0; half /= 2)
+    for (std::int64_t l = 0; l < half; ++l) sum[l] += sum[l + half];
+  for (; i < factor; ++i) sum[0] += x[i];
+  return sum[0];
+}
+
+/// Means of groups that are too short for lanes: four groups side by side hide the latency of the additions.
+template <class T, class Real>
+void average_short(const T *x, T *out, std::int64_t count, std::int64_t factor, Real divisor) noexcept {
+  std::int64_t k = 0;
+  for (; k + 4 <= count; k += 4, x += 4 * factor) {
+    T sum[4] = {x[0], x[factor], x[2 * factor], x[3 * factor]};
+    for (std::int64_t j = 1; j < factor; ++j)
+      for (std::int64_t l = 0; l < 4; ++l) sum[l] += x[l * factor + j];
+    for (std::int64_t l = 0; l < 4; ++l) out[k + l] = sum[l] / divisor;
+  }
+  for (; k < count; ++k, x += factor) {
+    T sum = x[0];
+    for (std::int64_t j = 1; j < factor; ++j) sum += x[j];
+    out[k] = sum / divisor;
+  }
+}
+
+}  // namespace detail
+
+/// Writes floor(x.size() / factor) samples to the front of `out`, which may be x itself.
+template <class T>
+void decimate(std::span<const T> x, std::span<T> out, std::int64_t factor, decimation how) {
+  using real = decltype(std::real(T{}));
+  const auto count = static_cast<std::int64_t>(x.size()) / factor;
+  require(static_cast<std::int64_t>(out.size()) >= count, destination_too_small);
+  if (factor == 1) {
+    if (out.data() != x.data()) std::copy(x.begin(), x.end(), out.begin());
+    return;
+  }
+  const auto divisor = static_cast<real>(factor);
+  if (how == decimation::pick) {
+    for (std::int64_t k = 0; k < count; ++k) out[static_cast<std::size_t>(k)] = x[static_cast<std::size_t>(k * factor)];
+  } else if (factor < 32) {
+    detail::average_short(x.data(), out.data(), count, factor, divisor);
+  } else {
+    for (std::int64_t k = 0; k < count; ++k)
+      out[static_cast<std::size_t>(k)] = detail::block_sum(x.data() + k * factor, factor) / divisor;
+  }
+}
+
+}  // namespace toolkit
