@@ -10,15 +10,19 @@ namespace tests {
 template <class E>
 struct family;
 
-#define FAMILY(E)                                                              \
-  template <>                                                                  \
-  struct family<toolkit::E> {                                                  \
-    static constexpr auto fft = &qsRFPELTA_##E##1DFFTH;                        \
-    static constexpr auto inverse_fft = &qsRFPELTA_##E##1DInvFFTH;             \
-    static constexpr auto convolution = &qsRFPELTA_##E##1DConvolutionH;        \
-    static constexpr auto matrix_correlation = &qsRFPELTA_##E##2DCorrelationH; \
-    static constexpr auto window = &qsRFPELTA_##E##AllCosWinH;                 \
-    static constexpr auto power_spectrum = &qsRFPELTA_##E##PowerSpectrumH;     \
+#define FAMILY(E)                                                                  \
+  template <>                                                                      \
+  struct family<toolkit::E> {                                                      \
+    static constexpr auto fft = &qsRFPELTA_##E##1DFFTH;                            \
+    static constexpr auto inverse_fft = &qsRFPELTA_##E##1DInvFFTH;                 \
+    static constexpr auto convolution = &qsRFPELTA_##E##1DConvolutionH;            \
+    static constexpr auto matrix_correlation = &qsRFPELTA_##E##2DCorrelationH;     \
+    static constexpr auto window = &qsRFPELTA_##E##AllCosWinH;                     \
+    static constexpr auto power_spectrum = &qsRFPELTA_##E##PowerSpectrumH;         \
+    static constexpr auto decimate = &qsRFPELTA_##E##DecimateH;                    \
+    static constexpr auto resample = &qsRFPELTA_##E##ResampleC2CH;                 \
+    static constexpr auto resample_channels = &qsRFPELTA_##E##ResampleMultiChC2CH; \
+    static constexpr auto rms = &qsRFPELTA_##E##RMSH;                              \
   };
 FAMILY(s)
 FAMILY(d)
