@@ -6,6 +6,7 @@
 #include <bit>
 #include <cmath>
 #include <cstdint>
+#include <cstring>
 #include <limits>
 #include <span>
 #include <type_traits>
@@ -24,19 +25,27 @@ namespace {
 /// result must not be written while a later one needs its sample. `before` holds earlier samples, newest first.
 template <int parts, class Real>
 void convolve_in_place(Real *x, std::int64_t n, std::span<const Real> b, const Real *before) noexcept {
-  constexpr std::int64_t lanes = 16;
+  // Results side by side in four registers of 16 bytes; a plain loop over them ends up vectorised over j.
+  using lane [[gnu::vector_size(16)]] = Real;
+  constexpr std::int64_t width = sizeof(lane) / sizeof(Real), lanes = 4 * width;
+  const auto load = [](const Real *from) {
+    lane v;
+    std::memcpy(&v, from, sizeof v);
+    return v;
+  };
   const auto nb = static_cast<std::int64_t>(b.size());
   const std::int64_t first = std::min((nb - 1) * parts, n * parts);  // values from here on need no earlier samples
   std::int64_t i = n * parts;
   for (; i - lanes >= first; i -= lanes) {
     Real *const y = x + i - lanes;
-    Real sum[lanes];
-    for (std::int64_t l = 0; l < lanes; ++l) sum[l] = b[0] * y[l];
+    lane sum[4];
+    for (int l = 0; l < 4; ++l) sum[l] = b[0] * load(y + l * width);
     for (std::int64_t j = 1; j < nb; ++j) {
       const Real coefficient = b[static_cast<std::size_t>(j)];
-      for (std::int64_t l = 0; l < lanes; ++l) sum[l] += coefficient * y[l - j * parts];
+      const Real *const past = y - j * parts;
+      for (int l = 0; l < 4; ++l) sum[l] += coefficient * load(past + l * width);
     }
-    for (std::int64_t l = 0; l < lanes; ++l) y[l] = sum[l];
+    std::memcpy(y, sum, sizeof sum);
   }
   while (--i >= 0) {
     Real sum = b[0] * x[i];
@@ -66,13 +75,14 @@ struct subnormal {
 
   static bool is(Real v) noexcept { return (std::bit_cast<bits>(v) & ~sign) < limit; }
   static double steps(Real v) noexcept {
-    const bits raw = std::bit_cast<bits>(v);
-    const auto magnitude = static_cast<double>(static_cast<integer>(raw & ~sign));
-    return (raw & sign) != 0 ? -magnitude : magnitude;
+    const auto raw = std::bit_cast<bits>(v);
+    const auto mask = -static_cast<integer>(raw >> (8 * sizeof(bits) - 1));  // all ones below 0
+    return static_cast<double>((static_cast<integer>(raw & ~sign) ^ mask) - mask);
   }
   static Real value(double steps) noexcept {
-    const auto magnitude = static_cast<bits>(static_cast<std::int64_t>(std::abs(steps)));
-    return std::bit_cast<Real>(magnitude | (std::signbit(steps) ? sign : 0));
+    const auto whole = static_cast<integer>(steps);
+    const auto mask = whole >> (8 * sizeof(bits) - 1);
+    return std::bit_cast<Real>(static_cast<bits>((whole ^ mask) - mask) | (static_cast<bits>(mask) & sign));
   }
 };
 
@@ -111,7 +121,8 @@ class recursion {
     for (int j = order - 1; j >= 0; --j) w -= a_[at(j)] * y[at(j)];
     return unit_gain ? w : gain_ * w;
   }
-  static void shift(std::array<Real, order> &y, Real newest) noexcept {
+  template <class T>
+  static void shift(std::array<T, order> &y, T newest) noexcept {
     for (int j = order - 1; j > 0; --j) y[at(j)] = y[at(j - 1)];
     y[0] = newest;
   }
@@ -145,6 +156,10 @@ class recursion {
   /// Until no part has had `order` subnormal outputs in succession.
   Real *run_quiet(Real *data, Real *end) noexcept {
     while (data < end && any_quiet()) {
+      if (std::all_of(quiet_.begin(), quiet_.end(), [](int quiet) { return quiet == order; })) {
+        data = run_all_quiet(data, end);
+        if (data == end) break;
+      }
       for (std::size_t part = 0; part < parts; ++part, ++data) {
         if (quiet_[part] == order && small::is(*data)) {
           *data = next_quiet(*data, part);
@@ -160,19 +175,48 @@ class recursion {
     return data;
   }
 
+  /// Up to the first sample that makes one of the parts louder, which is left to do.
+  Real *run_all_quiet(Real *data, Real *end) noexcept {
+    auto v = steps_;  // in registers
+    for (; data < end; data += parts) {
+      std::array<double, parts> newest;
+      bool quiet = true;
+      for (std::size_t part = 0; part < parts; ++part) {
+        newest[part] = whole_steps(rest(data[part], v[part]), v[part]);
+        quiet = quiet && small::is(data[part]) && std::abs(newest[part]) < static_cast<double>(small::limit);
+      }
+      if (!quiet) break;
+      for (std::size_t part = 0; part < parts; ++part) {
+        shift(v[part], newest[part]);
+        data[part] = small::value(newest[part]);
+      }
+    }
+    steps_ = v;
+    for (std::size_t part = 0; part < parts; ++part)
+      for (int j = 0; j < order; ++j) y_[part][at(j)] = small::value(v[part][at(j)]);
+    return data;
+  }
+
   void enter(std::size_t part) noexcept {
     for (int j = 0; j < order; ++j) steps_[part][at(j)] = small::steps(y_[part][at(j)]);
   }
 
-  Real next_quiet(Real w, std::size_t part) noexcept {
-    auto &v = steps_[part];
+  /// All of the sum but the newest output's part.
+  [[nodiscard]] double rest(Real w, const std::array<double, order> &v) const noexcept {
     double sum = static_cast<double>(gain_) * small::steps(w);
     for (int j = order - 1; j > 0; --j) sum -= scaled_[at(j)] * v[at(j)];
-    const double whole = ((sum + small::rounder) - scaled_[0] * v[0]) - small::rounder;
+    return sum;
+  }
+  [[nodiscard]] double whole_steps(double rest, const std::array<double, order> &v) const noexcept {
+    return ((rest + small::rounder) - scaled_[0] * v[0]) - small::rounder;
+  }
+
+  Real next_quiet(Real w, std::size_t part) noexcept {
+    auto &v = steps_[part];
+    const double sum = rest(w, v), whole = whole_steps(sum, v);
     Real newest;
     if (std::abs(whole) < static_cast<double>(small::limit)) {
-      for (int j = order - 1; j > 0; --j) v[at(j)] = v[at(j - 1)];
-      v[0] = whole;
+      shift(v, whole);
       newest = small::value(whole);
     } else {  // louder again, or not a number
       newest = static_cast<Real>(std::ldexp(sum - scaled_[0] * v[0], small::exponent));

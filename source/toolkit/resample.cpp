@@ -85,66 +85,69 @@ struct prototype {
   [[nodiscard]] double reach() const noexcept { return centre() * stretch / phases; }
 };
 
-/// Interpolated taps, four sums in turn; the result depends on the taps and samples alone, not on where the samples
-/// lie.
-template <class Real, class T>
-struct tap_sum {
-  T part[4] = {};
-
-  void add(const Real *taps, const T *x, std::int64_t first, std::int64_t end) noexcept {
-    std::int64_t k = first;
-    for (; k < end && k % 4 != 0; ++k) part[k % 4] += taps[k] * x[k];
-    for (; k + 4 <= end; k += 4)
-      for (std::int64_t l = 0; l < 4; ++l) part[l] += taps[k + l] * x[k + l];
-    for (; k < end; ++k) part[k % 4] += taps[k] * x[k];
+/// Sums of terms 0, 4, 8, ..., of terms 1, 5, 9, ..., and so on. The result depends on the terms alone, not on how they
+/// are added in pieces.
+template <class Sum>
+class sum_in_four {
+ public:
+  template <class Term>
+  void add(std::int64_t begin, std::int64_t end, Term term) noexcept {
+    std::int64_t k = begin;
+    for (; k < end && k % 4 != 0; ++k) part_[k % 4] += term(k);
+    Sum s0 = part_[0], s1 = part_[1], s2 = part_[2], s3 = part_[3];  // in registers
+    for (; k + 4 <= end; k += 4) {
+      s0 += term(k);
+      s1 += term(k + 1);
+      s2 += term(k + 2);
+      s3 += term(k + 3);
+    }
+    if (k < end) s0 += term(k);
+    if (k + 1 < end) s1 += term(k + 1);
+    if (k + 2 < end) s2 += term(k + 2);
+    part_[0] = s0, part_[1] = s1, part_[2] = s2, part_[3] = s3;
   }
-  [[nodiscard]] T total() const noexcept { return (part[0] + part[2]) + (part[1] + part[3]); }
+  [[nodiscard]] Sum total() const noexcept { return (part_[0] + part_[2]) + (part_[1] + part_[3]); }
+
+ private:
+  Sum part_[4] = {};
 };
 
 // With a whole step all taps of an output lie equally far behind a coefficient: the sum over the coefficients in front
 // of the taps and that over those behind them are enough, and no tap has to be made.
 
-/// Sums over h[0], h[step], ... (first) and h[1], h[1 + step], ... (second).
+/// Products of one sample with two neighbouring coefficients.
 template <class Real, class T>
-struct pair_sum {
-  T first[2] = {}, second[2] = {};
+struct product_pair {
+  T first{}, second{};
 
-  void add(const Real *h, std::int64_t step, const T *x, std::int64_t begin, std::int64_t end) noexcept {
-    for (std::int64_t k = begin; k < end; ++k) {
-      const Real *const pair = h + k * step;
-      first[k % 2] += pair[0] * x[k];
-      second[k % 2] += pair[1] * x[k];
-    }
+  static product_pair of(const Real *h, const T &x) noexcept { return {h[0] * x, h[1] * x}; }
+  product_pair &operator+=(const product_pair &b) noexcept {
+    first += b.first;
+    second += b.second;
+    return *this;
   }
-  [[nodiscard]] T between(double fraction) const noexcept {
-    return static_cast<Real>(1 - fraction) * (first[0] + first[1]) +
-           static_cast<Real>(fraction) * (second[0] + second[1]);
-  }
+  friend product_pair operator+(product_pair a, const product_pair &b) noexcept { return a += b; }
+  [[nodiscard]] T between(Real fraction) const noexcept { return (1 - fraction) * first + fraction * second; }
 };
 
 template <>
-struct pair_sum<float, std::complex<float>> {
-  __m128 part[4] = {_mm_setzero_ps(), _mm_setzero_ps(), _mm_setzero_ps(), _mm_setzero_ps()};  // first, second
+struct product_pair<float, std::complex<float>> {
+  __m128 parts = _mm_setzero_ps();  // first, second
 
-  static __m128 term(const float *pair, const std::complex<float> *x) noexcept {
-    const __m128 h = _mm_castpd_ps(_mm_load_sd(reinterpret_cast<const double *>(pair)));
-    const __m128d sample = _mm_load_sd(reinterpret_cast<const double *>(x));
-    return _mm_mul_ps(_mm_unpacklo_ps(h, h), _mm_castpd_ps(_mm_unpacklo_pd(sample, sample)));
+  static product_pair of(const float *h, const std::complex<float> &x) noexcept {
+    const __m128 both = _mm_castpd_ps(_mm_load_sd(reinterpret_cast<const double *>(h)));
+    const __m128d sample = _mm_load_sd(reinterpret_cast<const double *>(&x));
+    return {_mm_mul_ps(_mm_unpacklo_ps(both, both), _mm_castpd_ps(_mm_unpacklo_pd(sample, sample)))};
   }
-  void add(const float *h, std::int64_t step, const std::complex<float> *x, std::int64_t begin,
-           std::int64_t end) noexcept {
-    std::int64_t k = begin;
-    for (; k < end && k % 4 != 0; ++k) part[k % 4] = _mm_add_ps(part[k % 4], term(h + k * step, x + k));
-    const float *pair = h + k * step;
-    for (; k + 4 <= end; k += 4, pair += 4 * step)
-      for (std::int64_t l = 0; l < 4; ++l) part[l] = _mm_add_ps(part[l], term(pair + l * step, x + k + l));
-    for (; k < end; ++k) part[k % 4] = _mm_add_ps(part[k % 4], term(h + k * step, x + k));
+  product_pair &operator+=(const product_pair &b) noexcept {
+    parts = _mm_add_ps(parts, b.parts);
+    return *this;
   }
-  [[nodiscard]] std::complex<float> between(double fraction) const noexcept {
+  friend product_pair operator+(product_pair a, const product_pair &b) noexcept { return a += b; }
+  [[nodiscard]] std::complex<float> between(float fraction) const noexcept {
     alignas(16) float sums[4];
-    _mm_store_ps(sums, _mm_add_ps(_mm_add_ps(part[0], part[2]), _mm_add_ps(part[1], part[3])));
-    const auto near = static_cast<float>(1 - fraction), far = static_cast<float>(fraction);
-    return {near * sums[0] + far * sums[2], near * sums[1] + far * sums[3]};
+    _mm_store_ps(sums, parts);
+    return {(1 - fraction) * sums[0] + fraction * sums[2], (1 - fraction) * sums[1] + fraction * sums[3]};
   }
 };
 
@@ -207,16 +210,16 @@ class resampler {
       const channel<value> samples = channel_of(r);
       value &y = out[r * stride];
       if (pairs) {
-        pair_sum<real, value> sum;
+        sum_in_four<product_pair<real, value>> sum;
         const real *const h = filter_.h.data() + index;
         samples.over(first, w.count, [&](const value *x, std::int64_t begin, std::int64_t end) {
-          sum.add(h, whole_step_, x, begin, end);
+          sum.add(begin, end, [&](std::int64_t k) { return product_pair<real, value>::of(h + k * whole_step_, x[k]); });
         });
-        y = sum.between(w.tap - floor);
+        y = sum.total().between(static_cast<real>(w.tap - floor));
       } else {
-        tap_sum<real, value> sum;
+        sum_in_four<value> sum;
         samples.over(first, w.count, [&](const value *x, std::int64_t begin, std::int64_t end) {
-          sum.add(taps_.data(), x, begin, end);
+          sum.add(begin, end, [&](std::int64_t k) { return taps_[static_cast<std::size_t>(k)] * x[k]; });
         });
         y = sum.total();
       }
@@ -225,18 +228,26 @@ class resampler {
 
  private:
   void make_taps(const window &w) const noexcept {
-    const std::span<const real> h = filter_.h;
-    for (std::int64_t k = 0; k < w.count; ++k) {
-      const double t = std::min(w.tap + static_cast<double>(k) * step_, last_);  // rounding may lead beyond
-      real &tap = taps_[static_cast<std::size_t>(k)];
-      if (nearest_) {
-        tap = h[std::min(static_cast<std::size_t>(t + 0.5), h.size() - 1)];
-        continue;
-      }
-      const auto i = static_cast<std::size_t>(t);
-      const auto near = static_cast<double>(h[i]), far = static_cast<double>(h[std::min(i + 1, h.size() - 1)]);
-      tap = static_cast<real>(near + (t - static_cast<double>(i)) * (far - near));
+    const real *const h = filter_.h.data();
+    real *const taps = taps_.data();
+    std::int64_t k = 0;
+    if (nearest_) {
+      const double t = w.tap + 0.5;
+      for (; k < w.count; ++k)
+        taps[k] = h[static_cast<std::int32_t>(std::min(t + static_cast<double>(k) * step_, last_))];
+      return;
     }
+    const auto interpolated = [h](double t, std::int32_t ahead) {
+      const auto i = static_cast<std::int32_t>(t);
+      const auto near = static_cast<double>(h[i]), far = static_cast<double>(h[i + ahead]);
+      return static_cast<real>(near + (t - i) * (far - near));
+    };
+    for (; k < w.count; ++k) {
+      const double t = w.tap + static_cast<double>(k) * step_;
+      if (t >= last_) break;
+      taps[k] = interpolated(t, 1);
+    }
+    for (; k < w.count; ++k) taps[k] = interpolated(last_, 0);  // at the last coefficient, or beyond it by rounding
   }
 
   prototype<real> filter_;
