@@ -807,4 +807,181 @@ inline void phase_error(const host_matrix<std::complex<float>> &a, const host_ma
   check(qsLumraAlgo_CalculatePhaseError2D(a.get(), b.get(), e.get(), static_cast<std::int32_t>(mode)));
 }
 
+/// An owned matrix, row by row, in the library's own memory.
+template <class T>
+class host_matrix {
+ public:
+  using handle = typename detail::element<T>::matrix_block **;
+
+  host_matrix(std::int32_t rows, std::int32_t columns) {
+    const std::int32_t sizes[] = {rows, columns};
+    check(qsHost_ArrayNew(detail::element<T>::code, 2, sizes, &handle_));
+  }
+  host_matrix(host_matrix &&other) noexcept : handle_(std::exchange(other.handle_, nullptr)) {}
+  host_matrix &operator=(host_matrix &&other) noexcept {
+    std::swap(handle_, other.handle_);
+    return *this;
+  }
+  ~host_matrix() { qsHost_ArrayFree(&handle_); }
+
+  [[nodiscard]] std::int32_t rows() const noexcept { return (*handle_)->rows; }
+  [[nodiscard]] std::int32_t columns() const noexcept { return (*handle_)->columns; }
+  [[nodiscard]] std::span<T> row(std::int32_t r) noexcept {
+    const auto width = static_cast<std::size_t>(columns());
+    return {reinterpret_cast<T *>((*handle_)->elements) + static_cast<std::size_t>(r) * width, width};
+  }
+  [[nodiscard]] handle get() const noexcept { return handle_; }
+
+ private:
+  handle handle_ = nullptr;
+};
+
+enum class interpolation : std::int32_t { linear = 0, nearest = 1 };
+
+/// A stream of T at another rate. One thread at a time.
+template <class T>
+class resampler {
+ public:
+  struct settings {
+    float ratio = 1;  // input samples per output sample
+    float delay = 0;  // of the first output, in input samples
+    lumra::interpolation interpolation = lumra::interpolation::linear;
+    bool bandwidth_scaling = true;
+  };
+
+  /// `prototype` has `phases` coefficients per input sample.
+  resampler(std::type_identity_t<std::span<const detail::real_of<T>>> prototype, std::int32_t phases,
+            const settings &how)
+      : phases_(phases), how_(how) {
+    prototype_.resize(prototype.size());
+    std::copy(prototype.begin(), prototype.end(), prototype_.elements().begin());
+  }
+
+  /// The outputs that the next block of the stream gives; good until the next call.
+  std::span<const T> operator()(std::type_identity_t<std::span<const T>> block) {
+    constexpr auto run = detail::choose<T>(&qsRFPELTA_sResampleC2CH, &qsRFPELTA_dResampleC2CH, &qsRFPELTA_cResampleC2CH,
+                                           &qsRFPELTA_zResampleC2CH);
+    detail::load(in_, block);
+    const lumra_resampler_parameters parameters{how_.ratio, how_.delay, static_cast<std::int32_t>(how_.interpolation)};
+    const bool reset = std::exchange(reset_, true);  // again after a failure
+    check(run(in_.get(), prototype_.get(), phases_, &parameters, reset, how_.bandwidth_scaling, out_.get(), &time_,
+              samples_.get(), taps_.get(), state_.data()));
+    reset_ = false;
+    return out_.elements();
+  }
+  /// Position of the latest block's first output, in input samples since the beginning.
+  [[nodiscard]] float first_output_time() const noexcept { return time_; }
+  /// The next block begins a new stream.
+  void reset() noexcept { reset_ = true; }
+
+ private:
+  std::int32_t phases_;
+  settings how_;
+  bool reset_ = true;
+  float time_ = 0;
+  std::array<unsigned char, LUMRA_RESAMPLER_STATE_SIZE> state_{};
+  host_array<detail::real_of<T>> prototype_{0}, taps_{0};
+  host_array<T> in_{0}, out_{0}, samples_{0};
+};
+
+/// A direct-form filter with its memory: coefficients b over a. One thread at a time.
+template <class T>
+class iir_filter {
+ public:
+  using coefficients = std::type_identity_t<std::span<const detail::real_of<T>>>;
+
+  iir_filter(coefficients b, coefficients a) {
+    forward_.resize(b.size());
+    reverse_.resize(a.size());
+    std::copy(b.begin(), b.end(), forward_.elements().begin());
+    std::copy(a.begin(), a.end(), reverse_.elements().begin());
+  }
+
+  /// The next block of the stream, filtered; good until the next call.
+  std::span<const T> operator()(std::type_identity_t<std::span<const T>> block) {
+    detail::load(data_, block);
+    const std::int32_t reset = std::exchange(reset_, false);
+    constexpr auto run = detail::choose<T>(&qsRFPELTA_ssIIRDirectFilterH, &qsRFPELTA_ddIIRDirectFilterH,
+                                           &qsRFPELTA_csIIRDirectFilterH, &qsRFPELTA_zdIIRDirectFilterH);
+    if constexpr (std::is_same_v<T, std::complex<double>>)
+      check(run(data_.get(), reverse_.get(), forward_.get(), inputs_.get(), outputs_.get(), reset,
+                forward_scratch_.get(), saved_.get()));
+    else
+      check(run(data_.get(), reverse_.get(), forward_.get(), inputs_.get(), outputs_.get(), reset,
+                forward_scratch_.get(), reverse_scratch_.get(), saved_.get()));
+    return data_.elements();
+  }
+  /// The next block begins a new stream.
+  void reset() noexcept { reset_ = true; }
+
+ private:
+  bool reset_ = true;
+  host_array<detail::real_of<T>> forward_{0}, reverse_{0}, forward_scratch_{0}, reverse_scratch_{0};
+  host_array<T> data_{0}, inputs_{0}, outputs_{0}, saved_{0};
+};
+
+/// Every `factor`-th sample, or the means of `factor` samples.
+template <class T>
+host_array<T> decimate(const host_array<T> &samples, std::int32_t factor, bool average) {
+  constexpr auto run =
+      detail::choose<T>(&qsRFPELTA_sDecimateH, &qsRFPELTA_dDecimateH, &qsRFPELTA_cDecimateH, &qsRFPELTA_zDecimateH);
+  host_array<T> out(0);
+  check(run(samples.get(), out.get(), factor, average));
+  return out;
+}
+
+template <class T>
+detail::real_of<T> rms(const host_array<T> &samples) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sRMSH, &qsRFPELTA_dRMSH, &qsRFPELTA_cRMSH, &qsRFPELTA_zRMSH);
+  detail::real_of<T> result = 0;
+  check(run(samples.get(), &result));
+  return result;
+}
+
+enum class fit_method : std::int32_t { least_squares = 0, least_absolute = 1, bisquare = 2 };
+
+template <class T>
+struct fitted_line {
+  T slope = 0, intercept = 0, residue = 0;
+  std::int32_t iterations = 0;
+};
+
+/// Replaces y by the line's values. No weights: all points count alike.
+template <class T>
+fitted_line<T> linear_fit(host_array<T> &y, const host_array<T> &x, const host_array<T> &weights = host_array<T>(0),
+                          fit_method method = fit_method::least_squares, float tolerance = 0, float iterations = 0) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sLinearFitH, &qsRFPELTA_dLinearFitH, 0, 0);
+  host_array<T> scratch(0);
+  fitted_line<T> line;
+  check(run(y.get(), x.get(), weights.get(), &line.slope, &line.intercept, &line.residue,
+            static_cast<std::int32_t>(method), tolerance, iterations, &line.iterations, scratch.get()));
+  return line;
+}
+
+/// T is float or std::complex<float>, here and below.
+template <class T>
+host_matrix<T> multiply(const host_matrix<T> &a, const host_matrix<T> &b) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sMtrxMulH, 0, &qsRFPELTA_cMtrxMulH, 0);
+  host_matrix<T> product(0, 0);
+  check(run(a.get(), b.get(), product.get()));
+  return product;
+}
+
+template <class T>
+host_array<T> multiply(const host_matrix<T> &a, const host_array<T> &x) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sMtrxVecMulH, 0, &qsRFPELTA_cMtrxVecMulH, 0);
+  host_array<T> product(0);
+  check(run(a.get(), x.get(), product.get()));
+  return product;
+}
+
+/// The shortest x that makes |a x - b| smallest; singular values up to `tolerance` times the largest count as zero.
+template <class T>
+host_array<T> least_squares(const host_matrix<T> &a, const host_array<T> &b, float tolerance = 0) {
+  constexpr auto run = detail::choose<T>(&qsRFPELTA_sLSEqH, 0, &qsRFPELTA_cLSEqH, 0);
+  host_array<T> x(0), matrix(0), rhs(0), work(0);
+  check(run(a.get(), b.get(), tolerance, x.get(), matrix.get(), rhs.get(), work.get()));
+  return x;
+}
+
 }  // namespace lumra
