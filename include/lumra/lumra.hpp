@@ -121,9 +121,7 @@ class host_array {
 
   host_array() = default;
   explicit host_array(std::size_t count) {
-    if (count > static_cast<std::size_t>(std::numeric_limits<std::int32_t>::max()))
-      throw std::length_error("host_array");
-    const auto size = static_cast<std::int32_t>(count);
+    const std::int32_t size = checked(count);
     check(qsHost_ArrayNew(detail::element<T>::code, 1, &size, &handle_));
   }
   host_array(host_array &&other) noexcept : handle_(std::exchange(other.handle_, nullptr)) {}
@@ -142,11 +140,10 @@ class host_array {
 
   /// Keeps the elements up to the smaller of the two counts; new ones are zero.
   void resize(std::size_t count) {
-    if (count > static_cast<std::size_t>(std::numeric_limits<std::int32_t>::max()))
-      throw std::length_error("host_array");
+    const std::int32_t wanted = checked(count);
     const std::size_t before = size();
     check(qsHost_ArrayResize(detail::element<T>::code, 1, &handle_, count));
-    (*handle_)->count = static_cast<std::int32_t>(count);
+    (*handle_)->count = wanted;
     for (T &fresh : elements().subspan(before < count ? before : count)) fresh = T{};
   }
 
@@ -156,6 +153,11 @@ class host_array {
   [[nodiscard]] handle release() noexcept { return std::exchange(handle_, nullptr); }
 
  private:
+  static std::int32_t checked(std::size_t count) {
+    if (count > static_cast<std::size_t>(std::numeric_limits<std::int32_t>::max()))
+      throw std::length_error("host_array");
+    return static_cast<std::int32_t>(count);
+  }
   [[nodiscard]] bool has_block() const noexcept { return handle_ && *handle_; }
   [[nodiscard]] T *data() const noexcept { return has_block() ? reinterpret_cast<T *>((*handle_)->elements) : nullptr; }
 
@@ -180,6 +182,7 @@ class host_matrix {
   /// The elements, row after row; valid until the matrix is resized.
   [[nodiscard]] std::span<T> elements() noexcept { return {data(), size()}; }
   [[nodiscard]] std::span<const T> elements() const noexcept { return {data(), size()}; }
+  [[nodiscard]] std::span<T> row(std::size_t r) noexcept { return elements().subspan(r * columns(), columns()); }
   [[nodiscard]] std::size_t rows() const noexcept {
     return has_block() ? static_cast<std::size_t>((*handle_)->rows) : 0;
   }
@@ -779,6 +782,7 @@ std::span<const T> apply_window(plan<T> &plan, std::type_identity_t<std::span<co
   detail::load(plan.out, samples);
   check(run(plan.out.get(), static_cast<std::int32_t>(type), normalised, plan.tables.get()));
   return plan.out.elements();
+}
 
 // Error vectors, as their C functions document them: b is compared with the reference a. The matrices must agree in the
 // number of elements; e is not resized.
@@ -806,35 +810,6 @@ inline void phase_error(const host_matrix<std::complex<float>> &a, const host_ma
                         host_matrix<float> &e, accuracy mode = accuracy::high) {
   check(qsLumraAlgo_CalculatePhaseError2D(a.get(), b.get(), e.get(), static_cast<std::int32_t>(mode)));
 }
-
-/// An owned matrix, row by row, in the library's own memory.
-template <class T>
-class host_matrix {
- public:
-  using handle = typename detail::element<T>::matrix_block **;
-
-  host_matrix(std::int32_t rows, std::int32_t columns) {
-    const std::int32_t sizes[] = {rows, columns};
-    check(qsHost_ArrayNew(detail::element<T>::code, 2, sizes, &handle_));
-  }
-  host_matrix(host_matrix &&other) noexcept : handle_(std::exchange(other.handle_, nullptr)) {}
-  host_matrix &operator=(host_matrix &&other) noexcept {
-    std::swap(handle_, other.handle_);
-    return *this;
-  }
-  ~host_matrix() { qsHost_ArrayFree(&handle_); }
-
-  [[nodiscard]] std::int32_t rows() const noexcept { return (*handle_)->rows; }
-  [[nodiscard]] std::int32_t columns() const noexcept { return (*handle_)->columns; }
-  [[nodiscard]] std::span<T> row(std::int32_t r) noexcept {
-    const auto width = static_cast<std::size_t>(columns());
-    return {reinterpret_cast<T *>((*handle_)->elements) + static_cast<std::size_t>(r) * width, width};
-  }
-  [[nodiscard]] handle get() const noexcept { return handle_; }
-
- private:
-  handle handle_ = nullptr;
-};
 
 enum class interpolation : std::int32_t { linear = 0, nearest = 1 };
 
