@@ -146,7 +146,7 @@ TYPED_TEST(Resample, AgreesWithTheDefinitionHoweverTheStreamIsCut) {
               stream<E> cut(how, h);
               const auto parts = this->in_blocks(cut, record, block);
               ASSERT_EQ(all.size(), parts.size());
-              EXPECT_EQ(0, std::memcmp(all.data(), parts.data(), all.size() * sizeof all[0])) << "block " << block;
+              EXPECT_TRUE(all == parts) << "block " << block;
               EXPECT_EQ(whole.template field<std::int32_t>(0), cut.template field<std::int32_t>(0));
               EXPECT_EQ(whole.template field<double>(16), cut.template field<double>(16));
               EXPECT_EQ(200, cut.template field<double>(32));
