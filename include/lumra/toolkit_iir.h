@@ -26,9 +26,9 @@ extern "C" {
  *               them. inputScratch, of the data's type, needed with nb > 1 (the smaller of nb - 1 and n elements)
  *
  * The result does not depend on how the stream is cut, bit for bit. Up to 12 reverse coefficients behind a[0], outputs
- * below the normal range of the type are computed in double precision in steps of the smallest number of the type, and
- * cost as much time as others. The states must not be another array of the call. On failure the data and both states
- * are emptied.
+ * below the normal range of the type are computed in double precision in steps of the smallest number of the type,
+ * which takes about twice the time of others. The states must not be another array of the call. On failure the data and
+ * both states are emptied.
  *
  * Codes in the order of the checks: -20008 (reverse coefficients alone), -20061 (shared state or scratch), -20001
  * (states), -20999, -20001 (scratch). */
