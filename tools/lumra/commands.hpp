@@ -8,6 +8,7 @@ namespace tool {
 
 void add_evm(CLI::App &program);
 void add_info(CLI::App &program);
+void add_resample(CLI::App &program);
 void add_spectrum(CLI::App &program);
 
 }  // namespace tool

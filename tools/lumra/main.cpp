@@ -21,11 +21,12 @@ int fail(int code, std::string text) {
 }
 
 int run(int count, char **arguments) {
-  CLI::App program("Spectra and error vectors of recorded radio signals", "lumra");
+  CLI::App program("Spectra, error vectors and resampling of recorded radio signals", "lumra");
   program.require_subcommand(1);
   program.set_version_flag("--version", "lumra " + lumra::library().version_text);
   tool::add_spectrum(program);
   tool::add_evm(program);
+  tool::add_resample(program);
   tool::add_info(program);
   try {
     program.parse(count, arguments);

@@ -1,0 +1,141 @@
+// lumra resample: a recording at a new rate, as SigMF. SPDX-License-Identifier: MIT
+#include <fmt/format.h>
+
+#include <cmath>
+#include <lumra/lumra.hpp>
+#include <memory>
+
+#include "arguments.hpp"
+#include "commands.hpp"
+#include "failure.hpp"
+#include "recording.hpp"
+#include "resampling.hpp"
+#include "sigmf_writer.hpp"
+#include "summary.hpp"
+#include "units.hpp"
+
+namespace tool {
+namespace {
+
+namespace fs = std::filesystem;
+
+struct resample_command {
+  std::string path, output;
+  recording_options options;
+  double rate = 0;
+  std::uint64_t block = std::uint64_t{1} << 16;
+};
+
+/// The common name of the files to write.
+fs::path output_base(const resample_command &command, const recording &source) {
+  fs::path base = command.output;
+  if (base.empty())
+    return source.files.front().parent_path() /
+           fmt::format("{}-{:.12g}Hz", source.files.front().stem().string(), command.rate);
+  if (base.extension() == ".sigmf-data" || base.extension() == ".sigmf-meta") base.replace_extension();
+  if (!base.has_filename()) throw failure("{}: is a folder; give the result a name in it", base.string());
+  return base;
+}
+
+/// The library's resamplers take the ratio in single precision.
+float ratio_of(const recording &source, double rate) {
+  const double ratio = source.rate / rate;
+  constexpr double largest = largest_ratio;
+  if (!(ratio <= largest && ratio >= 1 / largest))
+    throw failure("{}: from {} to {} is beyond a factor of {:g}; resample in several steps", source.data.string(),
+                  exact_text(source.rate), exact_text(rate), largest);
+  return static_cast<float>(ratio);
+}
+
+std::string length_text(std::uint64_t samples, double rate) {
+  return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, exact_text(rate));
+}
+
+void print_summary(const resample_command &command, const recording &source, const resampling_filter &filter,
+                   double ratio, double rate, std::uint64_t written, const std::string &base) {
+  const double lower = std::min(source.rate, rate);
+  summary_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  summary_line("Input samples", length_text(source.samples(), source.rate));
+  summary_line("Output samples", length_text(written, rate));
+  summary_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
+  summary_line("Ratio", fmt::format("{:.17g} input samples per output sample", ratio));
+  if (rate != command.rate)
+    summary_line("Note", fmt::format("the ratio is rounded to single precision: the rate is {:.17g} Hz, {:+.2g} of the "
+                                     "one asked for, and so in the metadata",
+                                     rate, rate / command.rate - 1));
+  summary_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
+                                        filter.coefficients.size(), filter.phases));
+  summary_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
+                                        exact_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
+  summary_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
+                                        exact_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
+  summary_line("Data", base + ".sigmf-data");
+  summary_line("Metadata", base + ".sigmf-meta");
+}
+
+/// Here the option that the input's rate is given with has another name than elsewhere.
+recording open_input(const resample_command &command) {
+  try {
+    return open_recording(command.path, command.options);
+  } catch (const failure &reason) {
+    std::string text = reason.what();
+    constexpr std::string_view elsewhere = "--rate";
+    // At the end, so that no name of a file is taken for it.
+    const std::size_t at = text.rfind(elsewhere);
+    if (at != std::string::npos && text.size() - at <= elsewhere.size() + std::string_view(" HZ").size())
+      text.replace(at, elsewhere.size(), "--input-rate");
+    throw failure("{}", text);
+  }
+}
+
+void run(const resample_command &command) {
+  const recording source = open_input(command);
+  if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
+  const float ratio = ratio_of(source, command.rate);
+  const auto exact = static_cast<double>(ratio);
+  // What the ratio in use makes of the input's rate; the rate asked for where that is the same ratio exactly.
+  const double rate = source.rate / command.rate == exact ? command.rate : source.rate / exact;
+
+  const fs::path base = output_base(command, source);
+  sigmf_writer output(base, source.files);
+  const resampling_filter filter = design_resampling_filter();
+  const std::uint64_t written =
+      resample(source, filter, ratio, command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
+  output.commit(rate, source.frequency,
+                fmt::format("{}, resampled from {:.17g} Hz to {:.17g} Hz by lumra {}", source.name, source.rate, rate,
+                            lumra::library().version_text));
+  print_summary(command, source, filter, exact, rate, written, base.string());
+}
+
+}  // namespace
+
+void add_resample(CLI::App &program) {
+  auto command = std::make_shared<resample_command>();
+  CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
+  app->footer(
+      "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass\n"
+      "band is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower "
+      "rate\n"
+      "is rejected. Samples are written as cf32_le.");
+  app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
+      ->required();
+  add_recording_options(*app, command->options.rate, command->options.format);
+  app->remove_option(app->get_option("--rate"));  // here it is the new one
+  const auto positive =
+      number_where("a positive number", [](double value) { return value > 0 && std::isfinite(value); });
+  app->add_option("--rate", command->rate, "The new sample rate")->option_text("HZ")->required()->check(positive);
+  app->add_option("--input-rate", command->options.rate,
+                  "Sample rate of RECORDING; needed for raw files, overrides the metadata")
+      ->option_text("HZ")
+      ->check(positive);
+  app->add_option("--output", command->output,
+                  "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
+      ->option_text("BASE");
+  app->add_option("--capture", command->options.capture, "Use this capture of a SigMF recording alone, from 0")
+      ->option_text("INDEX");
+  // For tests: how much is read at a time must not change the result.
+  app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
+  app->callback([command] { run(*command); });
+}
+
+}  // namespace tool

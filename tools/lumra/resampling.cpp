@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: MIT
+#include "resampling.hpp"
+
+#include <algorithm>
+#include <cmath>
+#include <lumra/lumra.hpp>
+#include <numbers>
+
+#include "failure.hpp"
+#include "progress.hpp"
+#include "sample_reader.hpp"
+
+namespace tool {
+namespace {
+
+using sample = std::complex<float>;
+
+/// So many that the images of the linear interpolation lie below the stop band of the design.
+constexpr std::int32_t phases = 128;
+constexpr double pass_edge = 0.45, stop_edge = 0.5, attenuation = 90;
+/// Of the response: some sixteen a side lobe.
+constexpr std::int32_t points = 1 << 18;
+/// Outputs that one call may give, roughly.
+constexpr std::uint64_t outputs_per_call = std::uint64_t{1} << 18;
+
+double sinc(double x) {
+  return x == 0 ? 1 : std::sin(std::numbers::pi * x) / (std::numbers::pi * x);
+}
+
+/// Interpolating linearly multiplies the response, periodic in `phases`, by a squared sinc with zeros at its periods.
+/// The images around the first of them are the strongest.
+void measure(resampling_filter &filter) {
+  lumra::plan<float> plan;
+  const auto response = lumra::fft(plan, filter.coefficients, points);
+  const auto gain = [&](std::int32_t k) {  // at k * phases / points
+    const std::int32_t folded = std::min(k, points - k);
+    const double shape = sinc(static_cast<double>(k) / points);
+    return static_cast<double>(std::abs(response[static_cast<std::size_t>(folded)])) * shape * shape;
+  };
+  const double pass = pass_edge * points / phases, stop = stop_edge * points / phases;
+  for (std::int32_t k = 0; k <= pass; ++k) filter.ripple = std::max(filter.ripple, std::abs(gain(k) - 1));
+  for (auto k = static_cast<std::int32_t>(std::ceil(stop)); k <= points; ++k)
+    filter.rejection = std::max(filter.rejection, gain(k));
+}
+
+}  // namespace
+
+resampling_filter design_resampling_filter() {
+  const auto design = lumra::registered_filter::kaiser_low_pass(phases, pass_edge, stop_edge, attenuation);
+  resampling_filter filter{{design.coefficients().begin(), design.coefficients().end()}, phases, pass_edge, stop_edge};
+  double sum = 0;
+  for (const float h : filter.coefficients) sum += static_cast<double>(h);
+  for (float &h : filter.coefficients) h = static_cast<float>(static_cast<double>(h) / sum);
+  measure(filter);
+  return filter;
+}
+
+std::uint64_t resample(const recording &source, const resampling_filter &filter, float ratio, std::uint64_t block,
+                       const std::function<void(std::span<const sample>)> &write) {
+  const std::uint64_t samples = source.samples();
+  // Exact up to 2^39 outputs: the ratio has 24 bits, a quotient that is not whole is 2^-24 or more away from it.
+  const auto wanted =
+      static_cast<std::uint64_t>(std::ceil(static_cast<long double>(samples) / static_cast<long double>(ratio)));
+  const auto fitting = static_cast<std::uint64_t>(static_cast<double>(outputs_per_call) * static_cast<double>(ratio));
+  const std::uint64_t per_call = std::clamp<std::uint64_t>(fitting, 1, block);
+
+  lumra::resampler<sample> resampler(filter.coefficients, filter.phases, {.ratio = ratio});
+  sample_reader reader(source);
+  progress bar("Resampling");
+  std::vector<sample> in(per_call);
+  std::uint64_t read = 0, written = 0;
+  while (written < wanted) {
+    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>(per_call, samples - read));
+    reader.read(std::span(in).first(count));
+    std::fill(in.begin() + static_cast<std::ptrdiff_t>(count), in.end(), sample());  // the zeros behind the recording
+    read += count;
+    std::span<const sample> out = resampler(in);
+    out = out.first(static_cast<std::size_t>(std::min<std::uint64_t>(out.size(), wanted - written)));
+    if (!std::all_of(out.begin(), out.end(),
+                     [](const sample &x) { return std::isfinite(x.real()) && std::isfinite(x.imag()); }))
+      throw failure("{}: samples are too large for single precision; scale the recording down", source.data.string());
+    if (!out.empty()) write(out);
+    written += out.size();
+    bar.update(written, wanted);
+  }
+  return written;
+}
+
+}  // namespace tool
