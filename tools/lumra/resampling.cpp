@@ -18,7 +18,7 @@ using sample = std::complex<float>;
 /// So many that the images of the linear interpolation lie below the stop band of the design.
 constexpr std::int32_t phases = 128;
 constexpr double pass_edge = 0.45, stop_edge = 0.5, attenuation = 90;
-/// Of the response: some sixteen a side lobe.
+/// Of the response: some sixteen to a side lobe.
 constexpr std::int32_t points = 1 << 18;
 /// Outputs that one call may give, roughly.
 constexpr std::uint64_t outputs_per_call = std::uint64_t{1} << 18;
@@ -64,16 +64,23 @@ std::uint64_t resample(const recording &source, const resampling_filter &filter,
   const auto fitting = static_cast<std::uint64_t>(static_cast<double>(outputs_per_call) * static_cast<double>(ratio));
   const std::uint64_t per_call = std::clamp<std::uint64_t>(fitting, 1, block);
 
+  // Zeros that the last output needs.
+  const double reach = static_cast<double>(filter.coefficients.size() - 1) / (2 * filter.phases);
+  const auto behind = static_cast<std::uint64_t>(reach * std::max(static_cast<double>(ratio), 1.0)) + 1;
+
   lumra::resampler<sample> resampler(filter.coefficients, filter.phases, {.ratio = ratio});
   sample_reader reader(source);
   progress bar("Resampling");
-  std::vector<sample> in(per_call);
+  std::vector<sample> in;
   std::uint64_t read = 0, written = 0;
   while (written < wanted) {
-    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>(per_call, samples - read));
-    reader.read(std::span(in).first(count));
-    std::fill(in.begin() + static_cast<std::ptrdiff_t>(count), in.end(), sample());  // the zeros behind the recording
-    read += count;
+    if (read < samples) {
+      in.resize(std::min(per_call, samples - read));
+      reader.read(in);
+      read += in.size();
+    } else {
+      in.assign(std::min(per_call, behind), sample());
+    }
     std::span<const sample> out = resampler(in);
     out = out.first(static_cast<std::size_t>(std::min<std::uint64_t>(out.size(), wanted - written)));
     if (!std::all_of(out.begin(), out.end(),

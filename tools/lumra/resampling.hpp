@@ -23,7 +23,7 @@ struct resampling_filter {
 
 resampling_filter design_resampling_filter();
 
-/// Both limits of the factor between the rates: taps for lower ones would not fit caches, nor outputs of one sample.
+/// Of the factor between the rates, up or down; the filter of this one takes 100 MB.
 inline constexpr float largest_ratio = 65536;
 
 /// Calls write with outputs 0 .. ceil(samples / ratio) - 1, in order; output k lies at input sample k * ratio, and the
