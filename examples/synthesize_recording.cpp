@@ -45,27 +45,6 @@ sample rotation(double frequency, std::size_t n) {
   return {static_cast<float>(std::cos(angle)), static_cast<float>(std::sin(angle))};
 }
 
-/// Inverse transform without scaling; the size is a power of two.
-void inverse_transform(std::span<sample> x) {
-  const std::size_t n = x.size();
-  for (std::size_t i = 1, j = 0; i < n; ++i) {
-    std::size_t bit = n / 2;
-    for (; j & bit; bit /= 2) j ^= bit;
-    j ^= bit;
-    if (i < j) std::swap(x[i], x[j]);
-  }
-  for (std::size_t half = 1; half < n; half *= 2)
-    for (std::size_t k = 0; k < half; ++k) {
-      const double angle = std::numbers::pi * static_cast<double>(k) / static_cast<double>(half);
-      const sample twiddle(static_cast<float>(std::cos(angle)), static_cast<float>(std::sin(angle)));
-      for (std::size_t i = k; i < n; i += 2 * half) {
-        const sample odd = x[i + half] * twiddle;
-        x[i + half] = x[i] - odd;
-        x[i] += odd;
-      }
-    }
-}
-
 /// 600 subcarriers of 15 kHz with 64-QAM, guard intervals, and symbols that fade into each other.
 void add_ofdm(std::span<sample> out, std::mt19937 &random) {
   constexpr std::size_t size = 2048, used = 600, guard = 144, ramp = 64;
@@ -75,18 +54,19 @@ void add_ofdm(std::span<sample> out, std::mt19937 &random) {
     const double angle = -2 * std::numbers::pi * frequency * 130e-9 + 2.1;
     return sample(1.0F + 0.45F * static_cast<float>(std::cos(angle)), 0.45F * static_cast<float>(std::sin(angle)));
   };
-  // 42 is the mean power of the levels -7, -5 ... 7 in both components.
-  const auto scale = static_cast<float>(1 / std::sqrt(42.0 * used));
-  std::vector<sample> symbol(size);
+  // 42 is the mean power of the levels -7, -5 ... 7 in both components; the inverse transform divides by its size.
+  const auto scale = static_cast<float>(size / std::sqrt(42.0 * used));
+  std::vector<sample> bins(size);
+  lumra::plan<sample> plan;
   for (std::size_t start = 0; start + size + guard + ramp <= out.size(); start += size + guard) {
-    std::fill(symbol.begin(), symbol.end(), sample{});
+    std::fill(bins.begin(), bins.end(), sample{});
     for (std::size_t k = 1; k <= used / 2; ++k)
       for (const bool upper : {false, true}) {
         const double frequency = (upper ? 1.0 : -1.0) * static_cast<double>(k) * sample_rate / size;
         const sample point(static_cast<float>(2 * level(random) - 7), static_cast<float>(2 * level(random) - 7));
-        symbol[upper ? k : size - k] = point * channel(frequency) * scale;
+        bins[upper ? k : size - k] = point * channel(frequency) * scale;
       }
-    inverse_transform(symbol);
+    const std::span<const sample> symbol = lumra::inverse_fft(plan, bins);
     for (std::size_t n = 0; n < size + guard + ramp; ++n) {
       const std::size_t from_edge = std::min(n, size + guard + ramp - 1 - n);
       const double phase = std::numbers::pi / 2 * (static_cast<double>(from_edge) + 0.5) / ramp;
