@@ -85,84 +85,129 @@ struct prototype {
   [[nodiscard]] double reach() const noexcept { return centre() * stretch / phases; }
 };
 
-/// Sums of terms 0, 4, 8, ..., of terms 1, 5, 9, ..., and so on. The result depends on the terms alone, not on how they
-/// are added in pieces.
-template <class Sum>
-class sum_in_four {
- public:
-  template <class Term>
-  void add(std::int64_t begin, std::int64_t end, Term term) noexcept {
-    std::int64_t k = begin;
-    for (; k < end && k % 4 != 0; ++k) part_[k % 4] += term(k);
-    Sum s0 = part_[0], s1 = part_[1], s2 = part_[2], s3 = part_[3];  // in registers
-    for (; k + 4 <= end; k += 4) {
-      s0 += term(k);
-      s1 += term(k + 1);
-      s2 += term(k + 2);
-      s3 += term(k + 3);
-    }
-    if (k < end) s0 += term(k);
-    if (k + 1 < end) s1 += term(k + 1);
-    if (k + 2 < end) s2 += term(k + 2);
-    part_[0] = s0, part_[1] = s1, part_[2] = s2, part_[3] = s3;
-  }
-  [[nodiscard]] Sum total() const noexcept { return (part_[0] + part_[2]) + (part_[1] + part_[3]); }
+// Dot products of n samples with taps. Samples and taps can be read, not only used, up to a whole group: n rounded up
+// to a multiple of 8.
 
- private:
-  Sum part_[4] = {};
-};
+constexpr std::int64_t group = 8;
 
-// With a whole step all taps of an output lie equally far behind a coefficient: the sum over the coefficients in front
-// of the taps and that over those behind them are enough, and no tap has to be made.
+constexpr std::int64_t in_groups(std::int64_t n) noexcept {
+  return (n + group - 1) / group * group;
+}
 
-/// Products of one sample with two neighbouring coefficients.
 template <class Real, class T>
-struct product_pair {
-  T first{}, second{};
+T dot(const Real *h, const T *x, std::int64_t n) noexcept {
+  T s0{}, s1{}, s2{}, s3{};
+  std::int64_t k = 0;
+  for (; k + 4 <= n; k += 4) {
+    s0 += h[k] * x[k];
+    s1 += h[k + 1] * x[k + 1];
+    s2 += h[k + 2] * x[k + 2];
+    s3 += h[k + 3] * x[k + 3];
+  }
+  for (; k < n; ++k) s0 += h[k] * x[k];
+  return (s0 + s2) + (s1 + s3);
+}
+inline float dot(const float *h, const float *x, std::int64_t n) noexcept {
+  return qsrfhs::kernels::active().dot(h, x, static_cast<std::size_t>(n));
+}
+inline std::complex<float> dot(const float *h, const std::complex<float> *x, std::int64_t n) noexcept {
+  float sum[2];
+  qsrfhs::kernels::active().complex_dot(h, reinterpret_cast<const float *>(x), static_cast<std::size_t>(n), sum);
+  return {sum[0], sum[1]};
+}
 
-  static product_pair of(const Real *h, const T &x) noexcept { return {h[0] * x, h[1] * x}; }
-  product_pair &operator+=(const product_pair &b) noexcept {
-    first += b.first;
-    second += b.second;
-    return *this;
-  }
-  friend product_pair operator+(product_pair a, const product_pair &b) noexcept { return a += b; }
-  [[nodiscard]] T between(Real fraction) const noexcept { return (1 - fraction) * first + fraction * second; }
-};
+/// The dot product with taps that lie at `fraction` between h0 and h1.
+template <class Real, class T>
+T dot_between(const Real *h0, const Real *h1, Real fraction, const T *x, std::int64_t n) noexcept {
+  return (1 - fraction) * dot(h0, x, n) + fraction * dot(h1, x, n);
+}
+inline float dot_between(const float *h0, const float *h1, float fraction, const float *x, std::int64_t n) noexcept {
+  return qsrfhs::kernels::active().dot_between(h0, h1, fraction, x, static_cast<std::size_t>(n));
+}
+inline std::complex<float> dot_between(const float *h0, const float *h1, float fraction, const std::complex<float> *x,
+                                       std::int64_t n) noexcept {
+  float sum[2];
+  qsrfhs::kernels::active().complex_dot_between(h0, h1, fraction, reinterpret_cast<const float *>(x),
+                                                static_cast<std::size_t>(n), sum);
+  return {sum[0], sum[1]};
+}
 
-template <>
-struct product_pair<float, std::complex<float>> {
-  __m128 parts = _mm_setzero_ps();  // first, second
+// Taps at t, t + step, ... between the coefficients, made in double precision.
 
-  static product_pair of(const float *h, const std::complex<float> &x) noexcept {
-    const __m128 both = _mm_castpd_ps(_mm_load_sd(reinterpret_cast<const double *>(h)));
-    const __m128d sample = _mm_load_sd(reinterpret_cast<const double *>(&x));
-    return {_mm_mul_ps(_mm_unpacklo_ps(both, both), _mm_castpd_ps(_mm_unpacklo_pd(sample, sample)))};
+template <class Real>
+Real tap_between(const Real *h, double t) noexcept {
+  const auto i = static_cast<std::int32_t>(t);
+  const auto near = static_cast<double>(h[i]), far = static_cast<double>(h[i + 1]);
+  return static_cast<Real>(near + (t - i) * (far - near));
+}
+
+/// Taps begin .. end - 1 of those that start at `tap`.
+template <class Real>
+void taps_between(const Real *h, double tap, double step, std::int64_t begin, std::int64_t end, Real *taps) noexcept {
+  for (std::int64_t k = begin; k < end; ++k) *taps++ = tap_between(h, tap + static_cast<double>(k) * step);
+}
+inline void taps_between(const float *h, double tap, double step, std::int64_t begin, std::int64_t end,
+                         float *taps) noexcept {
+  const __m128d start = _mm_set1_pd(tap), steps = _mm_set1_pd(step), two = _mm_set1_pd(2);
+  __m128d count = _mm_setr_pd(static_cast<double>(begin), static_cast<double>(begin + 1));
+  std::int64_t k = begin;
+  for (; k + 2 <= end; k += 2, taps += 2, count = _mm_add_pd(count, two)) {
+    const __m128d t = _mm_add_pd(start, _mm_mul_pd(count, steps));
+    const __m128i index = _mm_cvttpd_epi32(t);
+    const std::int64_t both = _mm_cvtsi128_si64(index);
+    const auto pair_at = [h](std::int64_t i) {
+      return _mm_castpd_ps(_mm_load_sd(reinterpret_cast<const double *>(h + i)));
+    };
+    const __m128 pairs = _mm_unpacklo_ps(pair_at(static_cast<std::int32_t>(both)), pair_at(both >> 32));
+    const __m128d near = _mm_cvtps_pd(pairs), far = _mm_cvtps_pd(_mm_movehl_ps(pairs, pairs));
+    const __m128d fraction = _mm_sub_pd(t, _mm_cvtepi32_pd(index));
+    const __m128 made = _mm_cvtpd_ps(_mm_add_pd(near, _mm_mul_pd(fraction, _mm_sub_pd(far, near))));
+    _mm_storel_pi(reinterpret_cast<__m64 *>(taps), made);
   }
-  product_pair &operator+=(const product_pair &b) noexcept {
-    parts = _mm_add_ps(parts, b.parts);
-    return *this;
-  }
-  friend product_pair operator+(product_pair a, const product_pair &b) noexcept { return a += b; }
-  [[nodiscard]] std::complex<float> between(float fraction) const noexcept {
-    alignas(16) float sums[4];
-    _mm_store_ps(sums, parts);
-    return {(1 - fraction) * sums[0] + fraction * sums[2], (1 - fraction) * sums[1] + fraction * sums[3]};
-  }
-};
+  if (k < end) *taps = tap_between(h, tap + static_cast<double>(k) * step);
+}
 
 /// The samples of one channel around a block: index -1 is the newest of the history.
 template <class T>
 struct channel {
   const T *block, *history_end;
+  std::int64_t block_size;
 
-  /// Calls add(x, begin, end) so that x[k] is sample first + k, for k = 0 .. count - 1.
-  template <class Add>
-  void over(std::int64_t first, std::int64_t count, Add add) const noexcept {
+  /// Samples first .. first + count - 1, in `copy` unless they can be read in groups where they are.
+  const T *samples(std::int64_t first, std::int64_t count, T *copy) const noexcept {
+    if (first >= 0 && first + in_groups(count) <= block_size) return block + first;
     const std::int64_t old = std::clamp<std::int64_t>(-first, 0, count);
-    if (old > 0) add(history_end + first, 0, old);
-    if (old < count) add(block + first, old, count);
+    if (old > 0) std::copy_n(history_end + first, old, copy);
+    if (old < count) std::copy_n(block + first + old, count - old, copy + old);
+    return copy;
   }
+};
+
+/// The prototype phase by phase, so that the taps of one output lie side by side where the step is whole: row q holds
+/// coefficients q, q + phases, q + 2 phases, ..., rows 0 .. phases.
+template <class Real>
+class phase_rows {
+ public:
+  [[nodiscard]] bool ready() const noexcept { return length_ > 0; }
+  [[nodiscard]] const Real *row(std::int64_t phase) const noexcept { return &rows_[phase * length_]; }
+
+  /// Without effect where they do not fit.
+  void fill(std::span<const Real> h, std::int64_t phases) noexcept {
+    const auto size = static_cast<std::int64_t>(h.size()), length = in_groups((size - 1) / phases + 1);
+    if (length > capacity / (phases + 1)) return;
+    length_ = length;
+    for (std::int64_t q = 0; q <= phases; ++q) {
+      Real *out = &rows_[q * length];
+      Real *const end = out + length;
+      for (std::int64_t i = q; i < size; i += phases) *out++ = h[static_cast<std::size_t>(i)];
+      std::fill(out, end, Real{});
+    }
+  }
+
+ private:
+  static constexpr std::int64_t capacity = 32768 / sizeof(Real);
+  std::int64_t length_ = 0;
+  Real rows_[capacity];
 };
 
 /// Where an output takes its samples, and where its first tap lies in the prototype.
@@ -177,14 +222,19 @@ class resampler {
   using real = real_of<E>;
   using value = value_of<E>;
 
-  resampler(const prototype<real> &filter, std::int32_t interpolation, std::span<real> taps) noexcept
+  resampler(const prototype<real> &filter, std::int32_t interpolation, std::int64_t most_taps) noexcept
       : filter_(filter),
         reach_(position::of(filter.reach())),
         step_(filter.step()),
         last_(static_cast<double>(filter.h.size() - 1)),
         nearest_(interpolation == 1),
         whole_step_(filter.stretch == 1 ? static_cast<std::int64_t>(filter.phases) : 0),
-        taps_(taps) {}
+        most_taps_(most_taps) {}
+
+  /// Worth its time where `outputs` are at least as many as the phases.
+  void prepare(std::int64_t outputs) noexcept {
+    if (whole_step_ > 0 && outputs >= whole_step_) rows_.fill(filter_.h, whole_step_);
+  }
 
   [[nodiscard]] position reach() const noexcept { return reach_; }
 
@@ -196,58 +246,65 @@ class resampler {
     return {p.whole() - left + 1, left + right, std::max(tap, 0.0)};
   }
 
-  /// The output of every channel at a window whose first sample is `first` in the channels' own count.
+  /// The output of every channel at a window whose first sample is `first` in the channels' own count. The result
+  /// depends on the samples alone, not on where they are.
   template <class Channels>
   void compute(const window &w, std::int64_t first, std::int32_t rows, Channels channel_of, value *out,
-               std::int64_t stride) const {
-    require(w.count <= static_cast<std::int64_t>(taps_.size()), history_too_short);
-    const double floor = std::floor(w.tap);
-    const auto index = static_cast<std::int64_t>(floor);
-    const bool pairs = whole_step_ > 0 && !nearest_ && w.count > 0 &&
-                       index + (w.count - 1) * whole_step_ + 1 < static_cast<std::int64_t>(filter_.h.size());
-    if (!pairs) make_taps(w);
-    for (std::int32_t r = 0; r < rows; ++r) {
-      const channel<value> samples = channel_of(r);
-      value &y = out[r * stride];
-      if (pairs) {
-        sum_in_four<product_pair<real, value>> sum;
-        const real *const h = filter_.h.data() + index;
-        samples.over(first, w.count, [&](const value *x, std::int64_t begin, std::int64_t end) {
-          sum.add(begin, end, [&](std::int64_t k) { return product_pair<real, value>::of(h + k * whole_step_, x[k]); });
-        });
-        y = sum.total().between(static_cast<real>(w.tap - floor));
+               std::int64_t stride) {
+    require(w.count <= most_taps_, history_too_short);
+    if (w.count <= 0) {
+      for (std::int32_t r = 0; r < rows; ++r) out[r * stride] = value{};
+    }
+    // With a whole step all taps lie equally far behind a coefficient: the sums over the coefficients in front of the
+    // taps and over those behind them are enough, and no tap has to be made.
+    const double t = nearest_ ? w.tap + 0.5 : w.tap;
+    const auto index = static_cast<std::int64_t>(t);
+    const auto fraction = static_cast<real>(t - static_cast<double>(index));
+    const std::int64_t ahead = nearest_ ? 0 : 1;
+    const bool in_step =
+        whole_step_ > 0 && index + (w.count - 1) * whole_step_ + ahead < static_cast<std::int64_t>(filter_.h.size());
+    const bool in_rows = in_step && rows_.ready() && index + ahead <= whole_step_;
+    for (std::int64_t k = 0; k < w.count; k += piece) {
+      const std::int64_t n = std::min(piece, w.count - k);
+      const real *h0 = near_, *h1 = far_;
+      if (in_rows) {
+        h0 = rows_.row(index) + k;
+        h1 = rows_.row(index + ahead) + k;
+      } else if (in_step) {
+        gather(index + k * whole_step_, n, near_);
+        if (!nearest_) gather(index + 1 + k * whole_step_, n, far_);
       } else {
-        sum_in_four<value> sum;
-        samples.over(first, w.count, [&](const value *x, std::int64_t begin, std::int64_t end) {
-          sum.add(begin, end, [&](std::int64_t k) { return taps_[static_cast<std::size_t>(k)] * x[k]; });
-        });
-        y = sum.total();
+        make_taps(w, k, n);
+      }
+      for (std::int32_t r = 0; r < rows; ++r) {
+        const value *const x = channel_of(r).samples(first + k, n, samples_);
+        const value sum = in_step && !nearest_ ? dot_between(h0, h1, fraction, x, n) : dot(h0, x, n);
+        value &y = out[r * stride];
+        y = k == 0 ? sum : y + sum;
       }
     }
   }
 
  private:
-  void make_taps(const window &w) const noexcept {
+  static constexpr std::int64_t piece = 256;  // taps at once, whole groups
+
+  void gather(std::int64_t index, std::int64_t n, real *taps) const noexcept {
+    for (std::int64_t j = 0; j < n; ++j, index += whole_step_) taps[j] = filter_.h[static_cast<std::size_t>(index)];
+  }
+
+  /// Taps k .. k + n - 1 of a window.
+  void make_taps(const window &w, std::int64_t k, std::int64_t n) noexcept {
     const real *const h = filter_.h.data();
-    real *const taps = taps_.data();
-    std::int64_t k = 0;
     if (nearest_) {
       const double t = w.tap + 0.5;
-      for (; k < w.count; ++k)
-        taps[k] = h[static_cast<std::int32_t>(std::min(t + static_cast<double>(k) * step_, last_))];
+      for (std::int64_t j = 0; j < n; ++j)
+        near_[j] = h[static_cast<std::int32_t>(std::min(t + static_cast<double>(k + j) * step_, last_))];
       return;
     }
-    const auto interpolated = [h](double t, std::int32_t ahead) {
-      const auto i = static_cast<std::int32_t>(t);
-      const auto near = static_cast<double>(h[i]), far = static_cast<double>(h[i + ahead]);
-      return static_cast<real>(near + (t - i) * (far - near));
-    };
-    for (; k < w.count; ++k) {
-      const double t = w.tap + static_cast<double>(k) * step_;
-      if (t >= last_) break;
-      taps[k] = interpolated(t, 1);
-    }
-    for (; k < w.count; ++k) taps[k] = interpolated(last_, 0);  // at the last coefficient, or beyond it by rounding
+    std::int64_t inside = n;  // the rest lies at the last coefficient, or beyond it by rounding
+    while (inside > 0 && w.tap + static_cast<double>(k + inside - 1) * step_ >= last_) --inside;
+    taps_between(h, w.tap, step_, k, k + inside, near_);
+    std::fill(near_ + inside, near_ + n, filter_.h.back());
   }
 
   prototype<real> filter_;
@@ -255,7 +312,10 @@ class resampler {
   double step_, last_;
   bool nearest_;
   std::int64_t whole_step_;  // 0: the step is not whole
-  std::span<real> taps_;
+  std::int64_t most_taps_;
+  real near_[piece] = {}, far_[piece] = {};
+  value samples_[piece] = {};
+  phase_rows<real> rows_;
 };
 
 /// The number of outputs whose samples are all there: the smallest n >= 0 with p + n ratio + reach >= available.
@@ -365,12 +425,13 @@ void resample(typename Shape::in x, input<magnitude_of<E>> coefficients, const r
     p = position::of(state.delay_fraction) + position::of_whole(state.delay_whole);
   }
   const auto history = Shape::view(sample_history);
-  const resampler<E> engine(filter, state.interpolation, tap_history.values());
+  const auto most_taps = static_cast<std::int64_t>(tap_history.values().size());
+  resampler<E> engine(filter, state.interpolation, most_taps);
   const position ratio = position::of(state.ratio);
   const std::int64_t available = std::int64_t{state.carried} + n;
   // No sample in front of the history may be asked for.
   const window nearest = engine.around(p);
-  require(nearest.count <= static_cast<std::int64_t>(tap_history.values().size()), history_too_short);
+  require(nearest.count <= most_taps, history_too_short);
   require(history.rows == rows && nearest.first - state.carried >= -std::int64_t{std::max(history.columns, 0)},
           negative_delay);
 
@@ -379,8 +440,9 @@ void resample(typename Shape::in x, input<magnitude_of<E>> coefficients, const r
   const auto result = Shape::resize(out, rows, count);
   const auto block = Shape::view(x);
   const auto channel_of = [&](std::int32_t r) {
-    return channel<value>{block.row(r), history.row(r) + history.columns};
+    return channel<value>{block.row(r), history.row(r) + history.columns, n};
   };
+  engine.prepare(count * rows);
   for (std::int64_t k = 0; k < count; ++k, p = p + ratio) {
     const window w = engine.around(p);
     engine.compute(w, w.first - state.carried, rows, channel_of, result.data + k, count);

@@ -74,6 +74,17 @@ struct kernel_table {
   void (*weigh)(const float *x, const float *w, float *out, std::size_t n);
   /// weigh, then times (c + js).
   void (*weigh_and_rotate)(const float *x, const float *w, float c, float s, float *out, std::size_t n);
+
+  // Samples and taps of dot products can be read, not only used, up to a multiple of 8 floats.
+
+  /// Sum of h[k] * x[k], n real.
+  float (*dot)(const float *h, const float *x, std::size_t n);
+  /// (1 - fraction) * sum of h0[k] * x[k] + fraction * sum of h1[k] * x[k], n real.
+  float (*dot_between)(const float *h0, const float *h1, float fraction, const float *x, std::size_t n);
+  /// The same with complex x and sum.
+  void (*complex_dot)(const float *h, const float *x, std::size_t n, float *sum);
+  void (*complex_dot_between)(const float *h0, const float *h1, float fraction, const float *x, std::size_t n,
+                              float *sum);
 };
 
 extern const kernel_table avx_kernels;

@@ -170,3 +170,9 @@ static inline f8 multiply_in_double(f8 a, double factor) {
   const __m256d high = _mm256_mul_pd(_mm256_cvtps_pd(_mm256_extractf128_ps(a.v, 1)), factors);
   return {_mm256_insertf128_ps(_mm256_castps128_ps256(_mm256_cvtpd_ps(low)), _mm256_cvtpd_ps(high), 1)};
 }
+
+/// Sums of the even and of the odd lanes.
+static inline void sum_pairs(f8 a, float *sums) {
+  const __m128 four = _mm_add_ps(_mm256_castps256_ps128(a.v), _mm256_extractf128_ps(a.v, 1));
+  _mm_storel_pi(reinterpret_cast<__m64 *>(sums), _mm_add_ps(four, _mm_movehl_ps(four, four)));
+}

@@ -175,3 +175,9 @@ static inline f8 multiply_in_double(f8 a, double factor) {
   const __m128d factors = _mm_set1_pd(factor);
   return {multiply_four_in_double(a.low, factors), multiply_four_in_double(a.high, factors)};
 }
+
+/// Sums of the even and of the odd lanes.
+static inline void sum_pairs(f8 a, float *sums) {
+  const __m128 four = _mm_add_ps(a.low, a.high);
+  _mm_storel_pi(reinterpret_cast<__m64 *>(sums), _mm_add_ps(four, _mm_movehl_ps(four, four)));
+}
