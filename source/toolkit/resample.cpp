@@ -7,11 +7,13 @@
 
 #include <algorithm>
 #include <cmath>
+#include <complex>
 #include <cstdint>
 #include <cstring>
 #include <limits>
 #include <span>
 
+#include "qsrfhs/vector/kernels/kernels.hpp"
 #include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
 

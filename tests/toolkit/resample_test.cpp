@@ -158,6 +158,23 @@ TYPED_TEST(Resample, AgreesWithTheDefinitionHoweverTheStreamIsCut) {
   }
 }
 
+TYPED_TEST(Resample, TakesHundredsOfTaps) {
+  using E = TypeParam;
+  const auto h = kaiser(600 * 4 + 1, 4, 0.8, 6);
+  const auto record = noise<E>(900);
+  // Exact positions, so that only the sums differ from the definition.
+  for (const setting &how : {setting{0.8125F, 0, 0, 4, 0}, setting{1, 0, 1, 4, 0}, setting{2, 0.125F, 0, 4, 1}}) {
+    stream<E> whole(how, h), cut(how, h);
+    const auto all = this->in_blocks(whole, record, record.size());
+    std::vector<double> rounded;
+    for (const auto c : values<typename stream<E>::F>(whole.h)) rounded.push_back(static_cast<double>(c));
+    const auto want = definition(how, rounded, wide(record));
+    ASSERT_EQ(want.size(), all.size());
+    EXPECT_LT(error_in_epsilons<E>(all, want), 100);
+    EXPECT_TRUE(all == this->in_blocks(cut, record, 3));
+  }
+}
+
 TYPED_TEST(Resample, ChannelsAreThoseOfSingleStreams) {
   using E = TypeParam;
   constexpr std::int32_t rows = 3, columns = 40;
