@@ -30,6 +30,7 @@ constexpr std::size_t slot_offset = 4, index_offset = 8, header_offset = 16;
 template <class T>
 T word(const void *record, std::size_t offset) noexcept {
   T value;
+  // NOLINTNEXTLINE(bugprone-sizeof-expression): where T is a pointer, the pointer itself is meant
   std::memcpy(&value, static_cast<const std::byte *>(record) + offset, sizeof value);
   return value;
 }
@@ -224,6 +225,7 @@ std::int32_t batch_scheduler::run_pinned(worker work, void *records, std::uint32
     for (std::uint32_t i = 0; i < count && in_time; ++i) {
       std::byte *record = header.base + i * record_size;
       batch *const address = &header;
+      // NOLINTNEXTLINE(bugprone-sizeof-expression): the pointer itself
       std::memcpy(record + header_offset, &address, sizeof address);
       const auto target = word<std::uint32_t>(record, slot_offset);
       if (target >= static_cast<std::uint32_t>(cpu_count_)) continue;  // nobody will run it

@@ -42,8 +42,8 @@ static_assert(sizeof(lookup_record) == 80 && offsetof(lookup_record, header) == 
 /// The records of one call. They outlive a call whose batch timed out: it takes its last user to free them.
 struct lookup_batch {
   std::atomic<std::uint32_t> users{0};
-  const float *entries = nullptr;
   int entry_count = 0;
+  const float *entries = nullptr;
   lookup_record records[max_tasks]{};
 };
 

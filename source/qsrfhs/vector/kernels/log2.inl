@@ -85,7 +85,7 @@ struct log2_of_power_step {
     log2_lanes v;
     for (std::size_t j = 0; j < log2_groups; ++j) v.group[j] = power_8(x + 16 * j);
     log2_lanes l = log2_of(v);
-    for (std::size_t j = 0; j < log2_groups; ++j) l.group[j] = a * l.group[j] + b;
+    for (f8 &group : l.group) group = a * group + b;
     store_results<Put>(l, out);
   }
 };
