@@ -128,7 +128,7 @@ void solve_with_pseudo_inverse(const equation<E> &eq, value_of<E> *a, scratch<E>
   using value = value_of<E>;
   const std::int32_t m = eq.a.rows, n = eq.a.columns, k = std::min(m, n), larger = std::max(m, n);
   const std::int64_t k2 = std::int64_t{k} * k;
-  const std::int64_t reals = is_complex<E> ? std::max(5 * k2 + 5 * k, 2 * std::int64_t{larger} * k + 2 * k2 + k) : 0;
+  const std::int64_t reals = is_complex<E> ? std::max(5 * (k2 + k), 2 * std::int64_t{larger} * k + 2 * k2 + k) : 0;
   const lapack_workspace<value> workspace(k, reals, 8 * std::int64_t{k}, [&](const lapack_room<value> &in) {
     return decompose(m, n, a, nullptr, nullptr, in);
   });
