@@ -61,9 +61,10 @@ typedef struct lumra_resampler_parameters {
  * out               resized to the outputs that this block gives; one row a channel
  * firstOutputTime   receives the position of the first of them in input samples since the reset; null is allowed
  * sampleHistory     state: the newest samples; one row a channel
- * tapHistory        state: room for the taps of one output; sized and checked, its contents are not used. On reset both
- * histories are resized to 2 floor((L - 1) max(ratio, 1) / (2 phases)) + 2 elements (a row) state
- * LUMRA_RESAMPLER_STATE_SIZE bytes
+ * tapHistory        state: room for the taps of one output; its contents are not used
+ *                   On reset both histories are resized to
+ *                   2 floor((L - 1) max(ratio, 1) / (2 phases)) + 2 elements (a row)
+ * state             LUMRA_RESAMPLER_STATE_SIZE bytes
  *
  * Without a reset the arguments but `in` and `out` must be those of the call before. The histories must not be another
  * array of the call. On failure out and both histories are emptied, *firstOutputTime is 0 and the state all zeros, so
