@@ -1,5 +1,5 @@
-// Filters, decimation, statistics and matrices of the typed toolkit beside bare loops and bare MKL, on one thread.
-// Ratios within one run count; figures of different runs do not compare. SPDX-License-Identifier: MIT
+// Recursive filters, decimation, statistics and matrices of the typed toolkit beside bare loops and bare MKL, on one
+// thread. Ratios within one run count; figures of different runs do not compare. SPDX-License-Identifier: MIT
 #include <benchmark/benchmark.h>
 #include <mkl_cblas.h>
 #include <mkl_lapack.h>
@@ -136,28 +136,6 @@ void iir_loop(benchmark::State &state, std::size_t n, bool tail, std::initialize
 // Rings down by seven decades in 16384 samples.
 constexpr std::initializer_list<double> slow = {1, -0.999, 0, 0, 0};
 
-// ---- resampling by 1.37 with 32 taps of 64 phases
-
-template <class T, class R, auto run>
-void resample(benchmark::State &state, std::int32_t interpolation, std::int32_t stretched) {
-  constexpr std::size_t n = 16384, length = 32 * 64;
-  const auto x = signal<T>(n);
-  lumra::host_array<R> h(length), taps(0);
-  for (std::size_t i = 0; i < length; ++i)
-    h.elements()[i] = static_cast<R>((1 - std::cos(2 * std::numbers::pi * static_cast<double>(i) / length)) / length);
-  lumra::host_array<T> out(0), history(0);
-  const lumra_resampler_parameters parameters{1.37F, 0, interpolation};
-  std::array<unsigned char, LUMRA_RESAMPLER_STATE_SIZE> kept{};
-  bool reset = true;
-  float time = 0;
-  for (auto _ : state) {
-    lumra::check(run(x.get(), h.get(), 64, &parameters, reset, stretched, out.get(), &time, history.get(), taps.get(),
-                     kept.data()));
-    reset = false;
-  }
-  rate(state, n);
-}
-
 // ---- matrices
 
 template <class Block>
@@ -241,17 +219,6 @@ IIR(dd, double, double);
 IIR(cs, cf32, float);
 IIR(zd, cf64, double);
 #undef IIR
-
-constexpr auto resample_s = &resample<float, float, &qsRFPELTA_sResampleC2CH>;
-constexpr auto resample_d = &resample<double, double, &qsRFPELTA_dResampleC2CH>;
-constexpr auto resample_c = &resample<cf32, float, &qsRFPELTA_cResampleC2CH>;
-constexpr auto resample_z = &resample<cf64, double, &qsRFPELTA_zResampleC2CH>;
-BENCHMARK_CAPTURE(resample_c, linear, 0, 0);
-BENCHMARK_CAPTURE(resample_c, nearest, 1, 0);
-BENCHMARK_CAPTURE(resample_c, stretched, 0, 1);
-BENCHMARK_CAPTURE(resample_s, linear, 0, 0);
-BENCHMARK_CAPTURE(resample_d, linear, 0, 0);
-BENCHMARK_CAPTURE(resample_z, linear, 0, 0);
 
 BENCHMARK_CAPTURE(product, mkl, true);
 BENCHMARK_CAPTURE(product, lumra, false);

@@ -4,10 +4,10 @@
 #include "element_wise.inl"
 //
 #include "complex.inl"
-#include "dot.inl"
 #include "log2.inl"
 #include "lookup.inl"
 #include "polynomial.inl"
+#include "polyphase.inl"
 #include "resampler.inl"
 #include "rms.inl"
 #include "spectrum.inl"
@@ -38,8 +38,8 @@ static constexpr kernel_table table = {
     .lookup = &lookup,
     .weigh = &weigh,
     .weigh_and_rotate = &weigh_and_rotate,
-    .dot = &dot,
-    .dot_between = &dot_between,
-    .complex_dot = &complex_dot,
-    .complex_dot_between = &complex_dot_between,
+    .polyphase = &polyphase,
+    .complex_polyphase = &complex_polyphase,
+    .stretched = &stretched,
+    .complex_stretched = &complex_stretched,
 };

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 
 namespace qsrfhs::kernels {
 
@@ -14,6 +15,32 @@ struct lookup_table {
   int count;  // of entries, at least 1
   float start, step;
 };
+
+/// Where an output takes its samples, and where its first tap lies.
+template <class Real>
+struct tap_place {
+  std::int32_t first, count;  // samples
+  std::int32_t row;           // of taps, or the coefficient in front of the tap
+  Real fraction;              // of the way to the next
+};
+
+/// Groups of eight taps: their values in a group of eight, then their slopes, for each row `length` / 8 times. At
+/// `fraction` a tap is value + fraction * slope.
+template <class Real>
+struct tap_rows {
+  const Real *taps;
+  std::int32_t length;  // of a row, a multiple of 8
+};
+
+/// Taps that lie at place + offset in a prototype of 2 to 2^24 coefficients, interpolated linearly.
+struct tap_offsets {
+  const float *prototype;
+  float last_pair;       // index of the last coefficient but one
+  const float *offsets;  // groups of eight: whole parts, then fractions, each at most 1
+};
+
+/// Where tap k of eight stands for complex samples, so that taps can be doubled within the halves of a register.
+constexpr int complex_tap_order[8] = {0, 1, 4, 5, 2, 3, 6, 7};
 
 struct kernel_table {
   /// out[k] = x[k], n complex.
@@ -75,16 +102,21 @@ struct kernel_table {
   /// weigh, then times (c + js).
   void (*weigh_and_rotate)(const float *x, const float *w, float c, float s, float *out, std::size_t n);
 
-  // Samples and taps of dot products can be read, not only used, up to a multiple of 8 floats.
+  // Outputs of a filter with taps between the coefficients of a prototype: out[k] = sum over j < count of tap j times
+  // x[first + j]. Samples can be read, not only used, up to a multiple of 8 taps.
 
-  /// Sum of h[k] * x[k], n real.
-  float (*dot)(const float *h, const float *x, std::size_t n);
-  /// (1 - fraction) * sum of h0[k] * x[k] + fraction * sum of h1[k] * x[k], n real.
-  float (*dot_between)(const float *h0, const float *h1, float fraction, const float *x, std::size_t n);
-  /// The same with complex x and sum.
-  void (*complex_dot)(const float *h, const float *x, std::size_t n, float *sum);
-  void (*complex_dot_between)(const float *h0, const float *h1, float fraction, const float *x, std::size_t n,
-                              float *sum);
+  /// Taps in rows.
+  void (*polyphase)(const tap_place<float> *places, std::size_t outputs, const tap_rows<float> &rows, const float *x,
+                    float *out);
+  /// The same with complex x and out, taps in complex_tap_order.
+  void (*complex_polyphase)(const tap_place<float> *places, std::size_t outputs, const tap_rows<float> &rows,
+                            const float *x, float *out);
+  /// Taps at offsets, not more than those have room for.
+  void (*stretched)(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps, const float *x,
+                    float *out);
+  /// The same with complex x and out, offsets in complex_tap_order.
+  void (*complex_stretched)(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps,
+                            const float *x, float *out);
 };
 
 extern const kernel_table avx_kernels;

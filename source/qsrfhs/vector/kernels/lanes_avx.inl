@@ -54,6 +54,10 @@ static inline f8 square_root(f8 a) {
 static inline f8 greater_of(f8 a, f8 b) {
   return {_mm256_max_ps(a.v, b.v)};
 }
+/// a < b ? a : b.
+static inline f8 smaller_of(f8 a, f8 b) {
+  return {_mm256_min_ps(a.v, b.v)};
+}
 
 // Comparisons give lanes of all ones or all zeros; a NaN compares false.
 static inline f8 operator>=(f8 a, f8 b) {
@@ -107,6 +111,14 @@ static inline f8 load_twice(const float *p) {
   return {_mm256_permutevar_ps(both, _mm256_setr_epi32(0, 0, 1, 1, 2, 2, 3, 3))};
 }
 
+/// Lanes 0 1 4 5, each twice, and lanes 2 3 6 7.
+static inline f8 twice_low(f8 a) {
+  return {_mm256_unpacklo_ps(a.v, a.v)};
+}
+static inline f8 twice_high(f8 a) {
+  return {_mm256_unpackhi_ps(a.v, a.v)};
+}
+
 /// Takes split_in_lanes back.
 static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
   a = {_mm256_unpacklo_ps(re.v, im.v)};
@@ -142,6 +154,18 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   columns[1] = {_mm256_castpd_ps(_mm256_unpackhi_pd(a, b))};
   columns[2] = {_mm256_castpd_ps(_mm256_unpacklo_pd(c, d))};
   columns[3] = {_mm256_castpd_ps(_mm256_unpackhi_pd(c, d))};
+}
+
+/// p[index] and p[index + 1], by eight indices.
+static inline void load_pairs(const float *p, const int *index, f8 &first, f8 &second) {
+  const auto two = [=](int i, int j) {
+    const __m128 low = _mm_loadl_pi(_mm_setzero_ps(), reinterpret_cast<const __m64 *>(p + index[i]));
+    return _mm_loadh_pi(low, reinterpret_cast<const __m64 *>(p + index[j]));
+  };
+  const __m256 low = _mm256_insertf128_ps(_mm256_castps128_ps256(two(0, 1)), two(4, 5), 1);
+  const __m256 high = _mm256_insertf128_ps(_mm256_castps128_ps256(two(2, 3)), two(6, 7), 1);
+  first = {_mm256_shuffle_ps(low, high, 0x88)};
+  second = {_mm256_shuffle_ps(low, high, 0xdd)};
 }
 
 /// The eight floats in reverse order.

@@ -58,6 +58,10 @@ static inline f8 square_root(f8 a) {
 static inline f8 greater_of(f8 a, f8 b) {
   return {_mm_max_ps(a.low, b.low), _mm_max_ps(a.high, b.high)};
 }
+/// a < b ? a : b.
+static inline f8 smaller_of(f8 a, f8 b) {
+  return {_mm_min_ps(a.low, b.low), _mm_min_ps(a.high, b.high)};
+}
 
 // Comparisons give lanes of all ones or all zeros; a NaN compares false.
 static inline f8 operator>=(f8 a, f8 b) {
@@ -107,6 +111,14 @@ static inline f8 load_twice(const float *p) {
   return {_mm_unpacklo_ps(a, a), _mm_unpackhi_ps(a, a)};
 }
 
+/// Lanes 0 1 4 5, each twice, and lanes 2 3 6 7.
+static inline f8 twice_low(f8 a) {
+  return {_mm_unpacklo_ps(a.low, a.low), _mm_unpacklo_ps(a.high, a.high)};
+}
+static inline f8 twice_high(f8 a) {
+  return {_mm_unpackhi_ps(a.low, a.low), _mm_unpackhi_ps(a.high, a.high)};
+}
+
 /// Takes split_in_lanes back.
 static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
   a = {_mm_unpacklo_ps(re.low, im.low), _mm_unpackhi_ps(re.low, im.low)};
@@ -141,6 +153,17 @@ static inline void load_columns(const float *rows, const int *index, f8 *columns
   load_four_columns(rows, index, low);
   load_four_columns(rows, index + 4, high);
   for (int i = 0; i < 4; ++i) columns[i] = {low[i], high[i]};
+}
+
+/// p[index] and p[index + 1], by eight indices.
+static inline void load_pairs(const float *p, const int *index, f8 &first, f8 &second) {
+  const auto two = [=](int i) {
+    const __m128 low = _mm_loadl_pi(_mm_setzero_ps(), reinterpret_cast<const __m64 *>(p + index[i]));
+    return _mm_loadh_pi(low, reinterpret_cast<const __m64 *>(p + index[i + 1]));
+  };
+  const __m128 a = two(0), b = two(2), c = two(4), d = two(6);
+  first = {_mm_shuffle_ps(a, b, 0x88), _mm_shuffle_ps(c, d, 0x88)};
+  second = {_mm_shuffle_ps(a, b, 0xdd), _mm_shuffle_ps(c, d, 0xdd)};
 }
 
 /// The eight floats in reverse order.

@@ -1,4 +1,4 @@
-// Positions of a resampler: exact, in units of 2^-64 of an input sample. SPDX-License-Identifier: MIT
+// Positions in a stream: exact, in units of 2^-64 of an input sample. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cmath>

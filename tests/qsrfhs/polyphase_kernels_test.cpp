@@ -1,0 +1,106 @@
+// Filters between the coefficients of a prototype: both builds give the same bits, and the sums of the definition.
+// SPDX-License-Identifier: MIT
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+#include <vector>
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
+
+namespace {
+
+using namespace qsrfhs::kernels;
+
+/// n values and, up to `size`, others that must not count.
+std::vector<float> values(std::size_t n, std::size_t size, unsigned seed) {
+  std::vector<float> out(size, std::numeric_limits<float>::quiet_NaN());
+  for (std::size_t k = 0; k < n; ++k) {
+    seed = seed * 1664525U + 1013904223U;
+    out[k] = static_cast<float>(seed >> 8) / 8388608.F - 1.F;
+  }
+  return out;
+}
+
+/// Real outputs, then complex ones, of one kernel of either kind in both builds.
+template <class Taps, class Kernel>
+void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
+                 Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places, std::size_t samples,
+                 const std::vector<std::vector<double>> &taps) {
+  const auto x = values(2 * samples, 2 * samples + 16, 7);
+  std::vector<float> got[2] = {std::vector<float>(3 * places.size()), std::vector<float>(3 * places.size())};
+  const kernel_table *tables[] = {&baseline_kernels, &active()};
+  for (int i : {0, 1}) {
+    (tables[i]->*real)(places.data(), places.size(), real_taps, x.data(), got[i].data());
+    (tables[i]->*complex)(places.data(), places.size(), complex_taps, x.data(), got[i].data() + places.size());
+  }
+  EXPECT_EQ(got[0], got[1]);
+  for (std::size_t k = 0; k < places.size(); ++k) {
+    double sums[3] = {};
+    for (std::size_t j = 0; j < static_cast<std::size_t>(places[k].count); ++j) {
+      const std::size_t i = static_cast<std::size_t>(places[k].first) + j;
+      sums[0] += taps[k][j] * static_cast<double>(x[i]);
+      sums[1] += taps[k][j] * static_cast<double>(x[2 * i]);
+      sums[2] += taps[k][j] * static_cast<double>(x[2 * i + 1]);
+    }
+    EXPECT_NEAR(sums[0], static_cast<double>(got[0][k]), 4e-6) << places[k].count;
+    EXPECT_NEAR(sums[1], static_cast<double>(got[0][places.size() + 2 * k]), 4e-6) << places[k].count;
+    EXPECT_NEAR(sums[2], static_cast<double>(got[0][places.size() + 2 * k + 1]), 4e-6) << places[k].count;
+  }
+}
+
+std::size_t slot(std::size_t k, bool complex) {
+  return k / 8 * 16 + (complex ? static_cast<std::size_t>(complex_tap_order[k % 8]) : k % 8);
+}
+
+TEST(PolyphaseKernels, TapsInRows) {
+  constexpr std::size_t rows = 3, length = 40;
+  const auto in_order = values(2 * rows * length, 2 * rows * length, 1);
+  auto for_complex = in_order;
+  for (std::size_t i = 0; i < in_order.size(); i += 8)
+    for (std::size_t k = 0; k < 8; ++k) for_complex[i + slot(k, true)] = in_order[i + k];
+  std::vector<tap_place<float>> places;
+  std::vector<std::vector<double>> taps;
+  for (std::int32_t n = 0; n <= static_cast<std::int32_t>(length); ++n) {
+    const auto row = n % 3;
+    places.push_back({n % 5, n, row, 0.3F});
+    auto &of_place = taps.emplace_back();
+    for (std::size_t k = 0; k < length; ++k) {
+      const std::size_t i = 2 * length * static_cast<std::size_t>(row) + slot(k, false);
+      of_place.push_back(static_cast<double>(in_order[i]) + 0.3 * static_cast<double>(in_order[i + 8]));
+    }
+  }
+  expect_sums(tap_rows<float>{in_order.data(), length}, tap_rows<float>{for_complex.data(), length},
+              &kernel_table::polyphase, &kernel_table::complex_polyphase, places, 50, taps);
+}
+
+TEST(PolyphaseKernels, TapsAtOffsets) {
+  constexpr std::size_t length = 40, size = 200;
+  constexpr double step = 4.9;
+  const auto h = values(size, size, 1);
+  std::vector<float> in_order(2 * length), for_complex(2 * length);
+  for (std::size_t k = 0; k < length; ++k) {
+    const double offset = step * static_cast<double>(k);
+    for (const bool complex : {false, true}) {
+      auto &to = complex ? for_complex : in_order;
+      to[slot(k, complex)] = static_cast<float>(std::floor(offset));
+      to[slot(k, complex) + 8] = static_cast<float>(offset - std::floor(offset));
+    }
+  }
+  std::vector<tap_place<float>> places;
+  std::vector<std::vector<double>> taps;
+  for (std::int32_t n = 0; n <= static_cast<std::int32_t>(length); ++n) {
+    places.push_back({n % 5, n, 3, 0.875F});
+    auto &of_place = taps.emplace_back();
+    for (std::size_t k = 0; k < length; ++k) {
+      const double t = 3.875 + step * static_cast<double>(k);
+      const auto i = static_cast<std::size_t>(t);
+      of_place.push_back(static_cast<double>(h[i]) +
+                         (t - static_cast<double>(i)) * (static_cast<double>(h[i + 1]) - static_cast<double>(h[i])));
+    }
+  }
+  expect_sums(tap_offsets{h.data(), size - 2, in_order.data()}, tap_offsets{h.data(), size - 2, for_complex.data()},
+              &kernel_table::stretched, &kernel_table::complex_stretched, places, 50, taps);
+}
+
+}  // namespace
