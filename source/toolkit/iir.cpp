@@ -2,18 +2,15 @@
 #include <lumra/toolkit.h>
 
 #include <algorithm>
-#include <array>
-#include <bit>
-#include <cmath>
 #include <cstdint>
 #include <cstring>
-#include <limits>
 #include <span>
 #include <type_traits>
 #include <utility>
 
 #include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
+#include "toolkit/recursion.hpp"
 
 namespace toolkit {
 namespace {
@@ -58,181 +55,6 @@ void convolve_in_place(Real *x, std::int64_t n, std::span<const Real> b, const R
     x[i] = sum;
   }
 }
-
-/// Outputs below the normal range, which multiplications would take a hundred times longer for, as whole multiples of
-/// the smallest number; double precision holds them and their products without coming near its own limits.
-template <class Real>
-struct subnormal {
-  using bits = std::conditional_t<sizeof(Real) == 4, std::uint32_t, std::uint64_t>;
-  using integer = std::make_signed_t<bits>;
-
-  static constexpr bits sign = bits{1} << (8 * sizeof(bits) - 1);
-  static constexpr int exponent = sizeof(Real) == 4 ? -149 : -1074;
-  /// Numbers below this many steps are treated so. They leave room in the sum with `rounder`.
-  static constexpr bits limit = bits{1} << (sizeof(Real) == 4 ? 23 : 51);
-  /// Adding this to a smaller number rounds it to a whole one.
-  static constexpr double rounder = 6755399441055744.0;  // 1.5 * 2^52
-
-  static bool is(Real v) noexcept { return (std::bit_cast<bits>(v) & ~sign) < limit; }
-  static double steps(Real v) noexcept {
-    const auto raw = std::bit_cast<bits>(v);
-    const auto mask = -static_cast<integer>(raw >> (8 * sizeof(bits) - 1));  // all ones below 0
-    return static_cast<double>((static_cast<integer>(raw & ~sign) ^ mask) - mask);
-  }
-  static Real value(double steps) noexcept {
-    const auto whole = static_cast<integer>(steps);
-    const auto mask = whole >> (8 * sizeof(bits) - 1);
-    return std::bit_cast<Real>(static_cast<bits>((whole ^ mask) - mask) | (static_cast<bits>(mask) & sign));
-  }
-};
-
-/// The recursion of one order: y = g (w - sum over j = 1 .. order of a[j] y[-j]), y[-1] last because it comes last.
-template <int parts, int order, class Real>
-class recursion {
- public:
-  using small = subnormal<Real>;
-
-  recursion(const Real *reverse, Real gain) noexcept : gain_(gain) {
-    std::copy_n(reverse + 1, order, a_.begin());
-    for (int j = 0; j < order; ++j) scaled_[at(j)] = static_cast<double>(gain) * static_cast<double>(a_[at(j)]);
-  }
-
-  /// Newest outputs first.
-  void load(const Real *state) noexcept {
-    for (int part = 0; part < parts; ++part) {
-      for (int j = 0; j < order; ++j) y_[at(part)][at(j)] = state[j * parts + part];
-      quiet_[at(part)] = 0;
-      while (quiet_[at(part)] < order && small::is(y_[at(part)][at(quiet_[at(part)])])) ++quiet_[at(part)];
-      if (quiet_[at(part)] == order) enter(at(part));
-    }
-  }
-
-  void run(Real *data, std::int64_t n) noexcept {
-    Real *const end = data + n * parts;
-    while (data < end)
-      data = any_quiet() ? run_quiet(data, end) : gain_ == 1 ? run_loud<true>(data, end) : run_loud<false>(data, end);
-  }
-
- private:
-  static constexpr std::size_t at(int j) noexcept { return static_cast<std::size_t>(j); }
-
-  template <bool unit_gain>
-  [[nodiscard]] Real next(Real w, const std::array<Real, order> &y) const noexcept {
-    for (int j = order - 1; j >= 0; --j) w -= a_[at(j)] * y[at(j)];
-    return unit_gain ? w : gain_ * w;
-  }
-  template <class T>
-  static void shift(std::array<T, order> &y, T newest) noexcept {
-    for (int j = order - 1; j > 0; --j) y[at(j)] = y[at(j - 1)];
-    y[0] = newest;
-  }
-
-  [[nodiscard]] bool any_quiet() const noexcept {
-    return std::any_of(quiet_.begin(), quiet_.end(), [](int quiet) { return quiet == order; });
-  }
-
-  /// Until `order` outputs in succession were subnormal, in one part.
-  template <bool unit_gain>
-  Real *run_loud(Real *data, Real *end) noexcept {
-    auto y = y_;  // in registers
-    auto quiet = quiet_;
-    bool loud = true;
-    while (data < end && loud) {
-      for (std::size_t part = 0; part < parts; ++part) {
-        const Real newest = next<unit_gain>(*data, y[part]);
-        shift(y[part], newest);
-        *data++ = newest;
-        quiet[part] = small::is(newest) ? quiet[part] + 1 : 0;
-        loud = loud && quiet[part] < order;
-      }
-    }
-    y_ = y;
-    quiet_ = quiet;
-    for (std::size_t part = 0; part < parts; ++part)
-      if (quiet_[part] == order) enter(part);
-    return data;
-  }
-
-  /// Until no part has had `order` subnormal outputs in succession.
-  Real *run_quiet(Real *data, Real *end) noexcept {
-    while (data < end && any_quiet()) {
-      if (std::all_of(quiet_.begin(), quiet_.end(), [](int quiet) { return quiet == order; })) {
-        data = run_all_quiet(data, end);
-        if (data == end) break;
-      }
-      for (std::size_t part = 0; part < parts; ++part, ++data) {
-        if (quiet_[part] == order && small::is(*data)) {
-          *data = next_quiet(*data, part);
-          continue;
-        }
-        const Real newest = gain_ == 1 ? next<true>(*data, y_[part]) : next<false>(*data, y_[part]);
-        shift(y_[part], newest);
-        *data = newest;
-        quiet_[part] = small::is(newest) ? std::min(quiet_[part] + 1, order) : 0;
-        if (quiet_[part] == order) enter(part);
-      }
-    }
-    return data;
-  }
-
-  /// Up to the first sample that makes one of the parts louder, which is left to do.
-  Real *run_all_quiet(Real *data, Real *end) noexcept {
-    auto v = steps_;  // in registers
-    for (; data < end; data += parts) {
-      std::array<double, parts> newest;
-      bool quiet = true;
-      for (std::size_t part = 0; part < parts; ++part) {
-        newest[part] = whole_steps(rest(data[part], v[part]), v[part]);
-        quiet = quiet && small::is(data[part]) && std::abs(newest[part]) < static_cast<double>(small::limit);
-      }
-      if (!quiet) break;
-      for (std::size_t part = 0; part < parts; ++part) {
-        shift(v[part], newest[part]);
-        data[part] = small::value(newest[part]);
-      }
-    }
-    steps_ = v;
-    for (std::size_t part = 0; part < parts; ++part)
-      for (int j = 0; j < order; ++j) y_[part][at(j)] = small::value(v[part][at(j)]);
-    return data;
-  }
-
-  void enter(std::size_t part) noexcept {
-    for (int j = 0; j < order; ++j) steps_[part][at(j)] = small::steps(y_[part][at(j)]);
-  }
-
-  /// All of the sum but the newest output's part.
-  [[nodiscard]] double rest(Real w, const std::array<double, order> &v) const noexcept {
-    double sum = static_cast<double>(gain_) * small::steps(w);
-    for (int j = order - 1; j > 0; --j) sum -= scaled_[at(j)] * v[at(j)];
-    return sum;
-  }
-  [[nodiscard]] double whole_steps(double rest, const std::array<double, order> &v) const noexcept {
-    return ((rest + small::rounder) - scaled_[0] * v[0]) - small::rounder;
-  }
-
-  Real next_quiet(Real w, std::size_t part) noexcept {
-    auto &v = steps_[part];
-    const double sum = rest(w, v), whole = whole_steps(sum, v);
-    Real newest;
-    if (std::abs(whole) < static_cast<double>(small::limit)) {
-      shift(v, whole);
-      newest = small::value(whole);
-    } else {  // louder again, or not a number
-      newest = static_cast<Real>(std::ldexp(sum - scaled_[0] * v[0], small::exponent));
-      quiet_[part] = 0;
-    }
-    shift(y_[part], newest);
-    return newest;
-  }
-
-  std::array<Real, order> a_;
-  std::array<double, order> scaled_;
-  Real gain_;
-  std::array<std::array<Real, order>, parts> y_{};
-  std::array<std::array<double, order>, parts> steps_{};
-  std::array<int, parts> quiet_{};
-};
 
 /// Highest order with a recursion of its own; all others share recurse_any.
 constexpr int unrolled_orders = 12;
