@@ -7,6 +7,7 @@
 namespace toolkit {
 
 __extension__ typedef __int128 wide_integer;
+__extension__ typedef unsigned __int128 wide_unsigned;
 
 /// A position or a distance in the stream.
 struct position {

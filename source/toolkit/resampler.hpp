@@ -55,7 +55,7 @@ struct filter_window {
 constexpr std::int64_t tap_group = 8;
 
 constexpr std::int64_t in_groups(std::int64_t taps) noexcept {
-  return (taps + tap_group - 1) / tap_group * tap_group;
+  return (taps + tap_group - 1) & -tap_group;
 }
 
 template <class Real, class T>
@@ -107,29 +107,13 @@ class resampler {
         step_(filter.step),
         whole_step_(std::floor(step_) == step_ ? static_cast<std::int64_t>(step_) : 0),
         nearest_(nearest),
-        reach_(whole_step_ > 0 ? position{position::of_whole(last_).units / (2 * whole_step_)}
+        reach_(whole_step_ > 0 ? position{position::of_whole(last_).units / whole_step_ / 2}
                                : position::of(filter.reach())) {}
 
   [[nodiscard]] position reach() const noexcept { return reach_; }
 
   /// The samples of an output at p, which are counted from where p is.
-  [[nodiscard]] filter_window around(position p) const noexcept {
-    const position begin = p - reach_;
-    const position behind{static_cast<wide_integer>(-begin.fraction_units())};  // up to the first sample
-    filter_window w{};
-    w.first = (begin + behind).whole();
-    w.count = (p + reach_).whole() - w.first + 1;
-    if (whole_step_ > 0) {
-      const position tap = behind * whole_step_;
-      w.coefficient = tap.whole();
-      w.fraction = tap.fraction();
-    } else {
-      const double tap = behind.fraction() * step_;
-      w.coefficient = static_cast<std::int64_t>(tap);
-      w.fraction = tap - static_cast<double>(w.coefficient);
-    }
-    return w;
-  }
+  [[nodiscard]] filter_window around(position p) const noexcept { return between(p - reach_, p + reach_); }
 
   /// Outputs at p, p + ratio, ... of every channel, whose sample 0 lies at `origin`. Leaves p where the next one is.
   template <class Channels>
@@ -182,18 +166,39 @@ class resampler {
     return method::offsets;
   }
 
+  [[nodiscard]] filter_window between(position begin, position end) const noexcept {
+    const std::uint64_t behind = -begin.fraction_units();  // from `begin` to the first sample
+    filter_window w{};
+    w.first = begin.whole() + (behind != 0);
+    w.count = end.whole() - w.first + 1;
+    if (whole_step_ > 0) {
+      const position tap{
+          static_cast<wide_integer>(static_cast<wide_unsigned>(behind) * static_cast<std::uint64_t>(whole_step_))};
+      w.coefficient = tap.whole();
+      w.fraction = tap.fraction();
+    } else {
+      const double tap = position{static_cast<wide_integer>(behind)}.fraction() * step_;
+      w.coefficient = static_cast<std::int64_t>(tap);
+      w.fraction = tap - static_cast<double>(w.coefficient);
+    }
+    return w;
+  }
+
   /// Places of up to `most` outputs; gives the samples that they span.
   std::int64_t plan(position &p, position ratio, std::int64_t most, std::int64_t most_taps, std::int64_t &made) {
-    const std::int64_t first = around(p).first;
-    std::int64_t span = 0;
-    for (; made < most; ++made, p = p + ratio) {
-      const filter_window w = around(p);
+    position begin = p - reach_, end = p + reach_;
+    const std::int64_t first = between(begin, end).first;
+    std::int64_t span = 0, k = 0;
+    for (; k < most; ++k, begin = begin + ratio, end = end + ratio) {
+      const filter_window w = between(begin, end);
       require(w.count <= most_taps, history_too_short);
-      const std::int64_t end = w.first - first + in_groups(w.count);
-      if (made > 0 && end > most_samples) break;
-      span = std::max(span, end);
-      places_[made] = place(w, w.first - first, w.count);
+      const std::int64_t past = w.first - first + in_groups(w.count);
+      if (k > 0 && past > most_samples) break;
+      span = std::max(span, past);
+      places_[k] = place(w, w.first - first, w.count);
     }
+    p = begin + reach_;
+    made = k;
     return span;
   }
 
