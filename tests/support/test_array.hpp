@@ -11,6 +11,7 @@
 
 #include "host/host_array.hpp"
 #include "host/resize_service.hpp"
+#include "support/fault_counter.hpp"
 
 namespace tests {
 
@@ -37,19 +38,26 @@ class test_array {
   explicit test_array(std::span<const element> values) : test_array(values.size()) {
     if (!values.empty()) std::memcpy(block_->elements, values.data(), values.size_bytes());
   }
-  test_array(std::int32_t rows, std::int32_t columns)
+  test_array(std::int32_t rows, std::int32_t columns, std::span<const element> values = {})
       : block_(make(static_cast<std::size_t>(rows) * static_cast<std::size_t>(columns))) {
     const std::int32_t words[] = {rows, columns};
     std::memcpy(block_, words, sizeof words);
+    if (!values.empty()) std::memcpy(block_->elements, values.data(), values.size_bytes());
   }
   test_array(const test_array &) = delete;
   test_array &operator=(const test_array &) = delete;
   ~test_array() { std::free(block_); }
 
   [[nodiscard]] Block **handle() noexcept { return &block_; }
+  operator Block **() noexcept { return &block_; }  // as exports take it
   [[nodiscard]] Block ***address() noexcept { return &handle_; }
   [[nodiscard]] Block *block() noexcept { return block_; }
-  [[nodiscard]] std::span<element> elements() noexcept { return host::elements(handle()); }
+  [[nodiscard]] std::span<element> elements() noexcept {
+    if constexpr (requires { block_->rows; })
+      return {block_->elements, static_cast<std::size_t>(block_->rows) * static_cast<std::size_t>(block_->columns)};
+    else
+      return host::elements(handle());
+  }
   [[nodiscard]] std::vector<element> copy() { return {elements().begin(), elements().end()}; }
 
  private:
@@ -90,7 +98,8 @@ class fake_host {
   }
 
   std::vector<call> calls;
-  int refuse_from = -1;  // index of the first call that is refused, -1 for none
+  fault_counter resizes;  // refuses one of them
+  int refuse_from = -1;   // index of the first call that is refused, -1 for none
   int refuse_until = 1 << 30;
 
  private:
@@ -103,6 +112,7 @@ class fake_host {
     fake_host &self = *current();
     const int index = static_cast<int>(self.calls.size());
     self.calls.push_back({type, dimensions, size});
+    if (self.resizes.fails()) return 1;
     if (self.refuse_from >= 0 && index >= self.refuse_from && index < self.refuse_until) return 1;
     auto **&handle = *static_cast<void ***>(address);
     if (!handle) {  // arrays made here are freed with the host

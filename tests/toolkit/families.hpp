@@ -30,6 +30,29 @@ FAMILY(c)
 FAMILY(z)
 #undef FAMILY
 
+/// The members that are there for real data, for single precision, or under names of two letters.
+template <class E>
+struct partial_family;
+
+#define REAL_FAMILY(E) static constexpr auto linear_fit = &qsRFPELTA_##E##LinearFitH;
+#define SINGLE_FAMILY(E)                                               \
+  static constexpr auto multiply = &qsRFPELTA_##E##MtrxMulH;           \
+  static constexpr auto multiply_vector = &qsRFPELTA_##E##MtrxVecMulH; \
+  static constexpr auto least_squares = &qsRFPELTA_##E##LSEqH;
+#define PARTIAL_FAMILY(E, NAME, ...)                                    \
+  template <>                                                           \
+  struct partial_family<toolkit::E> {                                   \
+    static constexpr auto filter = &qsRFPELTA_##NAME##IIRDirectFilterH; \
+    __VA_ARGS__                                                         \
+  };
+PARTIAL_FAMILY(s, ss, REAL_FAMILY(s) SINGLE_FAMILY(s))
+PARTIAL_FAMILY(d, dd, REAL_FAMILY(d))
+PARTIAL_FAMILY(c, cs, SINGLE_FAMILY(c))
+PARTIAL_FAMILY(z, zd)
+#undef PARTIAL_FAMILY
+#undef SINGLE_FAMILY
+#undef REAL_FAMILY
+
 /// The two records of a correlation, and its export.
 template <class First, class Second>
 struct correlation_pair;

@@ -1,7 +1,8 @@
-// Every operation of the transform, convolution, window and power-spectrum families with arguments that make it do all
-// it can, so that tests can walk over them. SPDX-License-Identifier: MIT
+// Every operation of the toolkit that sizes arrays, with arguments that make it do all it can, so that tests can walk
+// over them. SPDX-License-Identifier: MIT
 #pragma once
 
+#include <array>
 #include <cstring>
 
 #include "toolkit/families.hpp"
@@ -9,122 +10,177 @@
 
 namespace tests {
 
-/// Arguments for one call; outputs hold stale elements.
+/// Arguments for one call; outputs and states hold stale values.
 template <class E>
 struct arguments {
-  array_of<E> x = filled<E>(noise<E>(40, 1)), y = filled<E>(noise<E>(27, 2));
-  array_of<toolkit::complex_of<E>> bins = filled<toolkit::complex_of<E>>(noise<toolkit::complex_of<E>>(40, 3));
-  matrix_of<E> mx = matrix_of<E>(4, 6), my = matrix_of<E>(3, 5);
+  using C = toolkit::complex_of<E>;
+  using R = toolkit::magnitude_of<E>;
+  using real = toolkit::real_of<E>;
 
-  array_of<E> out = array_of<E>(3);
-  array_of<toolkit::complex_of<E>> bins_out = array_of<toolkit::complex_of<E>>(3);
-  array_of<toolkit::magnitude_of<E>> power_out = array_of<toolkit::magnitude_of<E>>(3);
-  matrix_of<E> matrix_out = matrix_of<E>(1, 3);
+  array_of<E> x = filled<E>(noise<E>(40, 1)), y = filled<E>(noise<E>(27, 2)), none = array_of<E>(0);
+  array_of<C> bins = filled<C>(noise<C>(40, 3));
+  matrix_of<E> mx = filled<E>(27, 6, noise<E>(162, 4)), my = filled<E>(6, 5, noise<E>(30, 6));
+  array_of<R> numbers = filled<R>(noise<R>(40, 5)), poles = filled<R>({1, real{-0.5}, real{0.25}});
 
-  array_of<E> scratch = array_of<E>(0), room = array_of<E>(0);
-  array_of<toolkit::complex_of<E>> bins_scratch = array_of<toolkit::complex_of<E>>(0);
+  array_of<E> out = array_of<E>(3), history = array_of<E>(5);
+  array_of<C> bins_out = array_of<C>(3);
+  array_of<R> real_out = array_of<R>(3), tap_history = array_of<R>(5);
+  matrix_of<E> matrix_out = matrix_of<E>(1, 3), matrix_history = matrix_of<E>(1, 5);
+  real slope = 7, intercept = 7, residue = 7;
+  std::int32_t iterations = 7;
+  float time = 7;
+  std::array<unsigned char, LUMRA_RESAMPLER_STATE_SIZE> state;
+
+  array_of<E> scratch = array_of<E>(0), room = array_of<E>(0), more_room = array_of<E>(0);
+  array_of<C> bins_scratch = array_of<C>(0);
+  array_of<R> numbers_scratch = array_of<R>(0), more_numbers = array_of<R>(0);
   f64_array tables = f64_array(0);
   void *slot = nullptr;
 
-  arguments() {
-    const auto values = noise<E>(24, 4);
-    std::memcpy(mx.block()->elements, values.data(), 24 * sizeof values[0]);
-    std::memcpy(my.block()->elements, values.data(), 15 * sizeof values[0]);
-  }
+  arguments() { state.fill(0xA5); }
   arguments(const arguments &) = delete;
+  arguments &operator=(const arguments &) = delete;
   ~arguments() { qsHost_ReleaseTransform(&slot); }
 
   [[nodiscard]] bool scratch_is_empty() {
-    return scratch.block()->count == 0 && room.block()->count == 0 && bins_scratch.block()->count == 0 &&
-           tables.block()->count == 0;
+    const auto count = [](auto &...arrays) { return (arrays.block()->count + ...); };
+    return count(scratch, room, more_room, bins_scratch, numbers_scratch, more_numbers, tables) == 0;
   }
   /// Leaves a transform that no operation can use.
   void fill_slot() {
     array_of<E> record = filled<E>(noise<E>(7)), unused;
-    array_of<toolkit::complex_of<E>> spectrum;
-    family<E>::fft(record.handle(), spectrum.handle(), 0, 0, unused.handle(), &slot);
+    array_of<C> spectrum;
+    family<E>::fft(record, spectrum, 0, 0, unused, &slot);
   }
 };
 
+/// `result` gives the bytes of all outputs and states; those that are as a failure leaves them add none.
 template <class E>
 struct operation {
   const char *name;
   std::int32_t (*run)(arguments<E> &);
-  std::vector<unsigned char> (*result)(arguments<E> &);  // bytes of the output's elements
+  std::vector<unsigned char> (*result)(arguments<E> &);
 };
 
-template <auto member, class E>
+template <class E, auto... members>
 std::vector<unsigned char> bytes_of(arguments<E> &a) {
-  auto &block = *(a.*member).block();
-  std::size_t count = 0;
-  if constexpr (requires { block.rows; }) {
-    count = static_cast<std::size_t>(block.rows) * static_cast<std::size_t>(block.columns);
-    EXPECT_EQ(block.rows == 0, block.columns == 0);
-  } else {
-    count = static_cast<std::size_t>(block.count);
-  }
-  const auto *first = reinterpret_cast<const unsigned char *>(block.elements);
-  return {first, first + count * sizeof block.elements[0]};
+  std::vector<unsigned char> bytes;
+  const auto add = [&bytes](const auto *first, std::size_t count) {
+    const auto *const raw = reinterpret_cast<const unsigned char *>(first);
+    bytes.insert(bytes.end(), raw, raw + count * sizeof *first);
+  };
+  const auto add_output = [&](auto &output) {
+    if constexpr (requires { output.block()->rows; }) {
+      EXPECT_EQ(output.block()->rows == 0, output.block()->columns == 0);
+    }
+    if constexpr (requires { output.elements(); }) {
+      add(output.elements().data(), output.elements().size());
+    } else if (output == output && output != std::remove_reference_t<decltype(output)>{}) {  // not NaN, not 0
+      add(&output, 1);
+    }
+  };
+  (add_output(a.*members), ...);
+  return bytes;
 }
 
 template <class E>
 const std::vector<operation<E>> &operations() {
   using A = arguments<E>;
   using F = family<E>;
-  constexpr auto out = &bytes_of<&A::out, E>;
-  constexpr auto matrix_out = &bytes_of<&A::matrix_out, E>;
-  static const std::vector<operation<E>> all = {
-      {"fft", [](A &a) { return F::fft(a.x.handle(), a.bins_out.handle(), 48, 1, a.scratch.handle(), &a.slot); },
-       &bytes_of<&A::bins_out, E>},
-      {"inverse fft",
-       [](A &a) { return F::inverse_fft(a.bins.handle(), a.out.handle(), 1, a.bins_scratch.handle(), &a.slot); }, out},
-      {"direct convolution",
-       [](A &a) {
-         return F::convolution(a.x.handle(), a.y.handle(), a.out.handle(), 2, 0, 0, a.scratch.handle(), a.room.handle(),
-                               &a.slot);
-       },
-       out},
-      {"fourier convolution",
-       [](A &a) {
-         return F::convolution(a.x.handle(), a.y.handle(), a.out.handle(), 1, 1, 0, a.scratch.handle(), a.room.handle(),
-                               &a.slot);
-       },
-       out},
-      {"convolution onto an input",
-       [](A &a) {
-         return F::convolution(a.x.handle(), a.out.handle(), a.out.handle(), 0, 1, 0, a.scratch.handle(),
-                               a.room.handle(), &a.slot);
-       },
-       out},
-      {"direct correlation",
-       [](A &a) {
-         return correlation_pair<E, E>::correlate(a.x.handle(), a.y.handle(), a.out.handle(), 0, 1, 0,
-                                                  a.scratch.handle(), a.room.handle(), &a.slot);
-       },
-       out},
-      {"fourier correlation",
-       [](A &a) {
-         return correlation_pair<E, E>::correlate(a.x.handle(), a.y.handle(), a.out.handle(), 1, 2, 0,
-                                                  a.scratch.handle(), a.room.handle(), &a.slot);
-       },
-       out},
-      {"direct matrix correlation",
-       [](A &a) {
-         return F::matrix_correlation(a.mx.handle(), a.my.handle(), a.matrix_out.handle(), 0, a.scratch.handle(),
-                                      a.room.handle(), &a.slot);
-       },
-       matrix_out},
-      {"fourier matrix correlation",
-       [](A &a) {
-         return F::matrix_correlation(a.mx.handle(), a.my.handle(), a.matrix_out.handle(), 1, a.scratch.handle(),
-                                      a.room.handle(), &a.slot);
-       },
-       matrix_out},
-      {"window", [](A &a) { return F::window(a.x.handle(), 6, 1, a.tables.handle()); }, &bytes_of<&A::x, E>},
-      {"power spectrum",
-       [](A &a) { return F::power_spectrum(a.x.handle(), a.power_out.handle(), a.scratch.handle(), &a.slot); },
-       &bytes_of<&A::power_out, E>},
-  };
+  using P = partial_family<E>;
+  constexpr auto correlate = correlation_pair<E, E>::correlate;
+  constexpr auto x = &bytes_of<E, &A::x>, out = &bytes_of<E, &A::out>, matrix_out = &bytes_of<E, &A::matrix_out>;
+  static const std::vector<operation<E>> all = [] {
+    std::vector<operation<E>> list = {
+        {"fft", [](A &a) { return F::fft(a.x, a.bins_out, 48, 1, a.scratch, &a.slot); }, &bytes_of<E, &A::bins_out>},
+        {"inverse fft", [](A &a) { return F::inverse_fft(a.bins, a.out, 1, a.bins_scratch, &a.slot); }, out},
+        {"direct convolution",
+         [](A &a) { return F::convolution(a.x, a.y, a.out, 2, 0, 0, a.scratch, a.room, &a.slot); }, out},
+        {"fourier convolution",
+         [](A &a) { return F::convolution(a.x, a.y, a.out, 1, 1, 0, a.scratch, a.room, &a.slot); }, out},
+        {"convolution onto an input",
+         [](A &a) { return F::convolution(a.x, a.out, a.out, 0, 1, 0, a.scratch, a.room, &a.slot); }, out},
+        {"direct correlation", [](A &a) { return correlate(a.x, a.y, a.out, 0, 1, 0, a.scratch, a.room, &a.slot); },
+         out},
+        {"fourier correlation", [](A &a) { return correlate(a.x, a.y, a.out, 1, 2, 0, a.scratch, a.room, &a.slot); },
+         out},
+        {"direct matrix correlation",
+         [](A &a) { return F::matrix_correlation(a.mx, a.my, a.matrix_out, 0, a.scratch, a.room, &a.slot); },
+         matrix_out},
+        {"fourier matrix correlation",
+         [](A &a) { return F::matrix_correlation(a.mx, a.my, a.matrix_out, 1, a.scratch, a.room, &a.slot); },
+         matrix_out},
+        {"window", [](A &a) { return F::window(a.x, 6, 1, a.tables); }, x},
+        {"power spectrum", [](A &a) { return F::power_spectrum(a.x, a.real_out, a.scratch, &a.slot); },
+         &bytes_of<E, &A::real_out>},
+        {"decimation", [](A &a) { return F::decimate(a.x, a.out, 3, 1); }, out},
+        {"decimation of a record in place", [](A &a) { return F::decimate(a.x, a.x, 3, 0); }, x},
+        // A new stream, whose second block is what the first one gave, in place.
+        {"resampling",
+         [](A &a) {
+           const lumra_resampler_parameters parameters{0.75F, 1.5F, 0};
+           const auto run = [&](auto &in, const lumra_resampler_parameters *reset) {
+             return F::resample(in, a.numbers, 4, reset, reset != nullptr, 1, a.out, &a.time, a.history, a.tap_history,
+                                a.state.data());
+           };
+           const std::int32_t first = run(a.x, &parameters);
+           return first < 0 ? first : run(a.out, nullptr);
+         },
+         &bytes_of<E, &A::out, &A::history, &A::tap_history, &A::time, &A::state>},
+        {"resampling of channels",
+         [](A &a) {
+           const lumra_resampler_parameters parameters{0.25F, 0.5F, 1};
+           const auto run = [&](auto &in, const lumra_resampler_parameters *reset) {
+             return F::resample_channels(in, a.numbers, 16, reset, reset != nullptr, 0, a.matrix_out, &a.time,
+                                         a.matrix_history, a.tap_history, a.state.data());
+           };
+           const std::int32_t first = run(a.mx, &parameters);
+           return first < 0 ? first : run(a.matrix_out, nullptr);
+         },
+         &bytes_of<E, &A::matrix_out, &A::matrix_history, &A::tap_history, &A::time, &A::state>},
+        {"recursive filter",
+         [](A &a) {
+           const auto run = [&](bool reset, auto &...coefficient_scratch) {
+             return P::filter(a.x, a.poles, a.numbers, a.out, a.history, reset, coefficient_scratch..., a.scratch);
+           };
+           const auto run_letter = [&](bool reset) {
+             if constexpr (std::is_same_v<E, toolkit::z>)
+               return run(reset, a.numbers_scratch);
+             else
+               return run(reset, a.numbers_scratch, a.more_numbers);
+           };
+           const std::int32_t first = run_letter(true);
+           return first < 0 ? first : run_letter(false);
+         },
+         &bytes_of<E, &A::x, &A::out, &A::history>},
+    };
+    if constexpr (requires { P::linear_fit; }) {
+      list.push_back({"linear fit",
+                      [](A &a) {
+                        return P::linear_fit(a.x, a.numbers, nullptr, &a.slope, &a.intercept, &a.residue, 2, 0, 0,
+                                             &a.iterations, a.scratch);
+                      },
+                      &bytes_of<E, &A::x, &A::slope, &A::intercept, &A::residue, &A::iterations>});
+    }
+    if constexpr (requires { P::multiply; }) {
+      list.insert(
+          list.end(),
+          {{"matrix product", [](A &a) { return P::multiply(a.mx, a.my, a.matrix_out); }, matrix_out},
+           {"matrix product onto a factor", [](A &a) { return P::multiply(a.mx, a.my, a.my); }, &bytes_of<E, &A::my>},
+           {"matrix times vector",
+            [](A &a) {
+              a.mx.block()->rows = 6, a.mx.block()->columns = 27;
+              return P::multiply_vector(a.mx, a.y, a.y);
+            },
+            &bytes_of<E, &A::y>},
+           {"least squares by singular values",
+            [](A &a) { return P::least_squares(a.mx, a.y, 0, a.out, a.scratch, a.room, a.more_room); }, out},
+           {"least squares with a tolerance",
+            [](A &a) { return P::least_squares(a.mx, a.y, 1e-6F, a.y, a.scratch, a.room, a.more_room); },
+            &bytes_of<E, &A::y>}});
+    }
+    return list;
+  }();
   return all;
 }
 

@@ -26,6 +26,15 @@ using reference = std::vector<std::complex<double>>;
 
 using all_letters = testing::Types<toolkit::s, toolkit::d, toolkit::c, toolkit::z>;
 
+/// A host, and a slot for transforms.
+template <class E>
+class toolkit_test : public testing::Test {
+ protected:
+  fake_host host{fake_host::unit::elements};
+  void *slot = nullptr;
+  ~toolkit_test() override { qsHost_ReleaseTransform(&slot); }
+};
+
 /// The elements as the letter's values.
 template <class E, class Array>
 std::span<toolkit::value_of<E>> values(Array &array) {
@@ -53,8 +62,17 @@ std::vector<toolkit::value_of<E>> noise(std::size_t n, std::uint32_t seed = 1) {
 }
 
 template <class E>
+std::span<const typename array_of<E>::element> elements_of(const std::vector<toolkit::value_of<E>> &from) {
+  return {reinterpret_cast<const typename array_of<E>::element *>(from.data()), from.size()};
+}
+template <class E>
 array_of<E> filled(const std::vector<toolkit::value_of<E>> &from) {
-  return array_of<E>(std::span(reinterpret_cast<const typename array_of<E>::element *>(from.data()), from.size()));
+  return array_of<E>(elements_of<E>(from));
+}
+/// Row by row.
+template <class E>
+matrix_of<E> filled(std::int32_t rows, std::int32_t columns, const std::vector<toolkit::value_of<E>> &from) {
+  return matrix_of<E>(rows, columns, elements_of<E>(from));
 }
 
 template <class Values>
