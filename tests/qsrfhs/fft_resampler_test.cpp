@@ -13,9 +13,7 @@
 #include <thread>
 #include <vector>
 
-#include "platform/processor.hpp"
 #include "qsrfhs/math/filter_design.hpp"
-#include "qsrfhs/vector/kernels/kernels.hpp"
 #include "support/near.hpp"
 #include "support/recorded.hpp"
 
@@ -179,30 +177,6 @@ TEST(FftResampler, NothingIsWrittenBeyondTheOutput) {
                           {&channel, 1});
   }
   for (std::size_t k = 3; k < 16; ++k) EXPECT_EQ(sample(5), out[k]);
-}
-
-TEST(FftResamplerKernels, BuildsAgreeBitForBit) {
-  std::vector<const qsrfhs::kernels::kernel_table *> tables = {&qsrfhs::kernels::baseline_kernels};
-  if (platform::has_avx()) tables.push_back(&qsrfhs::kernels::avx_kernels);
-  for (const auto *table : tables)
-    for (const std::size_t n : {0U, 1U, 3U, 7U, 8U, 9U, 15U, 17U, 1003U}) {
-      const auto x = noise(n + 1, 1), w = noise(n + 1, 2);
-      const float c = 0.6F, s = -0.8F;
-      std::vector<sample> weighed(n + 1, sample(9)), rotated(n + 1, sample(9)), out(n + 1, sample(9));
-      for (std::size_t k = 0; k < n; ++k) {
-        const float re = x[k].real() * w[k].real(), im = x[k].imag() * w[k].imag();
-        weighed[k] = {re, im};
-        const float re_c = re * c, im_s = im * s, im_c = im * c, re_s = re * s;
-        rotated[k] = {re_c - im_s, im_c + re_s};
-      }
-      const auto floats = [](auto &v) { return reinterpret_cast<float *>(v.data()); };
-      const auto *const px = reinterpret_cast<const float *>(x.data()), *const pw =
-                                                                            reinterpret_cast<const float *>(w.data());
-      table->weigh(px, pw, floats(out), n);
-      EXPECT_EQ(weighed, out);
-      table->weigh_and_rotate(px, pw, c, s, floats(out), n);
-      EXPECT_EQ(rotated, out);
-    }
 }
 
 TEST(ResamplerDescriptors, AreLentAgainOnceTheirOwnerIsReleased) {

@@ -92,6 +92,7 @@ struct operation {
   std::size_t x_width, y_width, out_width;  // floats an element
   std::function<void(const kernel_table &, const float *x, const float *y, float *out, std::size_t n)> run;
   std::function<void(const float *x, const float *y, float *out)> define;  // one element
+  bool in_place = true;                                                    // the output may be an input
 };
 
 void define_division(const float *a, const float *b, float *out) {
@@ -100,6 +101,10 @@ void define_division(const float *a, const float *b, float *out) {
   const float re = (a[0] * b[0] + a[1] * b[1]) * r, im = (a[1] * b[0] - a[0] * b[1]) * r;
   out[0] = re;
   out[1] = im;
+}
+
+float define_power(const float *x) {
+  return x[0] * x[0] + x[1] * x[1];
 }
 
 float define_log2(float v) {
@@ -155,6 +160,82 @@ void define_lookup(const qsrfhs::kernels::lookup_table &table, float key, const 
   out[1] = im;
 }
 
+/// The loops around transforms. Those that work on their output itself find x there.
+void add_transform_loops(std::vector<operation> &all) {
+  const auto window = [](auto x, auto w, auto out) { out[0] = x[0] * *w, out[1] = x[1] * *w; };
+  const auto twice_the_power = [](auto x, auto, auto out) { *out = define_power(x) + define_power(x); };
+  all.push_back({"copy", 2, 0, 2, [](auto &t, auto x, auto, auto out, auto n) { t.copy(x, out, n); },
+                 [](auto x, auto, auto out) { std::copy_n(x, 2, out); }});
+  all.push_back({"apply_window", 2, 1, 2,
+                 [](auto &t, auto x, auto w, auto out, auto n) { t.apply_window(x, w, out, n); }, window});
+  all.push_back({"scale", 1, 0, 1,
+                 [](auto &t, auto x, auto, auto out, auto n) {
+                   std::copy_n(x, n, out);
+                   t.scale(out, 0.3F, n);
+                 },
+                 [](auto x, auto, auto out) { *out = *x * 0.3F; }});
+  all.push_back({"multiply", 2, 2, 2,
+                 [](auto &t, auto x, auto y, auto out, auto n) {
+                   std::copy_n(x, 2 * n, out);
+                   t.multiply(out, y, n);
+                 },
+                 [](auto x, auto y, auto out) {
+                   out[0] = x[0] * y[0] - x[1] * y[1];
+                   out[1] = x[1] * y[0] + x[0] * y[1];
+                 },
+                 false});
+  // Two segments into zeros: the order of the powers is the build's own until they are put into theirs.
+  all.push_back({"accumulate_power", 2, 0, 1,
+                 [](auto &t, auto x, auto, auto out, auto n) {
+                   std::fill_n(out, n, 0.0F);
+                   for (int segment = 0; segment < 2; ++segment) t.accumulate_power(x, out, n);
+                   t.order_power(out, n);
+                 },
+                 twice_the_power, false});
+  all.push_back({"power of accumulate_power_then_apply_window", 2, 1, 1,
+                 [](auto &t, auto x, auto w, auto out, auto n) {
+                   std::vector<float> work(x, x + 2 * n);
+                   std::fill_n(out, n, 0.0F);
+                   t.accumulate_power_then_apply_window(work.data(), out, x, w, x, n, n);
+                   t.accumulate_power(x, out, n);
+                   t.order_power(out, n);
+                 },
+                 twice_the_power, false});
+  all.push_back({"window of accumulate_power_then_apply_window", 2, 1, 2,
+                 [](auto &t, auto x, auto w, auto out, auto n) {
+                   std::vector<float> power(n);
+                   t.accumulate_power_then_apply_window(out, power.data(), x, w, x, n, n);
+                 },
+                 window, false});
+  all.push_back({"reverse_conjugate", 2, 0, 2,
+                 [](auto &t, auto x, auto, auto out, auto n) {
+                   t.reverse_conjugate(x, out, n);
+                   for (std::size_t k = 0; k < n / 2; ++k)
+                     std::swap_ranges(out + 2 * k, out + 2 * k + 2, out + 2 * (n - 1 - k));
+                 },
+                 [](auto x, auto, auto out) { out[0] = x[0], out[1] = -x[1]; }, false});
+  for (const double factor : {1.0 / 1024, 1.0 / 3})
+    for (const bool mirrored : {false, true})
+      all.push_back(
+          {mirrored ? "mirror of scaled_power" : "scaled_power", 2, 0, 1,
+           [=](auto &t, auto x, auto, auto out, auto n) {
+             std::vector<float> other(n);
+             t.scaled_power(x, mirrored ? other.data() : out, mirrored ? out : nullptr, factor, n);
+             if (mirrored) std::reverse(out, out + n);
+           },
+           [=](auto x, auto, auto out) { *out = static_cast<float>(static_cast<double>(define_power(x)) * factor); },
+           false});
+  all.push_back({"weigh", 2, 2, 2, [](auto &t, auto x, auto w, auto out, auto n) { t.weigh(x, w, out, n); },
+                 [](auto x, auto w, auto out) { out[0] = x[0] * w[0], out[1] = x[1] * w[1]; }});
+  all.push_back({"weigh_and_rotate", 2, 2, 2,
+                 [](auto &t, auto x, auto w, auto out, auto n) { t.weigh_and_rotate(x, w, 0.6F, -0.8F, out, n); },
+                 [](auto x, auto w, auto out) {
+                   const float re = x[0] * w[0], im = x[1] * w[1];
+                   out[0] = re * 0.6F - im * -0.8F;
+                   out[1] = im * 0.6F + re * -0.8F;
+                 }});
+}
+
 std::vector<operation> operations() {
   std::vector<operation> all;
   all.push_back(
@@ -164,10 +245,10 @@ std::vector<operation> operations() {
                    [v](auto &t, auto x, auto, auto out, auto n) { t.divide_by_value(x, v.data(), out, n); },
                    [v](auto x, auto, auto out) { define_division(x, v.data(), out); }});
   all.push_back({"magnitude", 2, 0, 1, [](auto &t, auto x, auto, auto out, auto n) { t.magnitude(x, out, n); },
-                 [](auto x, auto, auto out) { *out = std::sqrt(x[0] * x[0] + x[1] * x[1]); }});
+                 [](auto x, auto, auto out) { *out = std::sqrt(define_power(x)); }});
   all.push_back({"magnitude_squared", 2, 0, 1,
                  [](auto &t, auto x, auto, auto out, auto n) { t.magnitude_squared(x, out, n); },
-                 [](auto x, auto, auto out) { *out = x[0] * x[0] + x[1] * x[1]; }});
+                 [](auto x, auto, auto out) { *out = define_power(x); }});
   for (const auto &factors : {std::pair{1.0F, 0.0F}, {10.0F, 5.0F}, {-3.0103F, 1e-3F}, {0.0F, inf}}) {
     const float a = factors.first, b = factors.second;
     all.push_back({"log2_scaled", 1, 0, 1,
@@ -184,7 +265,7 @@ std::vector<operation> operations() {
                    }});
     all.push_back({"log2_scaled_power", 2, 0, 1,
                    [a, b](auto &t, auto x, auto, auto out, auto n) { t.log2_scaled_power(x, a, b, out, n); },
-                   [a, b](auto x, auto, auto out) { *out = a * define_log2(x[0] * x[0] + x[1] * x[1]) + b; }});
+                   [a, b](auto x, auto, auto out) { *out = a * define_log2(define_power(x)) + b; }});
   }
   for (const std::size_t m : {1U, 2U, 9U, 33U}) {
     std::vector<float> c(2 * m);
@@ -217,6 +298,7 @@ std::vector<operation> operations() {
     all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
                    [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
   }
+  add_transform_loops(all);
   return all;
 }
 
@@ -261,7 +343,7 @@ TEST(VectorKernels, AnOutputMayBeAnInput) {
   for (const operation &op : operations())
     for (const std::size_t n : lengths)
       for (const bool over_x : {true, false}) {
-        if (op.out_width > (over_x ? op.x_width : op.y_width)) continue;
+        if (!op.in_place || op.out_width > (over_x ? op.x_width : op.y_width)) continue;
         SCOPED_TRACE(testing::Message() << op.name << " n " << n << (over_x ? " over x" : " over y"));
         for (const build &b : builds()) {
           SCOPED_TRACE(b.name);
@@ -314,7 +396,7 @@ TEST(VectorKernels, SumsKeepTheirOrder) {
           for (float &v : x.values()) v = std::isfinite(v) && std::abs(v) < 1e15F ? v : 0.1F;
         float sequential = 0, peak = -largest;
         for (std::size_t i = 0; i < n; ++i) {
-          const float power = x.data()[2 * i] * x.data()[2 * i] + x.data()[2 * i + 1] * x.data()[2 * i + 1];
+          const float power = define_power(x.data() + 2 * i);
           sequential += power;
           if (power > peak) peak = power;
         }
