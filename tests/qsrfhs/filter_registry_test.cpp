@@ -118,7 +118,7 @@ TEST(FilterDesign, RootRaisedCosineSquaredHasNyquistZeros) {
 
 TEST(FilterDesign, TakesGivenCoefficientsAndWantedCounts) {
   tests::f32_array given{1.F, -2.F, 3.F};
-  const registered filter(key_of(0, 77), given.handle(), 3);
+  const registered filter(key_of(0, 77), given, 3);
   EXPECT_EQ((std::vector<double>{1, -2, 3}), filter.coefficients());
   EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(filter.record.entry->coefficients) % 32);
   EXPECT_EQ(0.F, filter.record.entry->state[5]);
@@ -136,13 +136,13 @@ TEST(FilterDesign, RefusesWhatMakesNoFilter) {
     const void *input;
     std::uint64_t count;
   };
-  const row rows[] = {{key_of(3, 1, 1, 1, 1), given.handle(), 0},
-                      {key_of(-1, 1, 1, 1, 1), given.handle(), 0},
+  const row rows[] = {{key_of(3, 1, 1, 1, 1), given, 0},
+                      {key_of(-1, 1, 1, 1, 1), given, 0},
                       {key_of(0, 1), nullptr, 0},
-                      {key_of(0, 1), empty.handle(), 0},
-                      {key_of(0, 1), negative.handle(), 0},
-                      {key_of(0, 1), none.handle(), 0},
-                      {key_of(0, 1), given.handle(), 3},
+                      {key_of(0, 1), empty, 0},
+                      {key_of(0, 1), negative, 0},
+                      {key_of(0, 1), none, 0},
+                      {key_of(0, 1), given, 3},
                       {key_of(1, 1, .1, .6, 60), nullptr, 0},
                       {key_of(1, 1, .2, .2, 60), nullptr, 0},
                       {key_of(1, 1, .3, .2, 60), nullptr, 0},
@@ -230,7 +230,7 @@ TEST(FilterRegistry, EvictsTheLeastRecentlyUsedWithoutReferences) {
   const auto add = [&](int i) {
     lumra_filter_record record{};
     const lumra_filter_key k = key(i);
-    EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&record, given.handle(), &k, 0));
+    EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&record, given, &k, 0));
     return record;
   };
   const std::uint64_t before = total();
@@ -267,8 +267,8 @@ TEST(FilterRegistry, AKeyWithANanNeverMatches) {
   tests::f32_array given{1.F};
   const lumra_filter_key key = key_of(0, std::numeric_limits<double>::quiet_NaN());
   lumra_filter_record a{}, b{};
-  EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&a, given.handle(), &key, 0));
-  EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&b, given.handle(), &key, 0));
+  EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&a, given, &key, 0));
+  EXPECT_EQ(0, qsUtilHS_RegisterFilterSpec(&b, given, &key, 0));
   EXPECT_NE(a.entry, b.entry);
   lumra_filter_record unused{};
   EXPECT_EQ(-50462810, qsUtilHS_MatchFilterSpecErase(&unused, &key, 1));

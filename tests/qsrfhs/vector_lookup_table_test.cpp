@@ -37,10 +37,10 @@ TEST(LookupTable, RefusesWithoutARecordAndTouchesNothing) {
   f32_array keys{0.F};
   cf32_array in{{1, 0}}, out{{7, 7}, {7, 7}}, table{{1, 0}, {0, 0}}, empty(0), none;
   for (const lumra_cf32_array bad : {lumra_cf32_array{}, none.handle(), empty.handle()})
-    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys.handle(), in.handle(), out.address(), bad, 0, 1));
+    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys, in, out.address(), bad, 0, 1));
   for (const float step : {0.0F, -0.0F})
-    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys.handle(), in.handle(), nullptr, table.handle(), 0, step));
-  EXPECT_EQ(-1, qsUtilHS_LookupTable(keys.handle(), in.handle(), nullptr, table.handle(), 0, 1));
+    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys, in, nullptr, table, 0, step));
+  EXPECT_EQ(-1, qsUtilHS_LookupTable(keys, in, nullptr, table, 0, 1));
   EXPECT_EQ(before, recorded_count());
   EXPECT_EQ(2U, out.elements().size());
   EXPECT_EQ(7, out.elements()[0].re);
@@ -54,30 +54,30 @@ TEST(LookupTable, FollowsTheTable) {
   constexpr lumra_cf32 gains[] = {{10, 1}, {9, 1}, {11, 1}, {21, 1.5F}, {30, 3}, {30, 3}, {10, 1}, {10, 1}};
   cf32_array in(keys.elements().size()), out;
   for (lumra_cf32 &sample : in.elements()) sample = {0, 1};
-  ASSERT_EQ(0, qsUtilHS_LookupTable(keys.handle(), in.handle(), in.address(), table.handle(), 5, 1));
+  ASSERT_EQ(0, qsUtilHS_LookupTable(keys, in, in.address(), table, 5, 1));
   for (std::size_t i = 0; i < std::size(gains); ++i) {
     EXPECT_EQ(-gains[i].im, in.elements()[i].re) << i;
     EXPECT_EQ(gains[i].re, in.elements()[i].im) << i;
   }
   for (lumra_cf32 &sample : in.elements()) sample = {1, 0};
-  ASSERT_EQ(0, qsUtilHS_LookupTable(keys.handle(), in.handle(), in.address(), table.handle(), 5, nan));
+  ASSERT_EQ(0, qsUtilHS_LookupTable(keys, in, in.address(), table, 5, nan));
   for (const lumra_cf32 &sample : in.elements()) EXPECT_EQ(10, sample.re);
 }
 
 TEST(LookupTable, NothingToDo) {
   cf32_array in{{1, 2}}, out{{7, 7}}, half{{1, 0}}, table{{1, 0}, {0, 0}}, no_block;
   f32_array no_keys, one_key{0.F};
-  EXPECT_EQ(0, qsUtilHS_LookupTable(no_keys.handle(), in.handle(), out.address(), table.handle(), 0, 1));
+  EXPECT_EQ(0, qsUtilHS_LookupTable(no_keys, in, out.address(), table, 0, 1));
   EXPECT_EQ(0, out.block()->count);
   out.block()->count = 1;
-  EXPECT_EQ(0, qsUtilHS_LookupTable(one_key.handle(), in.handle(), out.address(), half.handle(), 0, 1));
+  EXPECT_EQ(0, qsUtilHS_LookupTable(one_key, in, out.address(), half, 0, 1));
   EXPECT_EQ(0, out.elements()[0].re);
   for (const lumra_cf32_array missing : {no_block.handle(), lumra_cf32_array{}}) {
     out.block()->count = 1;
-    EXPECT_EQ(0, qsUtilHS_LookupTable(one_key.handle(), missing, out.address(), table.handle(), 0, 1));
+    EXPECT_EQ(0, qsUtilHS_LookupTable(one_key, missing, out.address(), table, 0, 1));
     EXPECT_EQ(0, out.block()->count);
   }
-  EXPECT_EQ(0, qsUtilHS_LookupTable(nullptr, in.handle(), out.address(), table.handle(), 0, 1));
+  EXPECT_EQ(0, qsUtilHS_LookupTable(nullptr, in, out.address(), table, 0, 1));
 }
 
 /// A call of n samples against one run of the kernel.
@@ -92,7 +92,7 @@ struct long_call {
   }
   bool run() {
     std::memset(out.elements().data(), 0x55, out.elements().size_bytes());
-    return qsUtilHS_LookupTable(keys.handle(), in.handle(), out.address(), table.handle(), 0.5F, 2) == 0 &&
+    return qsUtilHS_LookupTable(keys, in, out.address(), table, 0.5F, 2) == 0 &&
            std::memcmp(out.elements().data(), expected.data(), out.elements().size_bytes()) == 0;
   }
   f32_array keys;

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "platform/processor.hpp"
+#include "support/recorded.hpp"
 #include "support/test_array.hpp"
 
 bool operator==(const lumra_cf32 &a, const lumra_cf32 &b) {
@@ -24,15 +25,6 @@ using tests::f32_array;
 using tests::fake_host;
 
 constexpr float inf = std::numeric_limits<float>::infinity();
-
-std::vector<std::int32_t> recorded() {
-  std::uint64_t count = 0;
-  qsrfhs_getErrorCnt(&count);
-  std::vector<std::int32_t> codes(count + 1);  // never without memory
-  qsrfhs_getErrors(codes.data(), count);
-  codes.pop_back();
-  return codes;
-}
 
 TEST(VectorUtilities, RefuseInOrderAndTouchNothing) {
   const lumra_cf32 v{2, 0};
@@ -48,13 +40,13 @@ TEST(VectorUtilities, RefuseInOrderAndTouchNothing) {
       {-83951665, [&] { return qsRFHS_complex_division_array_by_array(none, Y, out.address()); }},
       {-83951668, [&] { return qsRFHS_complex_division_array_by_array(X, nullptr, nullptr); }},
       {-83951668, [&] { return qsRFHS_complex_division_array_by_array(X, none, out.address()); }},
-      {-83951671, [&] { return qsRFHS_complex_division_array_by_array(X, short_y.handle(), nullptr); }},
-      {-83951676, [&] { return qsRFHS_complex_division_array_by_array(X, short_y.handle(), out.address()); }},
+      {-83951671, [&] { return qsRFHS_complex_division_array_by_array(X, short_y, nullptr); }},
+      {-83951676, [&] { return qsRFHS_complex_division_array_by_array(X, short_y, out.address()); }},
       {-83951703, [&] { return qsRFHS_complex_division_assignment_array_by_array(nullptr, nullptr); }},
       {-83951703, [&] { return qsRFHS_complex_division_assignment_array_by_array(none, Y); }},
       {-83951706, [&] { return qsRFHS_complex_division_assignment_array_by_array(X, nullptr); }},
       {-83951706, [&] { return qsRFHS_complex_division_assignment_array_by_array(X, none); }},
-      {-83951711, [&] { return qsRFHS_complex_division_assignment_array_by_array(X, short_y.handle()); }},
+      {-83951711, [&] { return qsRFHS_complex_division_assignment_array_by_array(X, short_y); }},
       {-83951730, [&] { return qsRFHS_complex_division_array_by_value(none, nullptr, nullptr); }},
       {-83951733, [&] { return qsRFHS_complex_division_array_by_value(X, nullptr, nullptr); }},
       {-83951736, [&] { return qsRFHS_complex_division_array_by_value(X, &v, nullptr); }},
@@ -65,23 +57,24 @@ TEST(VectorUtilities, RefuseInOrderAndTouchNothing) {
       {-83951822, [&] { return qsRFHS_complex_magnitude_squared(nullptr, nullptr); }},
       {-83951825, [&] { return qsRFHS_complex_magnitude_squared(X, nullptr); }},
   };
-  std::vector<std::int32_t> expected = recorded();
+  const tests::recorded list;
+  std::vector<std::int32_t> expected;
   for (const refusal &r : refusals) {
     EXPECT_EQ(r.code, r.call());
     expected.push_back(r.code);
   }
-  EXPECT_EQ(expected, recorded());
+  EXPECT_EQ(expected, list.codes());
 
   float rms = 7, peak = 7;
   const std::function<std::int32_t()> unrecorded[] = {
-      [&] { return qsUtilHS_aLog2Plusb_SGL(real_out.handle(), nullptr, 1, 0); },
+      [&] { return qsUtilHS_aLog2Plusb_SGL(real_out, nullptr, 1, 0); },
       [&] { return qsUtilHS_aLog2Plusb_IQ(X, nullptr, 1, 0); },
       [&] { return qsUtilHS_RMS_IQ_with_peak_calc(nullptr, &rms, &peak); },
       [&] { return qsUtilHS_RMS_IQ_with_peak_calc(none, &rms, &peak); },
       [&] { return qsUtilHS_RMS_IQ_with_peak_calc(X, nullptr, &peak); },
       [&] { return qsUtilHS_RMS_IQ_with_peak_calc(X, &rms, nullptr); }};
   for (const auto &call : unrecorded) EXPECT_EQ(-1, call());
-  EXPECT_EQ(expected, recorded());
+  EXPECT_EQ(expected, list.codes());
 
   EXPECT_EQ((std::vector<lumra_cf32>{{1, 2}, {3, 4}}), x.copy());
   EXPECT_EQ((std::vector<lumra_cf32>{{7, 7}}), out.copy());
@@ -92,33 +85,33 @@ TEST(VectorUtilities, RefuseInOrderAndTouchNothing) {
 
 TEST(VectorUtilities, DivideAndMeasure) {
   cf32_array x{{1, 0}, {0, 0}, {3, -2}}, y{{0, 0}, {0, 0}, {0, 1}, {9, 9}}, quotient{{}, {}, {}};
-  ASSERT_EQ(0, qsRFHS_complex_division_array_by_array(x.handle(), y.handle(), quotient.address()));
+  ASSERT_EQ(0, qsRFHS_complex_division_array_by_array(x, y, quotient.address()));
   for (int i = 0; i < 2; ++i) {  // infinity times zero
     EXPECT_TRUE(std::isnan(quotient.elements()[0].im));
     EXPECT_TRUE(std::isnan(quotient.elements()[1].re));
   }
   EXPECT_EQ((lumra_cf32{-2, -3}), quotient.elements()[2]);
   const lumra_cf32 j{0, 1};
-  ASSERT_EQ(0, qsRFHS_complex_division_assignment_array_by_value(x.handle(), &j));
+  ASSERT_EQ(0, qsRFHS_complex_division_assignment_array_by_value(x, &j));
   EXPECT_EQ((lumra_cf32{-2, -3}), x.elements()[2]);
-  ASSERT_EQ(0, qsRFHS_complex_division_array_by_value(x.handle(), &x.elements()[2], x.address()));
+  ASSERT_EQ(0, qsRFHS_complex_division_array_by_value(x, &x.elements()[2], x.address()));
   EXPECT_EQ((lumra_cf32{1, 0}), x.elements()[2]);
-  ASSERT_EQ(0, qsRFHS_complex_division_assignment_array_by_array(y.handle(), y.handle()));
+  ASSERT_EQ(0, qsRFHS_complex_division_assignment_array_by_array(y, y));
   EXPECT_EQ((lumra_cf32{1, 0}), y.elements()[3]);
 
   cf32_array z{{3, 4}, {0, -2}, {2e19F, 0}};
   f32_array out{0, 0, 0};
-  ASSERT_EQ(0, qsRFHS_complex_magnitude(z.handle(), out.address()));
+  ASSERT_EQ(0, qsRFHS_complex_magnitude(z, out.address()));
   EXPECT_EQ((std::vector<float>{5, 2, inf}), out.copy());
-  ASSERT_EQ(0, qsRFHS_complex_magnitude_squared(z.handle(), out.address()));
+  ASSERT_EQ(0, qsRFHS_complex_magnitude_squared(z, out.address()));
   EXPECT_EQ((std::vector<float>{25, 4, inf}), out.copy());
 }
 
 TEST(VectorUtilities, Logarithms) {
   f32_array x{1, 2, 0.5F, 3, 1000, 0, -0.0F, inf, -1, std::nanf("")};
   f32_array out(x.elements().size());
-  ASSERT_EQ(0, qsUtilHS_aLog2Plusb_SGL(x.handle(), out.address(), 1, 0));
-  ASSERT_EQ(0, qsRFHS_log2_scaled_SGL(x.handle(), 1, 0));
+  ASSERT_EQ(0, qsUtilHS_aLog2Plusb_SGL(x, out.address(), 1, 0));
+  ASSERT_EQ(0, qsRFHS_log2_scaled_SGL(x, 1, 0));
   constexpr float expected[] = {3.0517578e-5F, 1.0000305F,  -0.9999695F, 1.5849533F,
                                 9.965790F,     -126.99997F, -126.99997F};
   for (std::size_t i = 0; i < std::size(expected); ++i) {
@@ -130,7 +123,7 @@ TEST(VectorUtilities, Logarithms) {
     EXPECT_TRUE(std::isnan(values[8]) && std::isnan(values[9]));
   }
   cf32_array z{{0, 0}, {1, 1}, {std::nanf(""), 0}, {0, -inf}};
-  ASSERT_EQ(0, qsUtilHS_aLog2Plusb_IQ(z.handle(), out.address(), 10, 5));
+  ASSERT_EQ(0, qsUtilHS_aLog2Plusb_IQ(z, out.address(), 10, 5));
   ASSERT_EQ(4U, out.elements().size());
   EXPECT_FLOAT_EQ(-1264.9997F, out.elements()[0]);
   EXPECT_FLOAT_EQ(15.000305F, out.elements()[1]);
@@ -141,22 +134,22 @@ TEST(VectorUtilities, Logarithms) {
 TEST(VectorUtilities, Levels) {
   float rms = 0, peak = 0;
   cf32_array one{{3, 4}}, two{{1, 0}, {0, 0}}, none(0), no_block;
-  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(one.handle(), &rms, &peak));
+  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(one, &rms, &peak));
   EXPECT_EQ(5, rms);
   EXPECT_EQ(5, peak);
-  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(two.handle(), &rms, &peak));
+  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(two, &rms, &peak));
   EXPECT_EQ(std::sqrt(0.5F), rms);
   EXPECT_EQ(1, peak);
-  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(none.handle(), &rms, &peak));
+  EXPECT_EQ(0, qsUtilHS_RMS_IQ_with_peak_calc(none, &rms, &peak));
   EXPECT_TRUE(std::isnan(rms) && std::isnan(peak));
-  EXPECT_EQ(0, qsUtilHS_RMS_IQ(two.handle(), &rms));
+  EXPECT_EQ(0, qsUtilHS_RMS_IQ(two, &rms));
   EXPECT_EQ(std::sqrt(0.5F), rms);
   for (const lumra_cf32_array empty : {none.handle(), no_block.handle(), lumra_cf32_array{}}) {
     rms = 0;
     EXPECT_EQ(0, qsUtilHS_RMS_IQ(empty, &rms));
     EXPECT_TRUE(std::isnan(rms));
   }
-  EXPECT_EQ(0, qsUtilHS_RMS_IQ(two.handle(), nullptr));
+  EXPECT_EQ(0, qsUtilHS_RMS_IQ(two, nullptr));
 }
 
 /// The functions that size `out` for the elements of x.
@@ -183,11 +176,11 @@ std::vector<sizing> sizings() {
           {"log", 9, 4,
            [=](auto x, auto o) {
              reals.block()->count = x ? (*x)->count : 0;
-             return qsUtilHS_aLog2Plusb_SGL(reals.handle(), real(o), 1, 0);
+             return qsUtilHS_aLog2Plusb_SGL(reals, real(o), 1, 0);
            }},
           {"lookup", 12, 8, [=](auto x, auto o) {
              keys.block()->count = x ? (*x)->count : 0;
-             return qsUtilHS_LookupTable(keys.handle(), x, complex(o), table.handle(), 0, 1);
+             return qsUtilHS_LookupTable(keys, x, complex(o), table, 0, 1);
            }}};
 }
 
@@ -197,7 +190,7 @@ TEST(VectorUtilities, SizeTheirOutputs) {
     fake_host host(fake_host::unit::bytes);
     cf32_array x{{1, 0}, {1, 0}, {1, 0}, {1, 0}, {1, 0}};
     void **handle = nullptr;
-    EXPECT_EQ(0, s.call(x.handle(), &handle));  // made by the host
+    EXPECT_EQ(0, s.call(x, &handle));  // made by the host
     ASSERT_EQ(1U, host.calls.size());
     EXPECT_EQ(s.type, host.calls[0].type);
     EXPECT_EQ(1, host.calls[0].dimensions);
@@ -207,26 +200,26 @@ TEST(VectorUtilities, SizeTheirOutputs) {
     const void *block = *handle;
     for (const std::int32_t n : {5, 3, 0, -4}) {  // shrinks in place
       x.block()->count = n;
-      EXPECT_EQ(0, s.call(x.handle(), &handle));
+      EXPECT_EQ(0, s.call(x, &handle));
       EXPECT_EQ(std::max(n, 0), count());
       EXPECT_EQ(block, *handle);
     }
     EXPECT_EQ(1U, host.calls.size());
     x.block()->count = 2;
-    EXPECT_EQ(0, s.call(x.handle(), &handle));
+    EXPECT_EQ(0, s.call(x, &handle));
     EXPECT_EQ(2U, host.calls.size());
     EXPECT_EQ(2, count());
     host.refuse_from = 2;  // the block of two elements ends where a sanitizer looks
     x.block()->count = 5;
-    EXPECT_EQ(0, s.call(x.handle(), &handle));
+    EXPECT_EQ(0, s.call(x, &handle));
     EXPECT_EQ(3U, host.calls.size());
     EXPECT_EQ(2, count());
     void **missing = nullptr;
-    EXPECT_EQ(0, s.call(x.handle(), &missing));
+    EXPECT_EQ(0, s.call(x, &missing));
     EXPECT_EQ(nullptr, missing);
     x.block()->count = 0;
     host.refuse_from = -1;
-    EXPECT_EQ(0, s.call(x.handle(), &missing));
+    EXPECT_EQ(0, s.call(x, &missing));
     EXPECT_EQ(0U, host.calls.back().size);
   }
 }
@@ -235,8 +228,8 @@ TEST(VectorUtilities, AHostThatThrowsHasRefused) {
   cf32_array x{{3, 4}, {6, 8}};
   f32_array out{1};
   qsHost_SetArrayResize([](std::int32_t, std::int32_t, void *, std::uint64_t) -> std::int32_t { throw 1; });
-  EXPECT_EQ(0, qsRFHS_complex_magnitude(x.handle(), out.address()));
-  EXPECT_EQ(0, qsRFHS_ApplyPolynomial(out.handle(), f32_array{1.F}.handle(), f32_array(0).handle()));
+  EXPECT_EQ(0, qsRFHS_complex_magnitude(x, out.address()));
+  EXPECT_EQ(0, qsRFHS_ApplyPolynomial(out, f32_array{1.F}, f32_array(0)));
   qsHost_SetArrayResize(nullptr);
   EXPECT_EQ((std::vector<float>{5}), out.copy());
 }
@@ -244,49 +237,49 @@ TEST(VectorUtilities, AHostThatThrowsHasRefused) {
 TEST(Polynomial, EvaluatesAndSizes) {
   fake_host host(fake_host::unit::bytes);
   f32_array x{2, 3, 0}, c{1, 2, 3}, out{9, 9, 9, 9}, empty(0), no_block;
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), out.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, c, out));
   EXPECT_EQ((std::vector<float>{17, 34, 1}), out.copy());
   ASSERT_EQ(1U, host.calls.size());  // a larger output is resized, too
   EXPECT_EQ(9, host.calls[0].type);
   EXPECT_EQ(12U, host.calls[0].size);
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), out.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, c, out));
   EXPECT_EQ(1U, host.calls.size());
 
   for (const lumra_f32_array nothing : {empty.handle(), no_block.handle(), lumra_f32_array{}}) {
     f32_array emptied{5.F};
-    ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), nothing, emptied.handle()));
+    ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, nothing, emptied));
     EXPECT_EQ(0U, emptied.elements().size());
     EXPECT_EQ(0U, host.calls.back().size);
     const std::size_t calls = host.calls.size();
-    ASSERT_EQ(0, qsRFHS_ApplyPolynomial(nothing, c.handle(), emptied.handle()));
+    ASSERT_EQ(0, qsRFHS_ApplyPolynomial(nothing, c, emptied));
     EXPECT_EQ(calls, host.calls.size());  // empty already
   }
 
   cf32_array cc{{1, 0}, {0, 1}}, complex_out;
   float seconds = -1;
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x.handle(), cc.handle(), complex_out.handle(), &seconds));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x, cc, complex_out, &seconds));
   EXPECT_EQ((std::vector<lumra_cf32>{{1, 2}, {1, 3}, {1, 0}}), complex_out.copy());
   EXPECT_EQ(12, host.calls.back().type);
   EXPECT_EQ(24U, host.calls.back().size);
   EXPECT_GE(seconds, 0);
   EXPECT_LT(seconds, 5);
   seconds = -1;
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(empty.handle(), cc.handle(), complex_out.handle(), &seconds));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(empty, cc, complex_out, &seconds));
   EXPECT_EQ(-1, seconds);
   EXPECT_EQ(0U, complex_out.elements().size());
-  EXPECT_EQ(0, qsRFHS_ApplyPolynomialCplx(x.handle(), cc.handle(), nullptr, nullptr));
+  EXPECT_EQ(0, qsRFHS_ApplyPolynomialCplx(x, cc, nullptr, nullptr));
 }
 
 TEST(Polynomial, OutputsThatAreInputs) {
   fake_host host(fake_host::unit::bytes);
   f32_array x{2, 3, 0, 1}, c{1, 2, 3};
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), c.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, c, c));
   EXPECT_EQ((std::vector<float>{17, 34, 1, 6}), c.copy());
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), x.handle(), x.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, x, x));
   EXPECT_EQ((std::vector<float>{2 + 6 + 0 + 8, 2 + 9 + 0 + 27, 2, 6}), x.copy());
   // Real values have no room for complex ones: nothing is written.
   const auto as_complex = reinterpret_cast<lumra_cf32_array>(x.handle());
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x.handle(), cf32_array{{1, 1}}.handle(), as_complex, nullptr));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x, cf32_array{{1, 1}}.handle(), as_complex, nullptr));
   EXPECT_EQ(2 + 6 + 0 + 8, x.elements()[0]);
 }
 
@@ -294,14 +287,14 @@ TEST(Polynomial, LeavesWhatItsBuildDoesNotReach) {
   f32_array x(40), c(33), out(40);
   std::fill(c.elements().begin(), c.elements().end(), 1.F);
   std::fill(out.elements().begin(), out.elements().end(), 7.F);
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), c.handle(), out.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, c, out));
   const auto evaluated = std::count(out.elements().begin(), out.elements().end(), 1.F);
   EXPECT_EQ(40 - evaluated, std::count(out.elements().begin() + evaluated, out.elements().end(), 7.F));
   EXPECT_GT(evaluated, 0);
   EXPECT_LT(evaluated, 40);
   cf32_array many(33), complex_out(40);
   std::fill(many.elements().begin(), many.elements().end(), lumra_cf32{1, 2});
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x.handle(), many.handle(), complex_out.handle(), nullptr));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomialCplx(x, many, complex_out, nullptr));
   for (const lumra_cf32 &value : complex_out.elements()) EXPECT_EQ((lumra_cf32{1, 2}), value);
 }
 
@@ -310,13 +303,13 @@ TEST(Polynomial, ARefusedResizeKeepsTheCountAndWritesNoFurther) {
   host.refuse_from = 0;
   f32_array x(40), few{1.F, 1.F}, many(17), out(20), none;
   many.elements()[0] = 3;
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), few.handle(), out.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, few, out));
   EXPECT_EQ(20, std::count(out.elements().begin(), out.elements().end(), 1.F));
   EXPECT_EQ(20U, out.elements().size());
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), few.handle(), none.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, few, none));
   EXPECT_EQ(nullptr, none.block());
   // What is reached depends on the count asked for, not on the room.
-  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x.handle(), many.handle(), out.handle()));
+  ASSERT_EQ(0, qsRFHS_ApplyPolynomial(x, many, out));
   EXPECT_EQ(platform::has_avx() ? 20 : 8, std::count(out.elements().begin(), out.elements().end(), 3.F));
 }
 
