@@ -2,8 +2,8 @@
 #pragma once
 
 #include <CLI/CLI.hpp>
-#include <optional>
-#include <string>
+
+#include "recording.hpp"
 
 namespace tool {
 
@@ -17,7 +17,9 @@ CLI::Validator number_where(const char *what, Holds holds) {
           ""};
 }
 
-/// --rate and --format, which describe raw files and override metadata.
-void add_recording_options(CLI::App &app, std::optional<double> &rate, std::optional<std::string> &format);
+CLI::Validator positive_number();
+
+/// The options for rate and format, which describe raw files and override metadata.
+void add_recording_options(CLI::App &app, recording_options &options);
 
 }  // namespace tool

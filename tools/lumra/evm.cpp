@@ -168,7 +168,7 @@ void add_evm(CLI::App &program) {
       ->check(CLI::Range(std::uint64_t{1}, std::uint64_t{1} << 62));
   app->add_option("--csv", command->csv, "Write the errors of every sample")->option_text("FILE");
   app->add_option("--plot", command->plot, "Draw the constellation")->option_text("FILE.png|.svg");
-  add_recording_options(*app, command->measured_options.rate, command->measured_options.format);
+  add_recording_options(*app, command->measured_options);
   app->add_option("--capture", command->measured_options.capture,
                   "Use this capture of MEASURED, a SigMF recording, alone, from 0")
       ->option_text("INDEX");

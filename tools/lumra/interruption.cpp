@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <atomic>
 #include <climits>
-#include <csignal>
 #include <cstring>
 
 #include "failure.hpp"
@@ -33,14 +32,20 @@ void clean_up(int number) {
   (void)::raise(number);
 }
 
+sigset_t all_signals() noexcept {
+  sigset_t all;
+  sigemptyset(&all);
+  for (const int number : signals) sigaddset(&all, number);
+  return all;
+}
+
 }  // namespace
 
 void install_interruption() {
   struct sigaction action = {};
   action.sa_handler = clean_up;
   action.sa_flags = static_cast<int>(SA_RESETHAND);
-  sigemptyset(&action.sa_mask);
-  for (const int number : signals) sigaddset(&action.sa_mask, number);
+  action.sa_mask = all_signals();
   for (const int number : signals) {
     struct sigaction before = {};
     // A signal that whoever started the program ignores (nohup, a job in the background) stays ignored.
@@ -63,6 +68,15 @@ unfinished_file::unfinished_file(const std::filesystem::path &file) : slot_(-1) 
 unfinished_file::~unfinished_file() {
   slots[slot_].armed = false;
   slots[slot_].taken = false;
+}
+
+held_signals::held_signals() noexcept {
+  const sigset_t all = all_signals();
+  (void)::pthread_sigmask(SIG_BLOCK, &all, &before_);
+}
+
+held_signals::~held_signals() {
+  (void)::pthread_sigmask(SIG_SETMASK, &before_, nullptr);
 }
 
 void set_bar_shown(bool shown) noexcept {

@@ -4,6 +4,7 @@
 // effect at once, whatever is being computed.
 #pragma once
 
+#include <csignal>
 #include <filesystem>
 
 namespace tool {
@@ -21,6 +22,18 @@ class unfinished_file {
 
  private:
   int slot_;
+};
+
+/// The signals wait while this lives, and take effect then.
+class held_signals {
+ public:
+  held_signals() noexcept;
+  held_signals(const held_signals &) = delete;
+  held_signals &operator=(const held_signals &) = delete;
+  ~held_signals();
+
+ private:
+  sigset_t before_ = {};
 };
 
 /// Whether a progress bar stands on the terminal, which the handler then ends with a new line.

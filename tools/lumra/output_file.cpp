@@ -55,8 +55,39 @@ void output_file::write(const char *data, std::size_t size) {
 }
 
 void output_file::commit() {
+  finish();
+  take_place();
+}
+
+void output_file::commit_with(output_file &other) {
+  finish();
+  other.finish();
+  const held_signals until_both_are_there;
+  const bool in_place = temporary_.empty();
+  const bool replaces = !in_place && fs::is_regular_file(fs::symlink_status(target_));
+  fs::path former = target_;
+  former += fmt::format(".{}.old", ::getpid());
+  if (replaces && std::rename(target_.c_str(), former.c_str()) != 0) fail(target_, errno);
+  try {
+    take_place();
+    other.take_place();
+  } catch (const failure &) {
+    if (replaces)
+      (void)std::rename(former.c_str(), target_.c_str());
+    else if (!in_place && temporary_.empty())
+      ::unlink(target_.c_str());
+    throw;
+  }
+  if (replaces) ::unlink(former.c_str());
+}
+
+/// Everything is in the file, and it is closed.
+void output_file::finish() {
   if (std::fflush(file_.get()) != 0) fail(target_, errno);
   if (std::fclose(file_.release()) != 0) fail(target_, errno);
+}
+
+void output_file::take_place() {
   if (temporary_.empty()) return;
   if (std::rename(temporary_.c_str(), target_.c_str()) != 0) fail(target_, errno);
   temporary_.clear();

@@ -34,14 +34,19 @@ class output_file {
 
   /// Throws failure when anything could not be written.
   void commit();
+  /// Commits two results that belong together: both appear, or neither, and then what stood in their places stays.
+  void commit_with(output_file &other);
 
  private:
   struct closer {
     void operator()(std::FILE *file) const noexcept { (void)std::fclose(file); }
   };
 
+  void finish();
+  void take_place();
+
   std::filesystem::path target_;
-  std::filesystem::path temporary_;  // empty: written in place
+  std::filesystem::path temporary_;  // empty: written in place, or in its place
   std::unique_ptr<unfinished_file> unfinished_;
   std::unique_ptr<std::FILE, closer> file_;
   fmt::memory_buffer text_;

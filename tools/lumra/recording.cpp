@@ -24,7 +24,8 @@ recording open_raw(const fs::path &path, const recording_options &options) {
   else
     throw failure("{}: sample type unknown; say it with --format ({})", path.string(), known_formats);
   if (options.capture) throw failure("{}: a raw file has no captures; leave out --capture", path.string());
-  if (!options.rate) throw failure("{}: a raw file has no sample rate; say it with --rate HZ", path.string());
+  if (!options.rate)
+    throw failure("{}: a raw file has no sample rate; say it with {} HZ", path.string(), options.rate_option);
   result.rate = *options.rate;
   const std::size_t width = result.format.bytes();
   if (size % width != 0)
@@ -67,7 +68,8 @@ recording open_recording(const fs::path &path, const recording_options &options)
     fs::path meta = path;
     meta.replace_extension(".sigmf-meta");
     if (fs::exists(meta)) return open_sigmf(meta, options);
-    if (!options.format) throw failure("{}: no {} beside it; say --format and --rate", path.string(), meta.string());
+    if (!options.format)
+      throw failure("{}: no {} beside it; say --format and {}", path.string(), meta.string(), options.rate_option);
     return open_raw(path, options);
   }
   fs::path meta = path;

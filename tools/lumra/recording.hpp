@@ -3,6 +3,8 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <memory>
+#include <nlohmann/json_fwd.hpp>
 #include <optional>
 #include <string>
 #include <vector>
@@ -25,13 +27,16 @@ struct recording {
   double rate = 0;                  // samples per second, positive
   std::optional<double> frequency;  // centre in hertz, where known
   std::vector<extent> extents;
-  std::vector<std::filesystem::path> files;  // all that is read; outputs must not be among them
+  std::shared_ptr<const nlohmann::json> metadata;  // all that SigMF says; none for a raw file
+  std::uint64_t first_index = 0;                   // the metadata's index of the first sample
+  std::vector<std::filesystem::path> files;        // all that is read; outputs must not be among them
 
   [[nodiscard]] std::uint64_t samples() const noexcept;
 };
 
 /// What the command line says over the recording's own metadata.
 struct recording_options {
+  std::string rate_option = "--rate";  // its name, for messages
   std::optional<double> rate;
   std::optional<std::string> format;
   std::optional<std::uint64_t> capture;  // index of the one capture to use

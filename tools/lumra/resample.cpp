@@ -4,11 +4,13 @@
 #include <cmath>
 #include <lumra/lumra.hpp>
 #include <memory>
+#include <nlohmann/json.hpp>
 
 #include "arguments.hpp"
 #include "commands.hpp"
 #include "failure.hpp"
 #include "recording.hpp"
+#include "resampled_metadata.hpp"
 #include "resampling.hpp"
 #include "sigmf_writer.hpp"
 #include "summary.hpp"
@@ -48,7 +50,7 @@ float ratio_of(const recording &source, double rate) {
 }
 
 std::string length_text(std::uint64_t samples, double rate) {
-  return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, exact_text(rate));
+  return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, short_text(rate));
 }
 
 void print_summary(const resample_command &command, const recording &source, const resampling_filter &filter,
@@ -60,36 +62,21 @@ void print_summary(const resample_command &command, const recording &source, con
   summary_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
   summary_line("Ratio", fmt::format("{:.17g} input samples per output sample", ratio));
   if (rate != command.rate)
-    summary_line("Note", fmt::format("the ratio is rounded to single precision: the rate is {:.17g} Hz, {:+.2g} of the "
-                                     "one asked for, and so in the metadata",
-                                     rate, rate / command.rate - 1));
+    summary_line("Note", fmt::format("the ratio is rounded to single precision: the new rate, as in the metadata, is "
+                                     "{:.17g} Hz ({:+.2g} ppm)",
+                                     rate, 1e6 * (rate / command.rate - 1)));
   summary_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
                                         filter.coefficients.size(), filter.phases));
   summary_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
-                                        exact_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
+                                        short_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
   summary_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
-                                        exact_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
+                                        short_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
   summary_line("Data", base + ".sigmf-data");
   summary_line("Metadata", base + ".sigmf-meta");
 }
 
-/// Here the option that the input's rate is given with has another name than elsewhere.
-recording open_input(const resample_command &command) {
-  try {
-    return open_recording(command.path, command.options);
-  } catch (const failure &reason) {
-    std::string text = reason.what();
-    constexpr std::string_view elsewhere = "--rate";
-    // At the end, so that no name of a file is taken for it.
-    const std::size_t at = text.rfind(elsewhere);
-    if (at != std::string::npos && text.size() - at <= elsewhere.size() + std::string_view(" HZ").size())
-      text.replace(at, elsewhere.size(), "--input-rate");
-    throw failure("{}", text);
-  }
-}
-
 void run(const resample_command &command) {
-  const recording source = open_input(command);
+  const recording source = open_recording(command.path, command.options);
   if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
   const float ratio = ratio_of(source, command.rate);
   const auto exact = static_cast<double>(ratio);
@@ -99,11 +86,13 @@ void run(const resample_command &command) {
   const fs::path base = output_base(command, source);
   sigmf_writer output(base, source.files);
   const resampling_filter filter = design_resampling_filter();
-  const std::uint64_t written =
-      resample(source, filter, ratio, command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
-  output.commit(rate, source.frequency,
-                fmt::format("{}, resampled from {:.17g} Hz to {:.17g} Hz by lumra {}", source.name, source.rate, rate,
-                            lumra::library().version_text));
+  const std::uint64_t written = resampled_count(source, ratio);
+  const nlohmann::json metadata =
+      resampled_metadata(source, exact, rate, written,
+                         fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate), short_text(rate),
+                                     lumra::library().version_text));
+  resample(source, filter, ratio, command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
+  output.commit(metadata);
   print_summary(command, source, filter, exact, rate, written, base.string());
 }
 
@@ -114,20 +103,16 @@ void add_resample(CLI::App &program) {
   CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
   app->footer(
       "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass\n"
-      "band is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower "
-      "rate\n"
-      "is rejected. Samples are written as cf32_le.");
+      "band is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower\n"
+      "rate is rejected. Samples are written as cf32_le. Metadata are carried over where they are still true.");
   app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
       ->required();
-  add_recording_options(*app, command->options.rate, command->options.format);
-  app->remove_option(app->get_option("--rate"));  // here it is the new one
-  const auto positive =
-      number_where("a positive number", [](double value) { return value > 0 && std::isfinite(value); });
-  app->add_option("--rate", command->rate, "The new sample rate")->option_text("HZ")->required()->check(positive);
-  app->add_option("--input-rate", command->options.rate,
-                  "Sample rate of RECORDING; needed for raw files, overrides the metadata")
+  app->add_option("--rate", command->rate, "The new sample rate")
       ->option_text("HZ")
-      ->check(positive);
+      ->required()
+      ->check(positive_number());
+  command->options.rate_option = "--input-rate";
+  add_recording_options(*app, command->options);
   app->add_option("--output", command->output,
                   "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
       ->option_text("BASE");

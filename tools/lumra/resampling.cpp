@@ -55,12 +55,16 @@ resampling_filter design_resampling_filter() {
   return filter;
 }
 
-std::uint64_t resample(const recording &source, const resampling_filter &filter, float ratio, std::uint64_t block,
-                       const std::function<void(std::span<const sample>)> &write) {
-  const std::uint64_t samples = source.samples();
+std::uint64_t resampled_count(const recording &source, float ratio) {
   // Exact up to 2^39 outputs: the ratio has 24 bits, a quotient that is not whole is 2^-24 or more away from it.
-  const auto wanted =
-      static_cast<std::uint64_t>(std::ceil(static_cast<long double>(samples) / static_cast<long double>(ratio)));
+  return static_cast<std::uint64_t>(
+      std::ceil(static_cast<long double>(source.samples()) / static_cast<long double>(ratio)));
+}
+
+void resample(const recording &source, const resampling_filter &filter, float ratio, std::uint64_t block,
+              const std::function<void(std::span<const sample>)> &write) {
+  const std::uint64_t samples = source.samples();
+  const std::uint64_t wanted = resampled_count(source, ratio);
   const auto fitting = static_cast<std::uint64_t>(static_cast<double>(outputs_per_call) * static_cast<double>(ratio));
   const std::uint64_t per_call = std::clamp<std::uint64_t>(fitting, 1, block);
 
@@ -90,7 +94,6 @@ std::uint64_t resample(const recording &source, const resampling_filter &filter,
     written += out.size();
     bar.update(written, wanted);
   }
-  return written;
 }
 
 }  // namespace tool

@@ -26,9 +26,12 @@ resampling_filter design_resampling_filter();
 /// Of the factor between the rates, up or down; the filter of this one takes 100 MB.
 inline constexpr float largest_ratio = 65536;
 
-/// Calls write with outputs 0 .. ceil(samples / ratio) - 1, in order; output k lies at input sample k * ratio, and the
-/// recording has zeros around it. Returns their number. Throws failure, also for outputs beyond single precision.
-std::uint64_t resample(const recording &source, const resampling_filter &filter, float ratio, std::uint64_t block,
-                       const std::function<void(std::span<const std::complex<float>>)> &write);
+/// How many samples result: output k lies at input sample k * ratio, as far as the recording reaches.
+std::uint64_t resampled_count(const recording &source, float ratio);
+
+/// Calls write with the outputs in order; the recording has zeros around it. Throws failure, also for outputs beyond
+/// single precision.
+void resample(const recording &source, const resampling_filter &filter, float ratio, std::uint64_t block,
+              const std::function<void(std::span<const std::complex<float>>)> &write);
 
 }  // namespace tool

@@ -4,10 +4,10 @@
 
 #include <cmath>
 #include <fstream>
-#include <limits>
 #include <nlohmann/json.hpp>
 
 #include "failure.hpp"
+#include "metadata_fields.hpp"
 
 namespace tool {
 namespace {
@@ -20,48 +20,6 @@ struct capture {
   std::uint64_t header_bytes = 0;
   std::optional<double> frequency;
   std::optional<std::uint64_t> global_index;
-};
-
-/// The fields of one JSON object, with the file's name for messages.
-class fields {
- public:
-  fields(const json &object, std::string where) : object_(object), where_(std::move(where)) {
-    if (!object.is_object()) throw failure("{} is missing or not an object", where_);
-  }
-
-  [[nodiscard]] std::optional<std::string> text(const char *key) const {
-    const json *value = find(key);
-    if (value && !value->is_string()) throw failure("{}: {} must be a text", where_, key);
-    return value ? std::optional(value->get<std::string>()) : std::nullopt;
-  }
-  [[nodiscard]] std::optional<double> number(const char *key) const {
-    const json *value = find(key);
-    if (value && !value->is_number()) throw failure("{}: {} must be a number", where_, key);
-    return value ? std::optional(value->get<double>()) : std::nullopt;
-  }
-  /// Counts are limited so that sums and products of a few cannot overflow.
-  [[nodiscard]] std::optional<std::uint64_t> count(const char *key) const {
-    const json *value = find(key);
-    if (!value) return std::nullopt;
-    const std::uint64_t largest = std::uint64_t{1} << 52;
-    if (!value->is_number_unsigned() || value->get<std::uint64_t>() > largest)
-      throw failure("{}: {} must be a whole number from 0 to 2^52", where_, key);
-    return value->get<std::uint64_t>();
-  }
-  [[nodiscard]] bool is_true(const char *key) const {
-    const json *value = find(key);
-    return value && value->is_boolean() && value->get<bool>();
-  }
-  [[nodiscard]] const std::string &where() const noexcept { return where_; }
-
- private:
-  [[nodiscard]] const json *find(const char *key) const {
-    const auto found = object_.find(key);
-    return found == object_.end() || found->is_null() ? nullptr : &*found;
-  }
-
-  const json &object_;
-  std::string where_;
 };
 
 json parse(const fs::path &meta) {
@@ -146,12 +104,14 @@ std::vector<extent> locate(const std::vector<capture> &captures, std::uint64_t f
 }  // namespace
 
 recording open_sigmf(const fs::path &meta, const recording_options &options) {
-  const json root = parse(meta);
+  const auto metadata = std::make_shared<const json>(parse(meta));
+  const json &root = *metadata;
   if (!root.is_object() || !root.contains("global")) throw failure("{}: no SigMF metadata (no global)", meta.string());
   const fields global(root["global"], meta.string() + ": global");
 
   recording result;
   result.name = meta.stem().string();
+  result.metadata = metadata;
   if (global.is_true("core:metadata_only"))
     throw failure("{}: holds metadata only, there are no samples to analyse", meta.string());
   if (global.count("core:num_channels").value_or(1) != 1)
@@ -165,9 +125,9 @@ recording open_sigmf(const fs::path &meta, const recording_options &options) {
     throw failure("{}: {}", meta.string(), reason.what());
   }
   const auto rate = options.rate ? options.rate : global.number("core:sample_rate");
-  if (!rate) throw failure("{}: core:sample_rate is missing; say --rate HZ", meta.string());
+  if (!rate) throw failure("{}: core:sample_rate is missing; say {} HZ", meta.string(), options.rate_option);
   if (!(*rate > 0) || !std::isfinite(*rate))
-    throw failure("{}: core:sample_rate {} is not positive; say --rate HZ", meta.string(), *rate);
+    throw failure("{}: core:sample_rate {} is not positive; say {} HZ", meta.string(), *rate, options.rate_option);
   result.rate = *rate;
 
   result.data = data_file(global, meta);
@@ -189,6 +149,7 @@ recording open_sigmf(const fs::path &meta, const recording_options &options) {
   }
   require_one_signal(captures, meta);
   result.frequency = captures.front().frequency;
+  result.first_index = captures.front().start;
   return result;
 }
 

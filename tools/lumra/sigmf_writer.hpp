@@ -3,9 +3,8 @@
 
 #include <complex>
 #include <filesystem>
-#include <optional>
+#include <nlohmann/json_fwd.hpp>
 #include <span>
-#include <string>
 #include <vector>
 
 #include "output_file.hpp"
@@ -19,8 +18,8 @@ class sigmf_writer {
   sigmf_writer(const std::filesystem::path &base, const std::vector<std::filesystem::path> &inputs);
 
   void write(std::span<const std::complex<float>> samples);
-  /// The text may hold anything; what is not UTF-8 is replaced.
-  void commit(double rate, std::optional<double> frequency, const std::string &description);
+  /// Texts may hold anything; what is not UTF-8 is replaced.
+  void commit(const nlohmann::json &metadata);
 
  private:
   output_file data_, meta_;

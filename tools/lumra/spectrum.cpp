@@ -131,7 +131,7 @@ void add_spectrum(CLI::App &program) {
       ->check(number_where("at least 0 and below 100", [](double value) { return value >= 0 && value < 100; }));
   app->add_option("--csv", command->csv, "Write frequency and level of every bin")->option_text("FILE");
   app->add_option("--plot", command->plot, "Draw the spectrum")->option_text("FILE.png|.svg");
-  add_recording_options(*app, command->options.rate, command->options.format);
+  add_recording_options(*app, command->options);
   app->add_option("--capture", command->options.capture, "Use this capture of a SigMF recording alone, from 0")
       ->option_text("INDEX");
   // For tests: how much is read at a time must not change the result.

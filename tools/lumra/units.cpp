@@ -37,4 +37,9 @@ std::string exact_text(double hertz) {
   return fmt::format("{:.12g} {}", hertz / unit.hertz, unit.name);
 }
 
+std::string short_text(double hertz) {
+  const frequency_unit unit = unit_for(hertz);
+  return fmt::format("{:.6g} {}", hertz / unit.hertz, unit.name);
+}
+
 }  // namespace tool

@@ -22,4 +22,7 @@ std::string offset_text(double hertz, double resolution, const frequency_unit &u
 /// Shortest exact text in its own unit: "10 MHz".
 std::string exact_text(double hertz);
 
+/// The same to six digits.
+std::string short_text(double hertz);
+
 }  // namespace tool
