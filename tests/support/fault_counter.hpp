@@ -62,14 +62,17 @@ int fail_each(fault_counter &kind, Work work, Check check) {
 /// Of what is made while it lives, nothing is left in the end.
 class nothing_left {
  public:
-  explicit nothing_left(const fault_counter &kind) : kind_(kind), before_(kind.live) {}
+  explicit nothing_left(const fault_counter &kind) : kind_(kind) {
+    { SCOPED_TRACE("what the framework keeps of the first one"); }
+    before_ = kind.live;
+  }
   nothing_left(const nothing_left &) = delete;
   nothing_left &operator=(const nothing_left &) = delete;
   ~nothing_left() { EXPECT_EQ(before_, kind_.live); }
 
  private:
   const fault_counter &kind_;
-  long before_;
+  long before_ = 0;
 };
 
 }  // namespace tests
