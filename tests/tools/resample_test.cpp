@@ -1,52 +1,25 @@
 // lumra resample, from files to files. SPDX-License-Identifier: MIT
-#include <algorithm>
-#include <chrono>
-#include <cmath>
-#include <complex>
 #include <cstring>
-#include <numbers>
-#include <random>
-#include <thread>
+#include <lumra/lumra.hpp>
 
 #include "tools/program.hpp"
 
 namespace {
 
-using tests::outcome;
-using sample = std::complex<float>;
-using samples = std::vector<sample>;
-
-/// amplitude * exp(j 2 pi frequency n), frequency in cycles per sample.
-samples tone(std::size_t count, double amplitude, double frequency) {
-  samples x(count);
-  for (std::size_t n = 0; n < count; ++n)
-    x[n] = std::complex<float>(
-        std::polar(amplitude, 2 * std::numbers::pi * std::fmod(frequency * static_cast<double>(n), 1)));
-  return x;
-}
-
-samples noise(std::size_t count) {
-  std::mt19937 random(1);
-  std::normal_distribution<float> value(0, 0.1F);
-  samples x(count);
-  for (sample &s : x) s = {value(random), value(random)};
-  return x;
-}
-
-std::string bytes_of(const samples &x) {
-  return {reinterpret_cast<const char *>(x.data()), x.size() * sizeof(sample)};
-}
+using tests::bytes_of;
+using tests::noise;
+using tests::numbers;
+using tests::sample;
+using tests::samples;
+using tests::tone;
 
 class Resample : public tests::ProgramTest {
  protected:
-  /// Runs `resample` on x as a raw file, which must succeed, and gives the samples written.
+  /// Runs `resample` on x as a raw file and gives the samples written.
   [[nodiscard]] samples resampled(const samples &x, const std::string &from, const std::string &to,
-                                  const std::vector<std::string> &more = {}) const {
+                                  const std::string &more = "") const {
     write("x.cf32", bytes_of(x));
-    std::vector<std::string> arguments{"resample", "x.cf32", "--input-rate", from, "--rate", to, "--output", "y"};
-    arguments.insert(arguments.end(), more.begin(), more.end());
-    const outcome result = run(arguments);
-    EXPECT_EQ(0, result.exit_code) << result.err;
+    succeed("resample x.cf32 --output y --input-rate " + from + " --rate " + to + more);
     const std::string bytes = read("y.sigmf-data");
     samples y(bytes.size() / sizeof(sample));
     std::memcpy(y.data(), bytes.data(), y.size() * sizeof(sample));
@@ -96,12 +69,11 @@ TEST_F(Resample, TonesOutsideTheNewBandAreRejected) {
 
 TEST_F(Resample, SpectrumOfTheResultShowsTheToneWhereItWas) {
   write("x.sigmf-data", bytes_of(tone(20000, 0.5, 0.1)));
-  write("x.sigmf-meta", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": 1e6},
-                            "captures": [{"core:sample_start": 0, "core:frequency": 2.4e9}]})");
-  ASSERT_EQ(0, run({"resample", "x", "--rate", "400e3"}).exit_code);
-  const auto rows = spectrum({"x-400000Hz", "--fft", "400"});
+  write("x.sigmf-meta", tests::metadata("", R"({"core:frequency": 2.4e9})"));
+  succeed("resample x --rate 400");
+  const auto rows = spectrum("x-400Hz --fft 400");
   const auto peak = std::max_element(rows.begin(), rows.end(), [](auto &a, auto &b) { return a.level < b.level; });
-  EXPECT_NEAR(2.4e9 + 1e5, peak->frequency, 1e-3);
+  EXPECT_NEAR(2.4e9 + 100, peak->frequency, 1e-3);
   EXPECT_NEAR(-6.0206, peak->level, 0.01);
 }
 
@@ -109,111 +81,99 @@ TEST_F(Resample, BlocksChangeNoByte) {
   const samples x = noise(3001);
   for (const char *to : {"1234567.8", "1000000", "31234.5"}) {
     const samples whole = resampled(x, "1e6", to);
-    for (const char *block : {"1", "7", "1000", "3001"}) EXPECT_EQ(whole, resampled(x, "1e6", to, {"--block", block}));
+    for (const char *block : {" --block 1", " --block 7", " --block 1000", " --block 3001"})
+      EXPECT_EQ(whole, resampled(x, "1e6", to, block));
   }
   // Whatever the recording's length, the output reaches as far.
   for (const std::size_t count : {1U, 2U, 99U, 100U, 101U}) {
-    const auto expected = static_cast<std::size_t>(std::ceil(static_cast<double>(count) / 10));
-    EXPECT_EQ(expected, resampled(noise(count), "1e6", "1e5").size());
+    EXPECT_EQ((count + 9) / 10, resampled(noise(count), "1e6", "1e5").size());
     EXPECT_EQ(4 * count, resampled(noise(count), "1e6", "4e6").size());
   }
 }
 
-TEST_F(Resample, SaysTheRateThatIsWritten) {
+TEST_F(Resample, SaysWhatIsWritten) {
   write("a.b.sigmf-data", bytes_of(noise(4410)));
-  const std::string meta = R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": 44100},
-                               "captures": [{"core:sample_start": 0, "core:frequency": 433920000.5}]})";
+  const std::string meta = tests::metadata();
   write("a.b.sigmf-meta", meta);
-  const outcome rounded = run({"resample", "a.b.sigmf-meta", "--rate", "48000"});
-  EXPECT_EQ(0, rounded.exit_code) << rounded.err;
-  EXPECT_NE(std::string::npos, rounded.out.find("rounded to single precision")) << rounded.out;
-  const std::string written = read("a.b-48000Hz.sigmf-meta");
-  const auto value = [&](const std::string &key) {
-    const std::size_t at = written.find('"' + key + "\": ");
-    return at == std::string::npos ? -1 : std::stod(written.substr(at + key.size() + 4));
-  };
-  EXPECT_EQ(44100 / static_cast<double>(44100.0F / 48000.0F), value("core:sample_rate"));
-  EXPECT_EQ(433920000.5, value("core:frequency"));
-  EXPECT_NE(std::string::npos, written.find("cf32_le"));
+  const auto rounded = succeed("resample a.b.sigmf-meta --input-rate 44100 --rate 48000");
+  const double rate = 44100 / static_cast<double>(44100.0F / 48000.0F);
+  EXPECT_EQ(rate, numbers(rounded, "Note").at(0)) << rounded.out;
+  const std::string written = read("a.b-48000Hz.sigmf-meta"), key = "\"core:sample_rate\": ";
+  EXPECT_EQ(rate, std::stod(written.substr(written.find(key) + key.size())));
   EXPECT_EQ(meta, read("a.b.sigmf-meta"));
 
-  const outcome exact = run({"resample", "a.b", "--rate", "88200", "--output", "c.sigmf-data"});
-  EXPECT_EQ(std::string::npos, exact.out.find("rounded")) << exact.out;
-  EXPECT_NE(std::string::npos, exact.out.find("8820 (0.1 s) at 88.2 kHz")) << exact.out;
-  EXPECT_NE(std::string::npos, exact.out.find("up to 19.845 kHz")) << exact.out;
-  const std::size_t rejection = exact.out.find("rejection ");
-  ASSERT_NE(std::string::npos, rejection);
-  EXPECT_GE(std::stod(exact.out.substr(rejection + 10)), 90);
+  const auto exact = succeed("resample a.b --input-rate 44100 --rate 88200 --output c.sigmf-data");
+  EXPECT_TRUE(numbers(exact, "Note").empty()) << exact.out;
+  EXPECT_EQ((std::vector{8820.0, 0.1, 88.2}), numbers(exact, "Output samples"));
+  EXPECT_EQ(19.845, numbers(exact, "Pass band").at(0));
+  EXPECT_GE(numbers(exact, "Stop band").at(1), 90);
   const std::vector<std::string> names{"a.b-48000Hz.sigmf-data", "a.b-48000Hz.sigmf-meta", "a.b.sigmf-data",
                                        "a.b.sigmf-meta",         "c.sigmf-data",           "c.sigmf-meta"};
   EXPECT_EQ(names, files());
 }
 
-TEST_F(Resample, RefusesBadInputInOneLine) {
-  write("x.cf32", bytes_of(noise(100)));
-  write("empty.cf32", "");
-  write("nan.cf32", std::string(800, '\xFF'));
-  write("large.cf32", bytes_of(samples(4000, 3.4e38F)));
-  write("x.sigmf-data", bytes_of(noise(100)));
-  write("x.sigmf-meta", R"({"global": {"core:datatype": "cf32_le"}})");
-  std::filesystem::create_symlink("/dev/full", folder_ / "full.sigmf-data");
-  std::filesystem::create_symlink("/dev/full", folder_ / "fullmeta.sigmf-meta");
-  const auto before = files();
-  const struct {
-    int code;
-    const char *says;
-    std::vector<std::string> arguments;
-  } refusals[] = {
-      {1, "No such file", {"none.cf32", "--rate", "1"}},
-      {1, "--input-rate HZ", {"x.cf32", "--rate", "1"}},
-      {1, "--input-rate HZ", {"x", "--rate", "1"}},
-      {1, "no samples", {"empty.cf32", "--rate", "1", "--input-rate", "1"}},
-      {1, "sample 0 is not", {"nan.cf32", "--rate", "1", "--input-rate", "1"}},
-      {1, "too large", {"large.cf32", "--rate", "1.5", "--input-rate", "1"}},
-      {1, "beyond a factor", {"x.cf32", "--rate", "1", "--input-rate", "65537"}},
-      {1, "beyond a factor", {"x.cf32", "--rate", "1e300", "--input-rate", "1e-300"}},
-      {1, "part of the recording", {"x", "--rate", "1", "--input-rate", "2", "--output", "x"}},
-      {1, "part of the recording", {"x.sigmf-data", "--rate", "1", "--input-rate", "2", "--output", "./x.sigmf-meta"}},
-      {1, "is a folder", {"x.cf32", "--rate", "1", "--input-rate", "2", "--output", "./"}},
-      {1, "No such file", {"x.cf32", "--rate", "1", "--input-rate", "2", "--output", "none/y"}},
-      {1, "No space left", {"x.cf32", "--rate", "1", "--input-rate", "2", "--output", "full"}},
-      {1, "No space left", {"x.cf32", "--rate", "1", "--input-rate", "2", "--output", "fullmeta"}},
-      {2, "--rate", {"x.cf32", "--input-rate", "1"}},
-      {2, "--rate", {"x.cf32", "--rate", "0"}},
-      {2, "--input-rate", {"x.cf32", "--rate", "1", "--input-rate", "nan"}},
-      {2, "RECORDING", {"--rate", "1"}},
+TEST_F(Resample, CarriesOverTheMetadataThatAreStillTrue) {
+  // The metadata count from 100; five samples belong to no capture, the 1000 behind them count.
+  write("x.sigmf-data", std::string(5 * sizeof(sample), '\0') + bytes_of(noise(1000)) + "trailing");
+  write(
+      "x.sigmf-meta",
+      tests::metadata(R"(, "core:offset": 100, "core:trailing_bytes": 8, "core:sha512": "0", "core:author": "A",
+                            "core:hw": "H", "core:description": "D", "core:data_doi": "1", "core:collection": "C")",
+                      R"({"core:sample_start": 105, "core:datetime": "T1", "core:frequency": 5, "core:header_bytes": 0},
+                           {"core:sample_start": 605, "core:datetime": "T2", "core:global_index": 9})",
+                      R"({"core:sample_start": 100, "core:sample_count": 5, "core:label": "ends before"},
+                           {"core:sample_start": 100, "core:sample_count": 10, "core:label": "begins before"},
+                           {"core:sample_start": 205, "core:sample_count": 1, "core:label": "short"},
+                           {"core:sample_start": 207, "core:label": "open"},
+                           {"core:sample_start": 208, "core:sample_count": 490, "core:freq_lower_edge": -7},
+                           {"core:sample_start": 1104, "core:sample_count": 1000, "core:label": "ends behind"},
+                           {"core:sample_start": 1105, "core:sample_count": 1, "core:label": "behind"})"));
+  const auto written = [&](const std::string &options) {
+    succeed("resample x --rate 400 --output y " + options);
+    std::string text = read("y.sigmf-meta");
+    text.erase(std::remove_if(text.begin(), text.end(), [](char c) { return c == ' ' || c == '\n'; }), text.end());
+    return text;
   };
-  for (const auto &refusal : refusals) {
-    std::vector<std::string> arguments{"resample"};
-    arguments.insert(arguments.end(), refusal.arguments.begin(), refusal.arguments.end());
-    const outcome result = run(arguments);
-    SCOPED_TRACE(result.err);
-    EXPECT_EQ(refusal.code, result.exit_code);
-    EXPECT_NE(std::string::npos, result.err.find(refusal.says)) << refusal.says;
-    EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n'));
-    EXPECT_TRUE(result.err.starts_with("lumra: "));
-    EXPECT_EQ("", result.out);
-    EXPECT_EQ(before, files());
-  }
+  const std::string global =
+      R"("global":{"core:author":"A","core:datatype":"cf32_le","core:description":"D,resampledfrom1kHzto400Hzbylumra)" +
+      lumra::library().version_text + R"(","core:hw":"H","core:sample_rate":400.0,"core:version":"1.2.0"}})";
+  EXPECT_EQ(R"({"annotations":[{"core:label":"beginsbefore","core:sample_count":2,"core:sample_start":0},)"
+            R"({"core:label":"short","core:sample_count":1,"core:sample_start":40},)"
+            R"({"core:label":"open","core:sample_start":41},)"
+            R"({"core:freq_lower_edge":-7,"core:sample_count":196,"core:sample_start":41},)"
+            R"({"core:label":"endsbehind","core:sample_count":1,"core:sample_start":399}],)"
+            R"("captures":[{"core:datetime":"T1","core:frequency":5,"core:sample_start":0},)"
+            R"({"core:datetime":"T2","core:sample_start":200}],)" +
+                global,
+            written(""));
+  EXPECT_EQ(R"({"annotations":[{"core:freq_lower_edge":-7,"core:sample_count":37,"core:sample_start":0},)"
+            R"({"core:label":"endsbehind","core:sample_count":1,"core:sample_start":199}],)"
+            R"("captures":[{"core:datetime":"T2","core:sample_start":0}],)" +
+                global,
+            written("--capture 1"));
 }
 
-TEST_F(Resample, InterruptionLeavesNothing) {
-  write("long.ci8", "");
-  std::filesystem::resize_file(folder_ / "long.ci8", std::uintmax_t{1} << 36);  // a hole: takes no room
-  const pid_t child = start({"resample", "long.ci8", "--input-rate", "1e6", "--rate", "1e3"});
-  const auto begin = std::chrono::steady_clock::now();
-  const auto parts = [&] {
-    const auto names = files();
-    return std::count_if(names.begin(), names.end(), [](const auto &name) { return name.ends_with(".part"); });
-  };
-  while (parts() < 2 && std::chrono::steady_clock::now() - begin < std::chrono::seconds(20))
-    std::this_thread::sleep_for(std::chrono::milliseconds(5));
-  EXPECT_EQ(2, parts());
-  ASSERT_EQ(0, ::kill(child, SIGINT));
-  const outcome result = finish(child);
-  EXPECT_EQ(SIGINT, result.signal);
-  EXPECT_EQ("", result.out + result.err);
-  EXPECT_EQ(std::vector<std::string>{"long.ci8"}, files());
+TEST_F(Resample, BothFilesAppearOrNeither) {
+  write_hole("x.ci8", 20);
+  const std::string line = "resample x.ci8 --input-rate 1000 --rate 1 --output y";
+  for (const std::string former : {"", "from before"}) {
+    if (!former.empty()) write("y.sigmf-data", former);
+    const auto before = files();
+    const pid_t child = start_outputs(line, 2);
+    ASSERT_EQ(0, ::kill(child, SIGSTOP));
+    std::filesystem::create_directory(folder_ / "y.sigmf-meta");  // in the way of the second file alone
+    ASSERT_EQ(0, ::kill(child, SIGCONT));
+    const auto result = finish(child);
+    EXPECT_EQ(1, result.exit_code) << result.out;
+    EXPECT_EQ("lumra: cannot write y.sigmf-meta: Is a directory\n", result.err);
+    std::filesystem::remove(folder_ / "y.sigmf-meta");
+    EXPECT_EQ(before, files());
+    EXPECT_EQ(former, read("y.sigmf-data"));
+  }
+  write("x.ci8", "\x01\x01");
+  succeed(line);
+  EXPECT_EQ(sizeof(sample), read("y.sigmf-data").size());
+  EXPECT_EQ((std::vector<std::string>{"x.ci8", "y.sigmf-data", "y.sigmf-meta"}), files());
 }
 
 }  // namespace

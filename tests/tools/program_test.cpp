@@ -1,0 +1,190 @@
+// What the subcommands of lumra have in common: refusals in one line, interruption. SPDX-License-Identifier: MIT
+#include <lumra/lumra.hpp>
+
+#include "tools/program.hpp"
+
+namespace {
+
+using tests::bytes_of;
+using tests::metadata;
+using tests::noise;
+using tests::samples;
+
+using Program = tests::ProgramTest;
+
+TEST_F(Program, RefusesBadInputInOneLine) {
+  const std::string bytes = bytes_of(noise(100));
+  const std::vector huge(32, 1e300);
+  for (const auto &[name, content] : std::initializer_list<std::pair<const char *, std::string>>{
+           {"x.cf32", bytes},
+           {"x.bin", bytes},
+           {"cut.cf32", bytes.substr(0, 99)},
+           {"short.cf32", bytes.substr(80)},
+           {"empty.cf32", ""},
+           {"zero.cf32", bytes_of(samples(100))},
+           {"nan.cf32", bytes.substr(0, 640) + std::string(160, '\xFF')},
+           {"huge.cf64", std::string(reinterpret_cast<const char *>(huge.data()), 256)},
+           {"large.cf32", bytes_of(samples(100, 1e30F))},
+           {"full.cf32", bytes_of(samples(4000, 3.4e38F))},
+           {"lone.sigmf-data", bytes},
+           {"alone.sigmf-meta", metadata()}})
+    write(name, content);
+  for (const auto &[name, meta] : std::initializer_list<std::pair<std::string, std::string>>{
+           {"broken", "{\"global\": "},
+           {"list", "[]"},
+           {"overflow", R"({"global": {"core:sample_rate": 1e999}})"},
+           {"norate", R"({"global": {"core:datatype": "cf32_le"}})"},
+           {"notype", R"({"global": {"core:sample_rate": 1}})"},
+           {"real", R"({"global": {"core:datatype": "rf32_le", "core:sample_rate": 1}})"},
+           {"rate", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": "fast"}})"},
+           {"negative", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": -1}})"},
+           {"rate2000", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": 2000}})"},
+           {"rate1000", metadata()},
+           {"channels", metadata(R"(, "core:num_channels": 2)")},
+           {"retuned", metadata("", R"({"core:sample_start": 0, "core:frequency": 1},
+                                       {"core:sample_start": 9, "core:frequency": 2})")},
+           {"gap", metadata("", R"({"core:sample_start": 0, "core:global_index": 0},
+                                   {"core:sample_start": 9, "core:global_index": 10})")},
+           {"beyond", metadata("", R"({"core:sample_start": 101})")},
+           {"order", metadata("", R"({"core:sample_start": 10}, {"core:sample_start": 9})")},
+           {"header", metadata("", R"({"core:header_bytes": -1})")},
+           {"outside", metadata(R"(, "core:dataset": "../x.cf32")")},
+           {"note", metadata("", "", R"({}, {"core:sample_start": -1})")}}) {
+    write(name + ".sigmf-meta", meta);
+    write(name + ".sigmf-data", bytes);
+  }
+  for (const char *name : {"full.png", "full.svg", "full.sigmf-data", "fullmeta.sigmf-meta"})
+    std::filesystem::create_symlink("/dev/full", folder_ / name);
+  const auto before = files();
+
+  const struct {
+    int code;
+    const char *says, *line;
+  } refusals[] = {
+      {1, "No such file", "spectrum none.cf32 --rate 1"},
+      {1, "not a regular file", "spectrum /dev/zero --rate 1 --format ci8"},
+      {1, "--rate HZ", "spectrum x.cf32"},
+      {1, "--format", "spectrum x.bin --rate 1"},
+      {1, "unknown sample type", "spectrum x.bin --rate 1 --format cf16"},
+      {1, "no whole number", "spectrum cut.cf32 --rate 1"},
+      {1, "no samples", "spectrum empty.cf32 --rate 1"},
+      {1, "fewer than N = 128", "spectrum x.cf32 --rate 1 --fft 128"},
+      {1, "sample 80 is not", "spectrum nan.cf32 --rate 1 --fft 16"},
+      {1, "sample 0 is not", "spectrum huge.cf64 --rate 1 --fft 16"},
+      {1, "too large", "spectrum large.cf32 --rate 1"},
+      {1, "not valid JSON", "spectrum broken"},
+      {1, "no global", "spectrum list"},
+      {1, "out of range", "spectrum overflow"},
+      {1, "--rate HZ", "spectrum norate"},
+      {1, "--format", "spectrum notype"},
+      {1, "are real", "spectrum real"},
+      {1, "must be a number", "spectrum rate"},
+      {1, "not positive", "spectrum negative"},
+      {1, "several channels", "spectrum channels"},
+      {1, "--capture", "spectrum retuned"},
+      {1, "no capture 2", "spectrum retuned --capture 2"},
+      {1, "samples are missing", "spectrum gap"},
+      {1, "ends before capture 0", "spectrum beyond"},
+      {1, "core:sample_start", "spectrum order"},
+      {1, "core:header_bytes", "spectrum header"},
+      {1, "same folder", "spectrum outside"},
+      {1, "No such file", "spectrum alone"},
+      {1, "archives", "spectrum x.sigmf"},
+      {1, "part of the recording", "spectrum x.cf32 --rate 1 --csv x.cf32"},
+      {1, "No such file", "spectrum x.cf32 --rate 1 --csv none/x.csv"},
+      {1, "No space left", "spectrum x.cf32 --rate 1 --csv /dev/full"},
+      {1, ".png or .svg", "spectrum x.cf32 --rate 1 --plot x.gif --csv x.csv"},
+      {2, "--fft", "spectrum x.cf32 --rate 1 --fft 15"},
+      {2, "--fft", "spectrum x.cf32 --rate 1 --fft 134217729"},
+      {2, "--overlap", "spectrum x.cf32 --rate 1 --overlap 100"},
+      {2, "--overlap", "spectrum x.cf32 --rate 1 --overlap nan"},
+      {2, "--window", "spectrum x.cf32 --rate 1 --window hann"},
+      {2, "--rate", "spectrum x.cf32 --rate -5"},
+      {2, "RECORDING", "spectrum"},
+      {2, "--colour", "spectrum x.cf32 --colour"},
+      {1, "No such file", "evm x.cf32 none.cf32 --rate 1"},
+      {1, "no samples", "evm empty.cf32 empty.cf32 --rate 1"},
+      {1, "--samples N", "evm x.cf32 short.cf32 --rate 1"},
+      {1, "90 samples are fewer than 91", "evm x.cf32 short.cf32 --rate 1 --samples 91"},
+      {1, "sampled at 1 kHz, rate2000.sigmf-data at 2 kHz", "evm rate1000 rate2000"},
+      {1, "no capture 3", "evm rate1000 rate1000 --capture 3"},
+      {1, "no capture 3", "evm rate1000 rate1000 --reference-capture 3"},
+      {1, "all samples are zero", "evm zero.cf32 x.cf32 --rate 1 --plot x.png --csv x.csv"},
+      {1, "leave out --align", "evm x.cf32 zero.cf32 --rate 1 --align"},
+      {1, "too large", "evm x.cf32 large.cf32 --rate 1"},
+      {1, "part of the recording", "evm x.cf32 zero.cf32 --rate 1 --csv x.cf32"},
+      {1, "part of the recording", "evm x.cf32 zero.cf32 --rate 1 --csv zero.cf32"},
+      {1, ".png or .svg", "evm x.cf32 x.cf32 --rate 1 --plot x.gif --csv x.csv"},
+      {2, "evm --help", "evm"},
+      {2, "MEASURED", "evm x.cf32"},
+      {2, "--samples", "evm x.cf32 x.cf32 --rate 1 --samples 0"},
+      {2, "--rate", "evm x.cf32 x.cf32 --rate nan"},
+      {1, "--input-rate HZ", "resample x.cf32 --rate 1"},
+      {1, "--input-rate HZ", "resample norate --rate 1"},
+      {1, "no samples", "resample empty.cf32 --rate 1 --input-rate 1"},
+      {1, "too large", "resample full.cf32 --rate 1.5 --input-rate 1"},
+      {1, "beyond a factor", "resample x.cf32 --rate 1 --input-rate 65537"},
+      {1, "beyond a factor", "resample x.cf32 --rate 1e300 --input-rate 1e-300"},
+      {1, "part of the recording", "resample norate --rate 1 --input-rate 2 --output norate"},
+      {1, "part of the recording", "resample norate.sigmf-data --rate 1 --input-rate 2 --output ./norate.sigmf-meta"},
+      {1, "is a folder", "resample x.cf32 --rate 1 --input-rate 2 --output ./"},
+      {1, "No such file", "resample x.cf32 --rate 1 --input-rate 2 --output none/y"},
+      {1, "No space left", "resample x.cf32 --rate 1 --input-rate 2 --output full"},
+      {1, "No space left", "resample x.cf32 --rate 1 --input-rate 2 --output fullmeta"},
+      {2, "--rate", "resample x.cf32 --input-rate 1"},
+      {2, "--rate", "resample x.cf32 --rate 0"},
+      {2, "--input-rate", "resample x.cf32 --rate 1 --input-rate nan"},
+      {2, "RECORDING", "resample --rate 1"},
+      {1, "--rate HZ", "spectrum negative"},
+      {1, "say --format and --rate", "spectrum lone.sigmf-data"},
+      {1, "--format and --input-rate", "resample lone.sigmf-data --rate 1"},
+      {1, "--input-rate HZ", "resample negative --rate 1"},
+      {1, "annotation 1: core:sample_start", "resample note --rate 1"},
+      {1, "disk full", "spectrum zero.cf32 --rate 1 --plot full.svg"},
+  };
+  for (const auto &refusal : refusals) {
+    const auto result = run(refusal.line);
+    SCOPED_TRACE(testing::Message() << refusal.line << ": " << result.err);
+    EXPECT_EQ(refusal.code, result.exit_code);
+    EXPECT_NE(std::string::npos, result.err.find(refusal.says)) << refusal.says;
+    EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n'));
+    EXPECT_TRUE(result.err.starts_with("lumra: ") && result.err.ends_with('\n'));
+    EXPECT_EQ("", result.out);
+    EXPECT_EQ(before, files());
+  }
+  EXPECT_EQ(2, run("").exit_code);
+  for (const char *line :
+       {"spectrum --help", "evm rate1000 rate2000 --rate 5", "evm x.cf32 short.cf32 --rate 1 --samples 90"})
+    succeed(line);
+}
+
+TEST_F(Program, InterruptionLeavesNothing) {
+  write_hole("x.ci8", 36);
+  const struct {
+    const char *line;
+    int signal;
+  } cases[] = {{"spectrum x.ci8 --rate 1e6 --csv x.csv --plot x.png", SIGINT},
+               {"spectrum x.ci8 --rate 1e6 --csv x.csv --plot x.png", SIGTERM},
+               {"evm one.ci8 x.ci8 --rate 1 --csv x.csv --plot x.png", SIGINT},
+               {"resample x.ci8 --input-rate 1e6 --rate 1e3", SIGINT}};
+  write("one.ci8", "\x01\x01");
+  std::filesystem::resize_file(folder_ / "one.ci8", std::uintmax_t{1} << 36);
+  const auto before = files();
+  for (const auto &c : cases) {
+    SCOPED_TRACE(c.line);
+    const pid_t child = start_outputs(c.line, 2);
+    ASSERT_EQ(0, ::kill(child, c.signal));
+    const auto result = finish(child);
+    EXPECT_EQ(c.signal, result.signal);
+    EXPECT_EQ("", result.out + result.err);
+    EXPECT_EQ(before, files());
+  }
+}
+
+TEST_F(Program, InfoNamesLibraryPathAndMkl) {
+  const auto result = succeed("info");
+  for (const std::string &part : {lumra::library().version_text, std::string(LUMRA_MKL_VERSION), std::string("AVX")})
+    EXPECT_NE(std::string::npos, result.out.find(part)) << part;
+}
+
+}  // namespace
