@@ -74,7 +74,6 @@ struct subnormal {
   using integer = typename lanes<1, Real>::integers;
 
   static constexpr integer magnitude = std::numeric_limits<integer>::max(), sign = std::numeric_limits<integer>::min();
-  static constexpr int sign_place = 8 * sizeof(integer) - 1;
   static constexpr int exponent = sizeof(Real) == 4 ? -149 : -1074;
   /// Numbers below this many steps are treated so. They leave room in the sum with `rounder`.
   static constexpr integer limit = integer{1} << (sizeof(Real) == 4 ? 23 : 51);
@@ -88,28 +87,30 @@ struct subnormal {
   }
   static doubles steps(reals v) noexcept {
     const auto raw = std::bit_cast<integers>(v);
-    const integers negative = raw >> sign_place;  // all ones below 0
-    return from_integers(((raw & magnitude) ^ negative) - negative);
+    if constexpr (sizeof(Real) == 8) {
+      const doubles shifted = std::bit_cast<doubles>((raw & magnitude) | std::bit_cast<integer>(first_whole));
+      return std::bit_cast<doubles>(std::bit_cast<integers>(shifted - first_whole) | (raw & sign));
+    } else {
+      const integers negative = raw >> 31;  // all ones below 0
+      return lane::template convert<doubles>(((raw & magnitude) ^ negative) - negative);
+    }
   }
   static reals value(doubles steps) noexcept {
-    const integers whole = to_integers(steps), negative = whole >> sign_place;
-    return std::bit_cast<reals>(((whole ^ negative) - negative) | (negative & sign));
+    if constexpr (sizeof(Real) == 8) {
+      const auto raw = std::bit_cast<integers>(steps);
+      const doubles shifted = std::bit_cast<doubles>(raw & magnitude) + first_whole;
+      return std::bit_cast<reals>((std::bit_cast<integers>(shifted) & mantissa) | (raw & sign));
+    } else {
+      const auto whole = lane::template convert<integers>(steps);
+      const integers negative = whole >> 31;
+      return std::bit_cast<reals>(((whole ^ negative) - negative) | (negative & sign));
+    }
   }
 
  private:
-  // Of 64 bits: sums with `rounder` hold whole numbers in their lowest bits.
-  static doubles from_integers(integers v) noexcept {
-    if constexpr (sizeof(Real) == 4)
-      return lane::template convert<doubles>(v);
-    else
-      return std::bit_cast<doubles>(v + std::bit_cast<integer>(rounder)) - rounder;
-  }
-  static integers to_integers(doubles v) noexcept {
-    if constexpr (sizeof(Real) == 4)
-      return lane::template convert<integers>(v);
-    else
-      return std::bit_cast<integers>(v + rounder) - std::bit_cast<integer>(rounder);
-  }
+  /// Sums of this and smaller whole numbers hold those in their lowest bits.
+  static constexpr double first_whole = 4503599627370496.0;  // 2^52
+  static constexpr integer mantissa = static_cast<integer>((std::int64_t{1} << 52) - 1);
 };
 
 /// The recursion of one order: y = g (w - sum over j = 1 .. order of a[j] y[-j]), y[-1] last because it comes last.
@@ -205,12 +206,17 @@ class recursion {
 
   /// All parts are quiet: up to the first sample that makes one of them louder, which is left to do.
   Real *run_quiet(Real *data, Real *end) noexcept {
+    constexpr Real silence[parts] = {};
     std::array<doubles, order> v;
     std::transform(y_.begin(), y_.end(), v.begin(), &all::steps);
     for (; data < end; data += parts) {
-      const reals w = read(data);
-      const doubles newest = whole(rest(all::steps(w), v), v);
-      if (!lane::all(all::is(w)) || !lane::all(all::are_few(newest))) break;
+      doubles w{};
+      if (std::memcmp(data, silence, sizeof silence) != 0) {
+        if (!lane::all(all::is(read(data)))) break;
+        w = all::steps(read(data));
+      }
+      const doubles newest = whole(rest(w, v), v);
+      if (!lane::all(all::are_few(newest))) break;
       shift(v, newest);
       const reals y = all::value(newest);
       std::memcpy(data, &y, sizeof y);
