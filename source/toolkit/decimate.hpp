@@ -15,7 +15,7 @@ namespace detail {
 /// Sum of `factor` samples, over several lanes where that pays.
 template <class T>
 T block_sum(const T *x, std::int64_t factor) noexcept {
-  constexpr std::int64_t lanes = 64 / sizeof(T);
+  constexpr std::int64_t lanes = 32 / sizeof(T);
   T sum[lanes] = {};
   std::int64_t i = 0;
   for (; i + lanes <= factor; i += lanes)
@@ -43,6 +43,28 @@ void average_short(const T *x, T *out, std::int64_t count, std::int64_t factor, 
   }
 }
 
+/// The same for a factor known to the compiler, in whole registers.
+template <std::int64_t factor, class T, class Real>
+void average_fixed(const T *x, T *out, std::int64_t count, Real divisor) noexcept {
+  constexpr auto parts = static_cast<std::int64_t>(sizeof(T) / sizeof(Real));
+  const auto *const in = reinterpret_cast<const Real *>(x);
+  auto *const to = reinterpret_cast<Real *>(out);
+  constexpr std::int64_t together = 16;
+  Real sum[together * parts];
+  for (std::int64_t k = 0; k < count; k += together) {
+    const std::int64_t n = std::min(together, count - k);
+    if (n < together) return average_short(x + k * factor, out + k, n, factor, divisor);
+    const Real *const from = in + k * factor * parts;
+    for (std::int64_t l = 0; l < together; ++l)
+      for (std::int64_t part = 0; part < parts; ++part) {
+        Real &s = sum[l * parts + part];
+        s = from[l * factor * parts + part];
+        for (std::int64_t j = 1; j < factor; ++j) s += from[(l * factor + j) * parts + part];
+      }
+    for (std::int64_t l = 0; l < together * parts; ++l) to[k * parts + l] = sum[l] / divisor;
+  }
+}
+
 }  // namespace detail
 
 /// Writes floor(x.size() / factor) samples to the front of `out`, which may be x itself.
@@ -58,7 +80,11 @@ void decimate(std::span<const T> x, std::span<T> out, std::int64_t factor, decim
   const auto divisor = static_cast<real>(factor);
   if (how == decimation::pick) {
     for (std::int64_t k = 0; k < count; ++k) out[static_cast<std::size_t>(k)] = x[static_cast<std::size_t>(k * factor)];
-  } else if (factor < 32) {
+  } else if (factor == 2) {
+    detail::average_fixed<2>(x.data(), out.data(), count, divisor);
+  } else if (factor == 3) {
+    detail::average_fixed<3>(x.data(), out.data(), count, divisor);
+  } else if (factor < static_cast<std::int64_t>(128 / sizeof(T))) {
     detail::average_short(x.data(), out.data(), count, factor, divisor);
   } else {
     for (std::int64_t k = 0; k < count; ++k)
