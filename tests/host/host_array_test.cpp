@@ -3,7 +3,10 @@
 
 #include <gtest/gtest.h>
 
+#include <array>
+#include <complex>
 #include <limits>
+#include <lumra/lumra.hpp>
 
 #include "support/test_array.hpp"
 
@@ -11,15 +14,13 @@ namespace {
 
 constexpr std::int32_t no_memory = -20001, negative_size = -20004, bad_type = -20061;
 
-struct layout {
-  std::int32_t type, dimensions;
-  std::size_t header, width;
-};
-constexpr layout layouts[] = {{9, 1, 4, 4}, {12, 1, 4, 8}, {10, 1, 8, 8}, {13, 1, 8, 16},
-                              {9, 2, 8, 4}, {12, 2, 8, 8}, {10, 2, 8, 8}, {13, 2, 8, 16}};
-
 TEST(HostArrays, OwnBlocksAreZeroAlignedAndSized) {
-  for (const layout &l : layouts) {
+  const struct {
+    std::int32_t type, dimensions;
+    std::size_t header, width;
+  } layouts[] = {{9, 1, 4, 4}, {12, 1, 4, 8}, {10, 1, 8, 8}, {13, 1, 8, 16},
+                 {9, 2, 8, 4}, {12, 2, 8, 8}, {10, 2, 8, 8}, {13, 2, 8, 16}};
+  for (const auto &l : layouts) {
     SCOPED_TRACE(testing::Message() << "type " << l.type << " dimensions " << l.dimensions);
     const std::int32_t sizes[] = {5, 3};
     char **array = nullptr;
@@ -35,23 +36,17 @@ TEST(HostArrays, OwnBlocksAreZeroAlignedAndSized) {
 }
 
 TEST(HostArrays, RefusesBadArguments) {
-  struct refusal {
-    const char *why;
-    std::int32_t type, dimensions;
-    std::int32_t sizes[2];
-    std::int32_t code;
-  };
   constexpr std::int32_t huge = std::numeric_limits<std::int32_t>::max();
-  const refusal refusals[] = {
-      {"type", 11, 1, {1, 1}, bad_type},          {"type before size", 0, 1, {-1, 1}, bad_type},
-      {"no dimension", 9, 0, {1, 1}, bad_type},   {"three dimensions", 9, 3, {1, 1}, bad_type},
-      {"negative", 9, 1, {-1, 1}, negative_size}, {"negative columns", 9, 2, {3, -1}, negative_size},
-      {"product", 13, 2, {huge, 2}, no_memory}};
-  for (const refusal &r : refusals) {
-    SCOPED_TRACE(r.why);
+  constexpr std::uint64_t most = std::numeric_limits<std::uint64_t>::max();
+  const struct {
+    std::int32_t type, dimensions, sizes[2], code;
+  } refusals[] = {{11, 1, {1, 1}, bad_type},    {0, 1, {-1, 1}, bad_type},      {9, 0, {1, 1}, bad_type},
+                  {9, 3, {1, 1}, bad_type},     {9, 1, {-1, 1}, negative_size}, {9, 2, {3, -1}, negative_size},
+                  {13, 2, {huge, 2}, no_memory}};
+  for (const auto &r : refusals) {
     void *stale = &stale;
     void *array = stale;
-    EXPECT_EQ(r.code, qsHost_ArrayNew(r.type, r.dimensions, r.sizes, &array));
+    EXPECT_EQ(r.code, qsHost_ArrayNew(r.type, r.dimensions, r.sizes, &array)) << r.type << ' ' << r.dimensions;
     EXPECT_EQ(nullptr, array);
   }
   EXPECT_EQ(no_memory, qsHost_ArrayNew(9, 1, refusals[0].sizes, nullptr));
@@ -59,8 +54,8 @@ TEST(HostArrays, RefusesBadArguments) {
   void *array = nullptr;
   EXPECT_EQ(bad_type, qsHost_ArrayNew(9, 1, nullptr, &array));
   EXPECT_EQ(bad_type, qsHost_ArrayResize(11, 1, &array, 1));
-  EXPECT_EQ(no_memory, qsHost_ArrayResize(9, 1, &array, 1ULL << 31));
-  EXPECT_EQ(no_memory, qsHost_ArrayResize(9, 1, &array, std::numeric_limits<std::uint64_t>::max()));
+  for (const std::uint64_t count : {std::uint64_t{1} << 31, most})
+    EXPECT_EQ(no_memory, qsHost_ArrayResize(9, 1, &array, count));
   EXPECT_EQ(nullptr, array);
   EXPECT_EQ(0, qsHost_ArrayFree(nullptr));
   EXPECT_EQ(0, qsHost_ArrayFree(&array));
@@ -123,6 +118,43 @@ TEST(ResizeService, HandedOverWinsAndNullSearchesAgain) {
   EXPECT_TRUE(host::resize_vector(&own, 4, 16));
   EXPECT_EQ(4, (*own)->count);
   EXPECT_EQ(0, qsHost_ArrayFree(&own));
+}
+
+TEST(HostMatrix, LiesRowByRowAndRefusesSizesThatNoBlockHas) {
+  using matrix = lumra::host_matrix<std::complex<double>>;
+  matrix m(2, 3);
+  EXPECT_EQ((std::pair{2, 3}), (std::pair{(*m.get())->rows, (*m.get())->columns}));
+  for (std::size_t i = 0; i < 6; ++i) {
+    EXPECT_EQ(0.0, m.elements()[i]);
+    m.row(i / 3)[i % 3] = static_cast<double>(i + 1);
+  }
+  const auto expect = [&m](std::size_t rows, std::size_t columns, std::initializer_list<double> elements) {
+    EXPECT_EQ((std::array{rows, columns, rows * columns}), (std::array{m.rows(), m.columns(), m.size()}));
+    EXPECT_EQ(static_cast<void *>((*m.get())->elements), m.elements().data());
+    EXPECT_TRUE(std::equal(elements.begin(), elements.end(), m.elements().begin(), m.elements().end()));
+    for (std::size_t r = 0; r < rows; ++r) EXPECT_EQ(m.elements().data() + r * columns, m.row(r).data());
+  };
+  expect(2, 3, {1, 2, 3, 4, 5, 6});
+  m.resize(1, 2);
+  m.resize(2, 2);
+  expect(2, 2, {1, 2, 0, 0});  // what was dropped does not come back
+  constexpr std::size_t most = 0x7FFFFFFF, negative = static_cast<std::size_t>(-1);
+  for (const auto &[rows, columns] : {std::pair{negative, std::size_t{1}},
+                                      {1, negative},
+                                      {most + 1, 0},
+                                      {0, most + 1},
+                                      {most, 2},
+                                      {65536, 65536},
+                                      {std::size_t{1} << 32, std::size_t{1} << 32}}) {
+    EXPECT_THROW(m.resize(rows, columns), std::length_error) << rows << " x " << columns;
+    EXPECT_THROW(matrix(rows, columns), std::length_error) << rows << " x " << columns;
+  }
+  expect(2, 2, {1, 2, 0, 0});
+  m.resize(0, most);
+  expect(0, most, {});
+  m = matrix(1, 1);
+  expect(1, 1, {0});
+  EXPECT_EQ(0U, matrix().size());
 }
 
 TEST(TransformSlot, EmptySlotsAreReleased) {
