@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <span>
+#include <type_traits>
 
 #include "toolkit/frame.hpp"
 
@@ -46,7 +47,7 @@ void average_short(const T *x, T *out, std::int64_t count, std::int64_t factor, 
 /// The same for a factor known to the compiler, in whole registers.
 template <std::int64_t factor, class T, class Real>
 void average_fixed(const T *x, T *out, std::int64_t count, Real divisor) noexcept {
-  constexpr auto parts = static_cast<std::int64_t>(sizeof(T) / sizeof(Real));
+  constexpr std::int64_t parts = std::is_same_v<T, Real> ? 1 : 2;
   const auto *const in = reinterpret_cast<const Real *>(x);
   auto *const to = reinterpret_cast<Real *>(out);
   constexpr std::int64_t together = 16;

@@ -36,6 +36,7 @@ struct lanes<1, Real> {
   static bool any(Mask mask) noexcept {
     return mask < 0;
   }
+  static bool any_bit(integers v) noexcept { return v != 0; }
   static Real &part(Real &v, std::size_t) noexcept { return v; }
 };
 
@@ -59,6 +60,7 @@ struct lanes<2, Real> {
   static bool any(Mask mask) noexcept {
     return (mask[0] | mask[1]) < 0;
   }
+  static bool any_bit(integers v) noexcept { return (v[0] | v[1]) != 0; }
   static Real &part(reals &v, std::size_t which) noexcept { return reinterpret_cast<Real *>(&v)[which]; }
 };
 
@@ -206,12 +208,11 @@ class recursion {
 
   /// All parts are quiet: up to the first sample that makes one of them louder, which is left to do.
   Real *run_quiet(Real *data, Real *end) noexcept {
-    constexpr Real silence[parts] = {};
     std::array<doubles, order> v;
     std::transform(y_.begin(), y_.end(), v.begin(), &all::steps);
     for (; data < end; data += parts) {
       doubles w{};
-      if (std::memcmp(data, silence, sizeof silence) != 0) {
+      if (lane::any_bit(std::bit_cast<typename lane::integers>(read(data)))) {
         if (!lane::all(all::is(read(data)))) break;
         w = all::steps(read(data));
       }
