@@ -12,7 +12,6 @@
 #include <cstdlib>
 #include <cstring>
 #include <limits>
-#include <string_view>
 #include <thread>
 #include <vector>
 
