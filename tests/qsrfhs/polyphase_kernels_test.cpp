@@ -7,10 +7,12 @@
 #include <vector>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "support/guarded.hpp"
 
 namespace {
 
 using namespace qsrfhs::kernels;
+using tests::edge, tests::guarded;
 
 /// n values and, up to `size`, others that must not count.
 std::vector<float> values(std::size_t n, std::size_t size, unsigned seed) {
@@ -27,14 +29,21 @@ template <class Taps, class Kernel>
 void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
                  Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places, std::size_t samples,
                  const std::vector<std::vector<double>> &taps) {
-  const auto x = values(2 * samples, 2 * samples + 16, 7);
-  std::vector<float> got[2] = {std::vector<float>(3 * places.size()), std::vector<float>(3 * places.size())};
-  const kernel_table *tables[] = {&baseline_kernels, &active()};
-  for (int i : {0, 1}) {
-    (tables[i]->*real)(places.data(), places.size(), real_taps, x.data(), got[i].data());
-    (tables[i]->*complex)(places.data(), places.size(), complex_taps, x.data(), got[i].data() + places.size());
+  const auto x = values(2 * samples, 2 * samples, 7);
+  // Nothing before the samples is read, and behind the last group of any place neither.
+  std::vector<std::vector<float>> got;
+  for (const edge at : {edge::front, edge::back}) {
+    const guarded reals(std::vector<float>(x.begin(), x.begin() + static_cast<std::ptrdiff_t>(samples)), at),
+        both(x, at);
+    const guarded given(places, at), out(3 * places.size() * sizeof(float), at);
+    for (const kernel_table *table : {&baseline_kernels, &active()}) {
+      const auto *const first = given.as<tap_place<float>>();
+      (table->*real)(first, places.size(), real_taps, reals.as<float>(), out.as<float>());
+      (table->*complex)(first, places.size(), complex_taps, both.as<float>(), out.as<float>() + places.size());
+      got.emplace_back(out.as<float>(), out.as<float>() + 3 * places.size());
+      EXPECT_EQ(got[0], got.back());
+    }
   }
-  EXPECT_EQ(got[0], got[1]);
   for (std::size_t k = 0; k < places.size(); ++k) {
     double sums[3] = {};
     for (std::size_t j = 0; j < static_cast<std::size_t>(places[k].count); ++j) {
@@ -70,8 +79,11 @@ TEST(PolyphaseKernels, TapsInRows) {
       of_place.push_back(static_cast<double>(in_order[i]) + 0.3 * static_cast<double>(in_order[i + 8]));
     }
   }
-  expect_sums(tap_rows<float>{in_order.data(), length}, tap_rows<float>{for_complex.data(), length},
-              &kernel_table::polyphase, &kernel_table::complex_polyphase, places, 50, taps);
+  for (const edge at : {edge::front, edge::back}) {
+    const guarded real(in_order, at), complex(for_complex, at);
+    expect_sums(tap_rows<float>{real.as<float>(), length}, tap_rows<float>{complex.as<float>(), length},
+                &kernel_table::polyphase, &kernel_table::complex_polyphase, places, 44, taps);
+  }
 }
 
 TEST(PolyphaseKernels, TapsAtOffsets) {
@@ -99,8 +111,12 @@ TEST(PolyphaseKernels, TapsAtOffsets) {
                          (t - static_cast<double>(i)) * (static_cast<double>(h[i + 1]) - static_cast<double>(h[i])));
     }
   }
-  expect_sums(tap_offsets{h.data(), size - 2, in_order.data()}, tap_offsets{h.data(), size - 2, for_complex.data()},
-              &kernel_table::stretched, &kernel_table::complex_stretched, places, 50, taps);
+  for (const edge at : {edge::front, edge::back}) {
+    const guarded prototype(h, at), real(in_order, at), complex(for_complex, at);
+    expect_sums(tap_offsets{prototype.as<float>(), size - 2, real.as<float>()},
+                tap_offsets{prototype.as<float>(), size - 2, complex.as<float>()}, &kernel_table::stretched,
+                &kernel_table::complex_stretched, places, 44, taps);
+  }
 }
 
 }  // namespace

@@ -17,6 +17,7 @@
 #include <vector>
 
 #include "platform/processor.hpp"
+#include "support/guarded.hpp"
 
 namespace {
 
@@ -94,6 +95,12 @@ struct operation {
   std::function<void(const float *x, const float *y, float *out)> define;  // one element
   bool in_place = true;                                                    // the output may be an input
 };
+
+/// Values that end at a page that faults, for as long as the process runs.
+const float *at_a_page(const std::vector<float> &values) {
+  static std::vector<tests::guarded> all;
+  return all.emplace_back(values, tests::edge::back).as<float>();
+}
 
 void define_division(const float *a, const float *b, float *out) {
   const float d = b[0] * b[0] + b[1] * b[1];
@@ -240,10 +247,11 @@ std::vector<operation> operations() {
   std::vector<operation> all;
   all.push_back(
       {"divide", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.divide(x, y, out, n); }, define_division});
-  for (const auto &v : {std::array{0.0F, 1.0F}, {3.0F, -4.0F}, {0.0F, 0.0F}, {1e30F, 1.0F}, {nan, 1.0F}})
+  for (const auto *v :
+       {at_a_page({0, 1}), at_a_page({3, -4}), at_a_page({0, 0}), at_a_page({1e30F, 1}), at_a_page({nan, 1})})
     all.push_back({"divide_by_value", 2, 0, 2,
-                   [v](auto &t, auto x, auto, auto out, auto n) { t.divide_by_value(x, v.data(), out, n); },
-                   [v](auto x, auto, auto out) { define_division(x, v.data(), out); }});
+                   [v](auto &t, auto x, auto, auto out, auto n) { t.divide_by_value(x, v, out, n); },
+                   [v](auto x, auto, auto out) { define_division(x, v, out); }});
   all.push_back({"magnitude", 2, 0, 1, [](auto &t, auto x, auto, auto out, auto n) { t.magnitude(x, out, n); },
                  [](auto x, auto, auto out) { *out = std::sqrt(define_power(x)); }});
   all.push_back({"magnitude_squared", 2, 0, 1,
@@ -273,13 +281,12 @@ std::vector<operation> operations() {
     std::replace_if(
         c.begin(), c.end(), [](float v) { return !(std::abs(v) < 100); }, 0.75F);
     const std::vector<float> real(c.begin(), c.begin() + static_cast<std::ptrdiff_t>(m));
-    all.push_back(
-        {"polynomial", 1, 0, 1,
-         [real](auto &t, auto x, auto, auto out, auto n) { t.polynomial(x, real.data(), real.size(), out, n); },
-         [real](auto x, auto, auto out) { *out = define_polynomial(real, 0, 1, *x); }});
+    all.push_back({"polynomial", 1, 0, 1,
+                   [m, p = at_a_page(real)](auto &t, auto x, auto, auto out, auto n) { t.polynomial(x, p, m, out, n); },
+                   [real](auto x, auto, auto out) { *out = define_polynomial(real, 0, 1, *x); }});
     all.push_back(
         {"complex_polynomial", 1, 0, 2,
-         [c](auto &t, auto x, auto, auto out, auto n) { t.complex_polynomial(x, c.data(), c.size() / 2, out, n); },
+         [m, p = at_a_page(c)](auto &t, auto x, auto, auto out, auto n) { t.complex_polynomial(x, p, m, out, n); },
          [c](auto x, auto, auto out) {
            out[0] = define_polynomial(c, 0, 2, *x);
            out[1] = define_polynomial(c, 1, 2, *x);
@@ -294,7 +301,7 @@ std::vector<operation> operations() {
                                               {nullptr, 5, 0, nan},
                                               {nullptr, 4, 0, tiny},
                                               {nullptr, 1, 0, 1}}) {
-    table.entries = entries.data();
+    table.entries = at_a_page({entries.begin(), entries.begin() + 4 * table.count});
     all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
                    [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
   }
@@ -327,6 +334,34 @@ TEST(VectorKernels, BothBuildsFollowTheFormulas) {
   for (const operation &op : operations())
     for (const std::size_t n : lengths)
       for (const std::size_t offset : offsets) check(op, n, offset);
+}
+
+TEST(VectorKernels, NothingBesidesTheArraysIsTouched) {
+  std::vector<std::size_t> all_lengths = {63, 64, 65, 127, 1003};
+  for (std::size_t n = 0; n <= 40; ++n) all_lengths.push_back(n);
+  for (const operation &op : operations())
+    for (const std::size_t n : all_lengths)
+      for (const tests::edge at : {tests::edge::front, tests::edge::back}) {
+        SCOPED_TRACE(testing::Message() << op.name << " n " << n << (at == tests::edge::back ? " back" : " front"));
+        std::vector<float> first(n * op.x_width), second(n * op.y_width);
+        fill(first, static_cast<unsigned>(n));
+        fill(second, static_cast<unsigned>(n + 1));
+        const std::vector<float> expected = define(op, first, second, n);
+        const tests::guarded x(first, at), y(second, at), out(std::vector<float>(expected.size()), at);
+        for (const build &b : builds()) {
+          op.run(*b.table, x.as<float>(), y.as<float>(), out.as<float>(), n);
+          EXPECT_TRUE(same(expected, {out.as<float>(), expected.size()})) << b.name;
+        }
+      }
+  for (const std::size_t n : all_lengths)
+    for (const tests::edge at : {tests::edge::front, tests::edge::back}) {
+      const tests::guarded x(std::vector<float>(2 * n, 1.0F), at), sum(sizeof(float), at), peak(sizeof(float), at);
+      for (const build &b : builds()) {
+        EXPECT_EQ(2.0F * static_cast<float>(n), b.table->sum_power(x.as<float>(), n));
+        b.table->sum_power_and_peak(x.as<float>(), n, sum.as<float>(), peak.as<float>());
+        EXPECT_EQ(2.0F * static_cast<float>(n), *sum.as<float>());
+      }
+    }
 }
 
 // Complex outputs that bypass the caches; how they are stored depends on the shape of the operation only.

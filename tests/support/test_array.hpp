@@ -6,19 +6,40 @@
 #include <cstdlib>
 #include <cstring>
 #include <initializer_list>
+#include <optional>
 #include <span>
+#include <unordered_map>
 #include <vector>
 
 #include "host/host_array.hpp"
 #include "host/resize_service.hpp"
 #include "support/fault_counter.hpp"
+#include "support/guarded.hpp"
 
 namespace tests {
 
-/// A malloc'ed block of `header` + `bytes` bytes, all zero. Not inlined: the size sanitizer would miss the room for the
-/// first element in blocks that have none, while the address sanitizer sees what is touched.
+/// Where blocks are made from now on: malloc'ed, or, with an edge, at a page that faults.
+inline std::optional<edge> &block_edge() {
+  static std::optional<edge> at;
+  return at;
+}
+inline std::unordered_map<void *, guarded> &guarded_blocks() {
+  static std::unordered_map<void *, guarded> blocks;
+  return blocks;
+}
+
+/// A block of `header` + `bytes` bytes, all zero. Not inlined: the size sanitizer would miss the room for the first
+/// element in blocks that have none, while the address sanitizer sees what is touched.
 [[gnu::noinline]] inline void *new_block(std::size_t header, std::size_t bytes) {
-  return std::calloc(1, header + bytes);
+  if (!block_edge()) return std::calloc(1, header + bytes);
+  guarded memory(header + bytes, *block_edge());
+  void *const block = memory.data();
+  guarded_blocks().emplace(block, std::move(memory));
+  return block;
+}
+
+inline void free_block(void *block) noexcept {
+  if (guarded_blocks().erase(block) == 0) std::free(block);
 }
 
 /// A vector or matrix in a block of its own; resizable by fake_host, and by nothing else.
@@ -46,17 +67,21 @@ class test_array {
   }
   test_array(const test_array &) = delete;
   test_array &operator=(const test_array &) = delete;
-  ~test_array() { std::free(block_); }
+  ~test_array() { free_block(block_); }
 
-  [[nodiscard]] Block **handle() noexcept { return &block_; }
-  operator Block **() noexcept { return &block_; }  // as exports take it
+  [[nodiscard]] Block **handle() noexcept { return handle_; }
+  operator Block **() noexcept {  // as exports take it
+    handed_over_ = true;
+    return handle_;
+  }
   [[nodiscard]] Block ***address() noexcept { return &handle_; }
-  [[nodiscard]] Block *block() noexcept { return block_; }
+  [[nodiscard]] Block *block() noexcept { return handle_ ? *handle_ : nullptr; }
+  [[nodiscard]] bool handed_over() const noexcept { return handed_over_; }
   [[nodiscard]] std::span<element> elements() noexcept {
-    if constexpr (requires { block_->rows; })
-      return {block_->elements, static_cast<std::size_t>(block_->rows) * static_cast<std::size_t>(block_->columns)};
+    if constexpr (requires { block()->rows; })
+      return {block()->elements, static_cast<std::size_t>(block()->rows) * static_cast<std::size_t>(block()->columns)};
     else
-      return host::elements(handle());
+      return host::elements(handle_);
   }
   [[nodiscard]] std::vector<element> copy() { return {elements().begin(), elements().end()}; }
 
@@ -65,6 +90,7 @@ class test_array {
 
   Block *block_ = nullptr;
   Block **handle_ = &block_;
+  bool handed_over_ = false;
 };
 
 using f32_array = test_array<lumra_f32_block>;
@@ -92,7 +118,7 @@ class fake_host {
     qsHost_SetArrayResize(nullptr);
     current() = nullptr;
     for (void **cell : cells_) {
-      std::free(*cell);
+      free_block(*cell);
       std::free(cell);
     }
   }
@@ -101,6 +127,7 @@ class fake_host {
   fault_counter resizes;  // refuses one of them
   int refuse_from = -1;   // index of the first call that is refused, -1 for none
   int refuse_until = 1 << 30;
+  bool empties_in_place = false;  // leaves a block that loses its elements where it is
 
  private:
   static fake_host *&current() {
@@ -115,6 +142,7 @@ class fake_host {
     if (self.resizes.fails()) return 1;
     if (self.refuse_from >= 0 && index >= self.refuse_from && index < self.refuse_until) return 1;
     auto **&handle = *static_cast<void ***>(address);
+    if (self.empties_in_place && size == 0 && handle && *handle) return 0;
     if (!handle) {  // arrays made here are freed with the host
       handle = static_cast<void **>(std::calloc(1, sizeof(void *)));
       self.cells_.push_back(handle);
@@ -124,7 +152,7 @@ class fake_host {
     const std::size_t width = self.unit_ == unit::bytes ? 1 : host::element_size(element);
     void *fresh = new_block(header, static_cast<std::size_t>(size) * width);
     if (*handle) std::memcpy(fresh, *handle, header);  // the sizes stay as they were; the elements need not
-    std::free(*handle);
+    free_block(*handle);
     *handle = fresh;
     return 0;
   }
