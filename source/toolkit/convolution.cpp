@@ -36,9 +36,9 @@ void convolve(input<E> x, input<E> y, output<E> &out, std::int32_t mode_number, 
   require(length <= std::numeric_limits<std::int32_t>::max(), no_memory);
   std::optional<fourier_convolution<E>> plan;
   if (how == method::fourier) plan.emplace(length);
-  full.keep_apart_from(x, y, out, room);
-  room.keep_apart_from(x, y, out);
-  const bool with_itself = x.block() == y.block();
+  refuse_sharing(full, x, y, out, room);
+  refuse_sharing(room, x, y, out);
+  const bool with_itself = same_array(x, y);
   x.keep_apart_from(out);
   y.keep_apart_from(out);
 

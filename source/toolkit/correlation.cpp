@@ -62,8 +62,8 @@ void correlate(input<E> x, input<F> y, output<common_of<E, F>> &out, std::int32_
   require(length <= std::numeric_limits<std::int32_t>::max(), no_memory);
   std::optional<fourier_convolution<common_of<E, F>>> plan;
   if (how == method::fourier) plan.emplace(length);
-  reversed.keep_apart_from(x, y, out, room);
-  room.keep_apart_from(x, y, out);
+  refuse_sharing(reversed, x, y, out, room);
+  refuse_sharing(room, x, y, out);
   x.keep_apart_from(out);
   y.keep_apart_from(out);
 
@@ -111,8 +111,8 @@ void correlate_matrices(input_matrix<E> x, input_matrix<E> y, output_matrix<E> &
   require(bits(rows) + bits(columns) < 31, no_memory);
   std::optional<fourier_convolution<E>> plan;
   if (how == method::fourier) plan.emplace(rows, columns);
-  reversed.keep_apart_from(x, y, out, room);
-  room.keep_apart_from(x, y, out);
+  refuse_sharing(reversed, x, y, out, room);
+  refuse_sharing(room, x, y, out);
   x.keep_apart_from(out);
   y.keep_apart_from(out);
 

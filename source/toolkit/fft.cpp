@@ -24,7 +24,7 @@ void forward_fft(input<E> x, output<complex_of<E>> &y, std::int32_t size, bool c
   require(x.count() >= 1, empty_input);
   const std::int32_t n = size < 1 ? x.count() : size;
   check_transform_size(n);
-  pad.keep_apart_from(x, y);
+  refuse_sharing(pad, x, y);
   x.keep_apart_from(y);
   const auto bins = y.resize(n);
 
@@ -63,7 +63,7 @@ void inverse_fft(input<complex_of<E>> x, output<E> &y, bool centred, scratch<com
   const std::int32_t n = x.count();
   require(n >= 1, empty_input);
   check_transform_size(n);
-  gathered.keep_apart_from(x, y);
+  refuse_sharing(gathered, x, y);
   x.keep_apart_from(y);
   const auto record = y.resize(n);
 

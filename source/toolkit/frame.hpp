@@ -84,6 +84,34 @@ void clear_vector(Block **array) noexcept {
 
 }  // namespace detail
 
+/// Which array an argument is, whatever its element type. Two are one array when they are one handle, also where that
+/// has no block yet, or when their handles hold one block: sizing the one then moves or frees what the other one means.
+class identity {
+ public:
+  template <class Block>
+  explicit identity(Block *const *handle) noexcept : handle_(handle), block_(handle ? *handle : nullptr) {}
+
+  [[nodiscard]] bool has_block() const noexcept { return block_ != nullptr; }
+  friend bool operator==(const identity &a, const identity &b) noexcept {
+    return (a.handle_ && a.handle_ == b.handle_) || (a.block_ && a.block_ == b.block_);
+  }
+
+ private:
+  const void *handle_, *block_;
+};
+
+/// Whether two arguments of a call, as they are now, are one array.
+template <class First, class Second>
+bool same_array(const First &first, const Second &second) noexcept {
+  return first.which() == second.which();
+}
+
+/// Throws bad_option when a workspace or a state is also another array of the call: sizing it would pull that away.
+template <class Array, class... Others>
+void refuse_sharing(const Array &array, const Others &...others) {
+  require(!(same_array(array, others) || ...), bad_option);
+}
+
 /// A rectangle of elements, row by row.
 template <class T>
 struct matrix_view {
@@ -104,12 +132,12 @@ class input {
 
   [[nodiscard]] std::span<const value_of<E>> values() const noexcept { return values_; }
   [[nodiscard]] std::int32_t count() const noexcept { return static_cast<std::int32_t>(values_.size()); }
-  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+  [[nodiscard]] identity which() const noexcept { return identity(array_); }
 
   /// Reads a copy from here on if `written`, which is about to be sized, is the same array.
   template <class Array>
   void keep_apart_from(const Array &written) {
-    if (!block() || written.block() != block()) return;
+    if (!same_array(*this, written)) return;
     copy_ = qsrfhs::aligned_buffer<value_of<E>>(values_.size());
     std::copy(values_.begin(), values_.end(), copy_.data());
     values_ = copy_.elements();
@@ -131,12 +159,12 @@ class input_matrix {
   }
 
   [[nodiscard]] const matrix_view<const value_of<E>> &view() const noexcept { return view_; }
-  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+  [[nodiscard]] identity which() const noexcept { return identity(array_); }
 
   /// Reads a copy from here on if `written`, which is about to be sized, is the same array. Sizes above 0 only.
   template <class Array>
   void keep_apart_from(const Array &written) {
-    if (!block() || written.block() != block()) return;
+    if (!same_array(*this, written)) return;
     copy_ = qsrfhs::aligned_buffer<value_of<E>>(view_.size());
     std::copy(view_.data, view_.data + view_.size(), copy_.data());
     view_.data = copy_.data();
@@ -157,7 +185,7 @@ class output {
   [[nodiscard]] bool present() const noexcept { return array_ != nullptr; }
   /// The elements there are.
   [[nodiscard]] std::span<value_of<E>> values() const noexcept { return detail::values<E>(array_); }
-  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+  [[nodiscard]] identity which() const noexcept { return identity(array_); }
 
   /// Makes it `count` elements; one that has them is left alone. What they hold is not defined.
   std::span<value_of<E>> resize(std::int64_t count) {
@@ -179,7 +207,7 @@ class output_matrix {
  public:
   explicit output_matrix(matrix_handle<E> array) noexcept : array_(array) {}
 
-  [[nodiscard]] const void *block() const noexcept { return array_ ? *array_ : nullptr; }
+  [[nodiscard]] identity which() const noexcept { return identity(array_); }
   [[nodiscard]] matrix_view<value_of<E>> view() const noexcept {
     if (!host::has_block(array_)) return {};
     return {reinterpret_cast<value_of<E> *>((*array_)->elements), (*array_)->rows, (*array_)->columns};
@@ -244,13 +272,7 @@ class scratch {
     return array_.resize(count);
   }
   [[nodiscard]] bool present() const noexcept { return array_.present(); }
-  [[nodiscard]] const void *block() const noexcept { return array_.block(); }
-
-  /// Refuses workspace that is also another array of the call: sizing it would pull that away.
-  template <class... Arrays>
-  void keep_apart_from(const Arrays &...others) const {
-    require(!block() || ((others.block() != block()) && ...), bad_option);
-  }
+  [[nodiscard]] identity which() const noexcept { return array_.which(); }
 
  private:
   output<E> array_;

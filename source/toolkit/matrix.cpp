@@ -21,7 +21,7 @@ void check_sizes(std::initializer_list<std::int32_t> sizes) {
 
 template <class E>
 void multiply_matrices(input_matrix<E> a, input_matrix<E> b, output_matrix<E> &c) {
-  require(a.block() && b.block(), empty_input);
+  require(a.which().has_block() && b.which().has_block(), empty_input);
   const std::int32_t m = a.view().rows, k = a.view().columns, n = b.view().columns;
   check_sizes({m, k, b.view().rows, n});
   require(k == b.view().rows, inner_dimensions_differ);
@@ -46,7 +46,7 @@ void multiply_matrices(input_matrix<E> a, input_matrix<E> b, output_matrix<E> &c
 template <class E>
 void multiply_vector(input_matrix<E> a, handle<E> vector, output<E> &y) {
   input<E> x(vector);
-  require(a.block() && x.block(), empty_input);
+  require(a.which().has_block() && x.which().has_block(), empty_input);
   const std::int32_t m = a.view().rows, k = a.view().columns;
   check_sizes({m, k, (*vector)->count});
   require(k == x.count(), inner_dimensions_differ);
@@ -151,14 +151,14 @@ void solve_with_pseudo_inverse(const equation<E> &eq, value_of<E> *a, scratch<E>
 template <class E>
 void least_squares(input_matrix<E> a, input<E> b, float tolerance, output<E> &x, scratch<E> matrix, scratch<E> rhs,
                    scratch<E> room) {
-  require(a.block() && b.block(), empty_input);
+  require(a.which().has_block() && b.which().has_block(), empty_input);
   const auto [data, m, n] = a.view();
   require(m >= 1 && n >= 1, empty_input);
   require(b.count() == m, lengths_differ);
   require(std::isfinite(tolerance), bad_option);
-  matrix.keep_apart_from(a, b, x, rhs, room);
-  rhs.keep_apart_from(a, b, x, room);
-  room.keep_apart_from(a, b, x);
+  refuse_sharing(matrix, a, b, x, rhs, room);
+  refuse_sharing(rhs, a, b, x, room);
+  refuse_sharing(room, a, b, x);
   const auto usable = [](value_of<E> v) { return finite(v); };
   require(std::all_of(data, data + a.view().size(), usable), not_finite);
   require(std::all_of(b.values().begin(), b.values().end(), usable), not_finite);

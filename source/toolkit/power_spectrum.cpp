@@ -15,7 +15,7 @@ void power_spectrum(input<E> x, output<magnitude_of<E>> &out, scratch<E> room, t
   const std::int64_t n = x.count();
   require(n >= 1, empty_input);
   check_transform_size(n);
-  room.keep_apart_from(x, out);
+  refuse_sharing(room, x, out);
   x.keep_apart_from(out);
   real_of<E> *const p = out.resize(n).data();
   auto *const bins = reinterpret_cast<value_of<complex_of<E>> *>(room.resize(n + 2).data());

@@ -150,11 +150,8 @@ void resample(typename Shape::in x, input<magnitude_of<E>> coefficients, const r
   using value = value_of<E>;
   require(Shape::view(x).rows >= 1 && Shape::view(x).columns >= 1 && coefficients.count() >= 1, empty_input);
   require(options.phases >= 1 && kept.present() && (options.parameters || !options.reset), bad_option);
-  const auto apart = [](const auto &state, const auto &...others) {
-    require(!state.block() || ((others.block() != state.block()) && ...), bad_option);
-  };
-  apart(sample_history, x, coefficients, out, tap_history);
-  apart(tap_history, x, coefficients, out);
+  refuse_sharing(sample_history, x, coefficients, out, tap_history);
+  refuse_sharing(tap_history, x, coefficients, out);
   coefficients.keep_apart_from(out);
   x.keep_apart_from(out);
   const std::int32_t rows = Shape::view(x).rows, n = Shape::view(x).columns;

@@ -235,6 +235,7 @@ void linear_fit(output<E> &record, const input<E> &x, const input<E> &w, const f
   const auto usable = [](real v) { return std::abs(v) < std::numeric_limits<real>::max(); };
   require(std::all_of(p.x.begin(), p.x.end(), usable) && std::all_of(y.begin(), y.end(), usable), not_finite);
   check_weights(weights);
+  refuse_sharing(room, record, x, w);
   const bool alike = std::adjacent_find(weights.begin(), weights.end(), std::not_equal_to<>()) == weights.end();
 
   line f;
@@ -242,7 +243,6 @@ void linear_fit(output<E> &record, const input<E> &x, const input<E> &w, const f
   if (method == fit_method::least_squares && alike) {
     require(fit<real>(p, {}, f), too_few_points);
   } else {
-    room.keep_apart_from(record, x, w);
     const double tolerance = options.tolerance > 0 ? static_cast<double>(options.tolerance) : 1e-4;
     // Below 2^31 as a float.
     const auto most =

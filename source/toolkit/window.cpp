@@ -120,6 +120,7 @@ void apply_window(output<E> &data, std::int32_t type, bool normalised, scratch<d
   const auto values = data.values();
   const auto n = static_cast<std::int64_t>(values.size());
   require(n >= 1, empty_input);
+  refuse_sharing(room, data);
   if (n == 1) return;
   const cosine_window &window = find_window(type);
   const double divisor = normalised ? window.a[0] : 1.0;
@@ -127,7 +128,6 @@ void apply_window(output<E> &data, std::int32_t type, bool normalised, scratch<d
     scale(static_cast<std::int32_t>(n), static_cast<real_of<E>>(window.a[0] / divisor), values.data());
     return;
   }
-  room.keep_apart_from(data);
   const auto tables = room.resize(std::int64_t{4} * window.terms);
   expand(window, divisor, tables);
   switch (window.terms) {

@@ -1,5 +1,7 @@
 // What all families share: refusals, slots, sizing. SPDX-License-Identifier: MIT
+#include <cstring>
 #include <functional>
+#include <typeinfo>
 
 #include "toolkit/operations.hpp"
 
@@ -72,6 +74,8 @@ TYPED_TEST(Toolkit, RefusesInTheOrderOfTheChecks) {
       {"window: type 10", -20061, [&](A &a) { return F::window(a.x, 10, 0, nullptr); }},
       {"window: type 12", -20061, [&](A &a) { return F::window(a.x, 12, 0, a.tables); }},
       {"window: type -1", -20061, [&](A &a) { return F::window(a.x, -1, 0, a.tables); }},
+      {"window: shared, not needed", -20061,
+       [&](A &a) { return F::window(a.x, 0, 0, reinterpret_cast<lumra_f64_array>(a.x.handle())); }},
       {"window: no scratch", -20999, [&](A &a) { return F::window(a.x, 1, 0, nullptr); }},
       {"power: no samples", -20003, [&](A &a) { return F::power_spectrum(a.none, a.real_out, nullptr, &a.slot); }},
       {"power: no scratch", -20999, [&](A &a) { return F::power_spectrum(a.x, a.real_out, nullptr, &a.slot); }},
@@ -86,6 +90,98 @@ TYPED_TEST(Toolkit, RefusesInTheOrderOfTheChecks) {
                         (a.matrix_out.block()->rows == 0 && a.matrix_out.block()->columns == 0) +
                         a.x.elements().empty();
     EXPECT_EQ(r.emptied, emptied);
+  }
+}
+
+/// An array of the arguments, of whatever type; pointers are copied because their types differ.
+struct argument {
+  void *handle_address;
+  bool handed_over;
+  const std::type_info *type;
+  bool unshared;  // workspace or a state
+
+  static void *at(const void *address) {
+    void *pointer = nullptr;
+    std::memcpy(&pointer, address, sizeof pointer);
+    return pointer;
+  }
+  static void set(void *address, void *pointer) { std::memcpy(address, &pointer, sizeof pointer); }
+
+  [[nodiscard]] void *cell() const { return at(handle_address); }
+  [[nodiscard]] void *block() const { return at(cell()); }
+  void set_block(void *block) const { set(cell(), block); }
+  void become(const argument &other) const { set(handle_address, other.cell()); }
+};
+
+template <class E>
+std::vector<argument> arrays_of(arguments<E> &a) {
+  std::vector<argument> all;
+  const auto add = [&](bool unshared) {
+    return [&all, unshared](auto &...arrays) {
+      (all.push_back({arrays.address(), arrays.handed_over(), &typeid(arrays), unshared}), ...);
+    };
+  };
+  std::apply(add(false), a.records());
+  std::apply(add(true), a.states());
+  std::apply(add(true), a.workspace());
+  return all;
+}
+
+enum class sharing { handle_without_block, handle, block };
+
+/// The same call with two of its arrays being one, and with two of the same contents.
+template <class E>
+void expect_as_documented(fake_host &host, const operation<E> &op, std::size_t i, std::size_t j, sharing how) {
+  arguments<E> shared(12), apart(12), spare(12);
+  shared.once = apart.once = true;
+  const auto given = arrays_of(shared), copies = arrays_of(apart);
+  const argument &first = given[i], &second = given[j];
+  if (how == sharing::handle_without_block) {
+    for (const argument &array : {first, second, copies[i], copies[j]}) {
+      free_block(array.block());
+      array.set_block(nullptr);
+    }
+  } else {
+    copies[j].become(arrays_of(spare)[i]);
+  }
+  void *const block = first.block();
+  if (how == sharing::block) {
+    free_block(second.block());
+    second.set_block(block);
+  } else {
+    second.become(first);
+  }
+  host.empties_in_place = how == sharing::block;  // the other handle would be left with a block that is gone
+
+  const std::int32_t expected = op.run(apart), code = op.run(shared);
+  const bool refused = first.unshared || second.unshared;
+  EXPECT_TRUE(code == (refused ? -20061 : expected) || (refused && expected < 0 && code == expected)) << code;
+  if (code < 0) {
+    EXPECT_TRUE(op.result(shared).empty());
+    EXPECT_TRUE(shared.scratch_is_empty());
+  } else {
+    EXPECT_EQ(op.result(apart), op.result(shared));
+  }
+  // One of two handles is left with a block that moved, or both hold it.
+  if (how == sharing::block) (first.block() == block && second.block() != block ? first : second).set_block(nullptr);
+}
+
+TYPED_TEST(Toolkit, OneArrayTwiceIsRefusedOrRight) {
+  using E = TypeParam;
+  for (const auto &op : operations<E>()) {
+    arguments<E> called(12);
+    called.once = true;
+    ASSERT_EQ(0, op.run(called));
+    const auto arrays = arrays_of(called);
+    for (std::size_t i = 0; i < arrays.size(); ++i)
+      for (std::size_t j = 0; j < arrays.size(); ++j) {
+        if (i == j || !arrays[i].handed_over || !arrays[j].handed_over) continue;
+        SCOPED_TRACE(testing::Message() << op.name << ", arrays " << i << " and " << j);
+        expect_as_documented(this->host, op, i, j, sharing::handle_without_block);
+        if (*arrays[i].type != *arrays[j].type) continue;
+        expect_as_documented(this->host, op, i, j, sharing::handle);
+        expect_as_documented(this->host, op, i, j, sharing::block);
+      }
   }
 }
 

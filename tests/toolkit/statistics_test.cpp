@@ -193,6 +193,11 @@ TYPED_TEST(LinearFit, RefusesInTheOrderOfTheChecks) {
     EXPECT_TRUE(std::isnan(fit.slope) && std::isnan(fit.intercept) && std::isnan(fit.residue));
     EXPECT_EQ(0, fit.iterations);
   }
+  // Scratch that the method does not need would still be emptied.
+  auto x = filled<TypeParam>({1, 2}), y = filled<TypeParam>({3, 4});
+  EXPECT_EQ(-20061,
+            partial_family<TypeParam>::linear_fit(y, x, nullptr, nullptr, nullptr, nullptr, 0, 0, 0, nullptr, x));
+  EXPECT_TRUE(y.elements().empty());
 }
 
 }  // namespace
