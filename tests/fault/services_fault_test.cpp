@@ -127,6 +127,12 @@ TEST(ServicesFaults, ADescriptorIsHadOrNot) {
   fail_each(allocations, create, [&](std::int32_t status, bool) { EXPECT_TRUE(status != 0 || out == known); });
   EXPECT_EQ(known, out);
   qsUtilHS_FreeArrayIDH_CSG(77);
+  // Lending it takes no memory that stays.
+  const nothing_left after_any_number(allocations);
+  for (int i = 0; i < 100; ++i) {
+    create();
+    qsUtilHS_FreeArrayIDH_CSG(77);
+  }
 }
 
 TEST(ServicesFaults, TransformsThatCannotBeSetUpAreNamed) {

@@ -206,6 +206,29 @@ TEST(ResamplerDescriptors, AreLentAgainOnceTheirOwnerIsReleased) {
   }
 }
 
+TEST(ResamplerDescriptors, TheOneLentLastIsLentFirst) {
+  const auto lend = [](std::uint64_t to) {
+    lumra_resampler_descriptor *out = nullptr;
+    EXPECT_EQ(0, qsUtilHS_FFTResampler_CSG_CreateDescriptor(&out, 242, 0, 0, to));
+    return out;
+  };
+  const auto *const a = lend(owner), *const b = lend(owner + 1);
+  for (const std::uint64_t first : {owner, owner + 1}) {  // the order of their return does not count
+    qsUtilHS_FreeArrayIDH_CSG(first);
+    qsUtilHS_FreeArrayIDH_CSG(2 * owner + 1 - first);
+    EXPECT_EQ(b, lend(owner + 1));
+    EXPECT_EQ(a, lend(owner));
+    qsUtilHS_FreeArrayIDH_CSG(owner + 1);
+    EXPECT_EQ(b, lend(owner + 1));
+  }
+  qsUtilHS_FreeArrayIDH_CSG(owner);
+  EXPECT_EQ(a, lend(owner));  // from now on the last one
+  qsUtilHS_FreeArrayIDH_CSG(owner);
+  qsUtilHS_FreeArrayIDH_CSG(owner + 1);
+  EXPECT_EQ(a, lend(owner));
+  qsUtilHS_FreeArrayIDH_CSG(owner);
+}
+
 TEST(ResamplerDescriptors, PrepareKeepsATransformOfTheLength) {
   lumra_resampler_descriptor descriptor{};
   ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, true));

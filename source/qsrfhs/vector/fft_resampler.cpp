@@ -8,6 +8,7 @@
 #include <exception>
 #include <memory>
 #include <new>
+#include <utility>
 
 #include "platform/immortal.hpp"
 #include "qsrfhs/math/fft.hpp"
@@ -152,44 +153,43 @@ descriptor_cache &descriptor_cache::instance() noexcept {
   return cache.get();
 }
 
-resampler_descriptor *descriptor_cache::take(const node &like) noexcept {
+descriptor_cache::entry *descriptor_cache::take(const purpose &wanted, std::uint64_t &turn_before) noexcept {
   const std::lock_guard lock(mutex_);
-  for (node *seen = newest_; seen; seen = seen->next) {
-    if (!seen->available || seen->length != like.length || seen->buffer_flag != like.buffer_flag ||
-        seen->inverse_flag != like.inverse_flag)
-      continue;
-    seen->available = false;
-    return seen->descriptor;
-  }
-  return nullptr;
+  entry *newest = nullptr;
+  for (entry *seen = first_; seen; seen = seen->next)
+    if (seen->available && seen->made_for == wanted && (!newest || seen->turn > newest->turn)) newest = seen;
+  if (!newest) return nullptr;
+  newest->available = false;
+  turn_before = std::exchange(newest->turn, ++turns_);
+  return newest;
 }
 
-void descriptor_cache::push(node &added) noexcept {
+void descriptor_cache::add(entry &made) noexcept {
   const std::lock_guard lock(mutex_);
-  added.next = newest_;
-  newest_ = &added;
+  made.turn = ++turns_;
+  made.next = std::exchange(first_, &made);
 }
 
-/// Undoes a push. Where the descriptor had been handed out before, it becomes available again.
-void descriptor_cache::withdraw(node &added, bool available) noexcept {
+void descriptor_cache::remove(entry &made) noexcept {
   const std::lock_guard lock(mutex_);
-  node **link = &newest_;
-  while (*link != &added) link = &(*link)->next;
-  *link = added.next;
-  if (!available) return;
-  for (node *seen = newest_; seen; seen = seen->next) {
-    if (seen->descriptor != added.descriptor) continue;
-    seen->available = true;
-    return;
-  }
+  entry **link = &first_;
+  while (*link != &made) link = &(*link)->next;
+  *link = made.next;
 }
 
-/// Marks the newest node of the descriptor. One without a node is beyond repair: it was never handed out.
+/// Undoes a take.
+void descriptor_cache::put_back(entry &taken, std::uint64_t turn_before) noexcept {
+  const std::lock_guard lock(mutex_);
+  taken.turn = turn_before;
+  taken.available = true;
+}
+
+/// One without an entry is beyond repair: it was never handed out.
 void descriptor_cache::give_back(std::uint64_t, void *descriptor) noexcept {
   descriptor_cache &cache = instance();
   const std::lock_guard lock(cache.mutex_);
-  node *seen = cache.newest_;
-  while (seen && seen->descriptor != descriptor) seen = seen->next;
+  entry *seen = cache.first_;
+  while (seen && &seen->descriptor != descriptor) seen = seen->next;
   if (!seen) std::terminate();
   seen->available = true;
 }
@@ -197,37 +197,38 @@ void descriptor_cache::give_back(std::uint64_t, void *descriptor) noexcept {
 std::int32_t descriptor_cache::create(resampler_descriptor **out, std::uint32_t length, std::uint32_t buffer_flag,
                                       std::uint32_t inverse_flag, std::uint64_t owner) noexcept {
   *out = nullptr;
-  // Both made first, so that nothing can fail once the descriptor is known to others.
-  std::unique_ptr<node> added(new (std::nothrow) node{nullptr, nullptr, length, buffer_flag, inverse_flag, false});
-  if (!added) return Management::addError(resampler_no_descriptor);
-  resampler_descriptor *const known = take(*added);
-  std::unique_ptr<resampler_descriptor> fresh;
-  if (!known) {
-    fresh.reset(new (std::nothrow) resampler_descriptor{});
-    if (!fresh) return Management::addError(resampler_no_descriptor);
-    fresh->length = length;
-    fresh->buffer_flag = buffer_flag;
-    fresh->inverse_flag = inverse_flag;
-    fresh->status = prepare(*fresh, length, inverse_flag != 0);
-    if (fresh->status == resampler_ok && buffer_flag != 0 && inverse_flag != 0 && !make_buffer(*fresh))
-      fresh->status = Management::addError(resampler_no_buffer);
-    if (const std::int32_t status = fresh->status; status != resampler_ok) {
-      release(*fresh);
+  const purpose wanted{length, buffer_flag, inverse_flag};
+  std::uint64_t turn_before = 0;
+  entry *lent = take(wanted, turn_before);
+  std::unique_ptr<entry> made;
+  if (!lent) {
+    made.reset(new (std::nothrow) entry);
+    if (!made) return Management::addError(resampler_no_descriptor);
+    made->made_for = wanted;
+    resampler_descriptor &fresh = made->descriptor;
+    fresh.length = length;
+    fresh.buffer_flag = buffer_flag;
+    fresh.inverse_flag = inverse_flag;
+    fresh.status = prepare(fresh, length, inverse_flag != 0);
+    if (fresh.status == resampler_ok && buffer_flag != 0 && inverse_flag != 0 && !make_buffer(fresh))
+      fresh.status = Management::addError(resampler_no_buffer);
+    if (const std::int32_t status = fresh.status; status != resampler_ok) {
+      release(fresh);
       return status;
     }
+    // In the cache before it is registered: from then on any thread may release the owner.
+    lent = made.get();
+    add(*lent);
   }
-  added->descriptor = known ? known : fresh.get();
-  // In the cache before it is registered: from then on any thread may release the owner.
-  push(*added);
-  if (const std::int32_t status = cleanup_registry::instance().add(owner, added->descriptor, &give_back)) {
-    withdraw(*added, known != nullptr);
+  if (const std::int32_t status = cleanup_registry::instance().add(owner, &lent->descriptor, &give_back)) {
+    if (!made) put_back(*lent, turn_before);
+    if (made) remove(*lent);
     Management::addError(status);
-    if (fresh) release(*fresh);
+    if (made) release(made->descriptor);
     return status;
   }
-  *out = added->descriptor;
-  (void)fresh.release();
-  (void)added.release();
+  *out = &lent->descriptor;
+  (void)made.release();
   return resampler_ok;
 }
 

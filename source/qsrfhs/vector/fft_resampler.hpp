@@ -37,8 +37,8 @@ std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, boo
 /// Frees transform and buffer and marks the descriptor as released, which is recorded as a code of its own.
 void release(resampler_descriptor &descriptor) noexcept;
 
-/// Descriptors that were handed out, newest first. They are never freed, only handed out again. Each time adds a node;
-/// what comes back is found by its newest, the older ones stay taken.
+/// Descriptors that were handed out. They are never freed, only handed out again: of those that are free and fit, the
+/// one that was handed out last.
 class descriptor_cache {
  public:
   static descriptor_cache &instance() noexcept;
@@ -48,20 +48,28 @@ class descriptor_cache {
                       std::uint32_t inverse_flag, std::uint64_t owner) noexcept;
 
  private:
-  struct node {
-    node *next = nullptr;
-    resampler_descriptor *descriptor = nullptr;
-    std::uint32_t length = 0, buffer_flag = 0, inverse_flag = 0;
+  /// What a descriptor was made for, whatever its owners write into it.
+  struct purpose {
+    std::uint32_t length, buffer_flag, inverse_flag;
+    friend bool operator==(const purpose &, const purpose &) = default;
+  };
+  struct entry {
+    resampler_descriptor descriptor{};
+    purpose made_for{};
+    std::uint64_t turn = 0;  // counts what the cache hands out
     bool available = false;
+    entry *next = nullptr;
   };
 
-  resampler_descriptor *take(const node &like) noexcept;
-  void push(node &added) noexcept;
-  void withdraw(node &added, bool available) noexcept;
+  entry *take(const purpose &wanted, std::uint64_t &turn_before) noexcept;
+  void add(entry &made) noexcept;
+  void remove(entry &made) noexcept;
+  void put_back(entry &taken, std::uint64_t turn_before) noexcept;
   static void give_back(std::uint64_t owner, void *descriptor) noexcept;
 
   std::mutex mutex_;
-  node *newest_ = nullptr;  // under mutex_
+  entry *first_ = nullptr;   // under mutex_
+  std::uint64_t turns_ = 0;  // under mutex_
 };
 
 /// Sizes of a resampler: n points forward, m backward, 1 <= m <= n; `overlap` samples at the output rate are dropped at
