@@ -164,7 +164,7 @@ TEST(DataFifo, RefusesForgedAndStaleHandlesCellsAndBuffers) {
   }
   EXPECT_EQ(-2, qsLTEHS_DataFIFO(f.handle, 0, nullptr, data.data(), 0, 1));
   EXPECT_EQ(-2, qsLTEHS_DataFIFO(f.handle, 1, data.data(), nullptr, 0, 1));
-  EXPECT_EQ(0, qsLTEHS_DataFIFO(f.handle, 1, nullptr, nullptr, 0, 0));
+  for (const int direction : {0, 1}) EXPECT_EQ(0, qsLTEHS_DataFIFO(f.handle, direction, nullptr, nullptr, 3, 0));
   EXPECT_EQ(-2, qsLTEHS_DataFIFO(f.handle, 0, data.data(), nullptr, 0, 0x80000000U));
   EXPECT_EQ(0U, f.fill());
   EXPECT_EQ(-2, qsLTEHS_DataFIFOUnreserve(nullptr));

@@ -302,8 +302,9 @@ int32_t qsLTEHS_DataFIFO(uint64_t handle, int32_t direction, const void *source,
   data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
   if (!fifo || count > longest) return fifo_unknown;
   if (count != 0 && !(reads ? destination : source)) return fifo_unknown;
-  if (reads) return fifo->read(handle, static_cast<std::byte *>(destination) + offset, count);
-  return fifo->write(handle, static_cast<const std::byte *>(source) + offset, count);
+  const std::uint32_t first = count == 0 ? 0 : offset;  // without bytes to move the memory may be null
+  if (reads) return fifo->read(handle, static_cast<std::byte *>(destination) + first, count);
+  return fifo->write(handle, static_cast<const std::byte *>(source) + first, count);
 }
 
 int32_t qsLTEHS_DataFIFO_GetStatus(uint64_t handle, uint32_t *capacity, uint32_t *fill) {
