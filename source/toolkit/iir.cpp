@@ -138,15 +138,14 @@ void filter(filter_arrays<E> &arrays, input<F> a, input<F> b, bool reset, const 
   constexpr int parts = is_complex<E> ? 2 : 1;
   auto &[record, forward_state, reverse_state] = arrays;
   const std::int32_t n = static_cast<std::int32_t>(record.values().size()), na = a.count(), nb = b.count();
-  const bool nothing_to_do = n < 1 || (nb < 1 && na < 1);
-  require(nothing_to_do || nb >= 1, empty_result);
+  if (n < 1 || (nb < 1 && na < 1)) return;
+  require(nb >= 1, empty_result);
   refuse_sharing(forward_state, record, reverse_state, a, b);
   refuse_sharing(reverse_state, record, a, b);
   const bool one_room = &room.forward == &room.reverse;
   refuse_sharing(room.forward, record, a, b, forward_state, reverse_state, saved_inputs);
   if (!one_room) refuse_sharing(room.reverse, record, a, b, forward_state, reverse_state, saved_inputs, room.forward);
   refuse_sharing(saved_inputs, record, a, b, forward_state, reverse_state);
-  if (nothing_to_do) return;
 
   const auto differs = [](const output<E> &state, std::int32_t count) {
     return !state.which().has_block() || static_cast<std::int32_t>(state.values().size()) != count;
