@@ -7,7 +7,7 @@
  *   the host's service (size argument: elements; rows times columns for a matrix), unless it has the count already.
  * - `scratch` handles are workspace: resized as needed and resized to 0 elements whenever the call ends. A null one is
  *   accepted where the options need none (-20999 otherwise). One that is also another array of the call, by its handle
- * or by its block, is refused with -20061, needed or not, and is emptied, too.
+ *   or by its block, is refused with -20061, needed or not, and is emptied, too.
  * - `slot` is the address of a pointer, null at first, that keeps a transform between calls. One that fits is used
  *   again, any other is replaced, whatever function left it. qsHost_ReleaseTransform frees it. With a null address the
  *   transform lives as long as the call.
