@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "host/resize_service.hpp"
+#include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_runtime.hpp"
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "toolkit/element.hpp"
@@ -284,7 +285,9 @@ std::int32_t toolkit_call(Work &&work, Outputs &...outputs) noexcept {
   std::int32_t code = success;
   try {
     const qsrfhs::mkl_runtime::use computing;
+    const qsrfhs::mkl_memory::watch watched;
     std::forward<Work>(work)();
+    require(!watched.refused(), no_memory);
   } catch (...) {
     code = status_of_current_exception();
   }

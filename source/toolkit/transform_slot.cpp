@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "qsrfhs/math/fft.hpp"
+#include "qsrfhs/math/mkl_memory.hpp"
 
 namespace toolkit {
 namespace {
@@ -34,11 +35,12 @@ void check_transform_size(std::int64_t points) {
 }
 
 transform::transform(const transform_kind &kind) : kind_(kind) {
+  const qsrfhs::mkl_memory::descriptor_watch watched;
   const MKL_LONG created = create(&descriptor_, kind);
   try {
-    check(created, no_transform);
+    check(watched.status(created), no_transform);
     configure();
-    check(DftiCommitDescriptor(descriptor_), no_transform);
+    check(watched.status(DftiCommitDescriptor(descriptor_)), no_transform);
   } catch (...) {
     (void)free();
     throw;
@@ -72,11 +74,13 @@ bool transform::free() noexcept {
 }
 
 void transform::forward(const void *in, void *out) const {
-  check(DftiComputeForward(descriptor_, const_cast<void *>(in), out), transform_failed);
+  const auto compute = [&] { return DftiComputeForward(descriptor_, const_cast<void *>(in), out); };
+  check(qsrfhs::mkl_memory::watched_status(compute), transform_failed);
 }
 
 void transform::backward(const void *in, void *out) const {
-  check(DftiComputeBackward(descriptor_, const_cast<void *>(in), out), transform_failed);
+  const auto compute = [&] { return DftiComputeBackward(descriptor_, const_cast<void *>(in), out); };
+  check(qsrfhs::mkl_memory::watched_status(compute), transform_failed);
 }
 
 transform_slot::transform_slot(void **slot) noexcept

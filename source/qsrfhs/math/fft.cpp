@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_status.hpp"
 
 namespace qsrfhs {
@@ -25,24 +26,29 @@ constexpr std::int32_t fft_size_unsupported = -312432;
 
 fft_transform::fft_transform(std::uint64_t length) : length_(length) {
   if (length > max_fft_length) throw invalid_argument(length_position, fft_size_unsupported);
+  const mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const MKL_LONG created = DftiCreateDescriptor(&handle, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
-  descriptor_.reset(handle);
-  throw_if_failed(created, create_position);
+  descriptor made(handle);
+  throw_if_failed(watched.status(created), create_position);
   throw_if_failed(DftiSetValue(handle, DFTI_PLACEMENT, DFTI_INPLACE), placement_position);
-  throw_if_failed(DftiCommitDescriptor(handle), commit_position);
+  throw_if_failed(watched.status(DftiCommitDescriptor(handle)), commit_position);
+  descriptor_ = std::move(made);
 }
 
 fft_transform::fft_transform(const fft_transform &prototype) : length_(prototype.length_) {
+  const mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const MKL_LONG copied = DftiCopyDescriptor(prototype.descriptor_.get(), &handle);
-  descriptor_.reset(handle);
-  throw_if_failed(copied, copy_position);
-  throw_if_failed(DftiCommitDescriptor(handle), commit_copy_position);
+  descriptor made(handle);
+  throw_if_failed(watched.status(copied), copy_position);
+  throw_if_failed(watched.status(DftiCommitDescriptor(handle)), commit_copy_position);
+  descriptor_ = std::move(made);
 }
 
 void fft_transform::forward(std::complex<float> *data) {
-  throw_if_failed(DftiComputeForward(descriptor_.get(), data), forward_position);
+  const auto compute = [&] { return DftiComputeForward(descriptor_.get(), data); };
+  throw_if_failed(mkl_memory::watched_status(compute), forward_position);
 }
 
 fft_lease::~fft_lease() {

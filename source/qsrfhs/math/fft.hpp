@@ -34,7 +34,9 @@ class fft_transform {
   struct free_descriptor {
     void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept { (void)DftiFreeDescriptor(&descriptor); }
   };
-  std::unique_ptr<DFTI_DESCRIPTOR, free_descriptor> descriptor_;
+  using descriptor = std::unique_ptr<DFTI_DESCRIPTOR, free_descriptor>;
+
+  descriptor descriptor_;
   std::uint64_t length_;
 };
 

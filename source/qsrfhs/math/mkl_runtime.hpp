@@ -4,12 +4,6 @@
 
 namespace qsrfhs::mkl_runtime {
 
-/// Selects interface and threading layer where MKL is the shared libmkl_rt. Before any other MKL call.
-void attach() noexcept;
-
-/// Frees MKL's memory, unless other threads still compute with it.
-void detach() noexcept;
-
 /// Held while a thread computes with MKL. The first one of a thread arranges for its clean-up.
 class use {
  public:

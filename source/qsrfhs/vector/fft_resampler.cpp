@@ -12,6 +12,7 @@
 
 #include "platform/immortal.hpp"
 #include "qsrfhs/math/fft.hpp"
+#include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_runtime.hpp"
 #include "qsrfhs/math/mkl_status.hpp"
 #include "qsrfhs/util/array_store.hpp"
@@ -36,7 +37,8 @@ bool free_transform(resampler_descriptor &descriptor) noexcept {
   return freed;
 }
 
-std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool inverse) noexcept {
+std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool inverse,
+                    const mkl_memory::watch &watched) noexcept {
   if (descriptor.transform) {
     MKL_LONG present = 0;
     if (failed(DftiGetValue(transform_of(descriptor), DFTI_LENGTHS, &present))) return resampler_length_query;
@@ -47,14 +49,14 @@ std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool
   DFTI_DESCRIPTOR_HANDLE made = nullptr;
   const MKL_LONG created = DftiCreateDescriptor(&made, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
   descriptor.transform = made;
-  if (failed(created)) return resampler_create;
+  if (failed(watched.status(created))) return resampler_create;
   if (inverse) {
     if (failed(DftiSetValue(made, DFTI_BACKWARD_SCALE, 1.0 / length))) return resampler_scale;
     if (failed(DftiSetValue(made, DFTI_PLACEMENT, DFTI_INPLACE))) return resampler_in_place;
   } else if (failed(DftiSetValue(made, DFTI_PLACEMENT, DFTI_NOT_INPLACE))) {
     return resampler_out_of_place;
   }
-  return failed(DftiCommitDescriptor(made)) ? resampler_commit : resampler_ok;
+  return failed(watched.status(DftiCommitDescriptor(made))) ? resampler_commit : resampler_ok;
 }
 
 bool make_buffer(resampler_descriptor &descriptor) noexcept {
@@ -132,7 +134,8 @@ void put_out(const resampler_plan &plan, resampler_channel &channel, const sampl
 
 std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, bool inverse) noexcept {
   const mkl_runtime::use in_use;
-  const std::int32_t status = set_up(descriptor, length, inverse);
+  const mkl_memory::descriptor_watch watched;
+  const std::int32_t status = set_up(descriptor, length, inverse, watched);
   if (status == resampler_ok) return status;
   Management::addError(status);
   if (descriptor.transform && !free_transform(descriptor)) Management::addError(resampler_free_failed_again);
@@ -236,14 +239,17 @@ void process_block(const resampler_plan &plan, resampler_descriptor &forward, re
                    const sample *input, sample *spectrum, std::uint64_t block, bool first,
                    std::span<resampler_channel> channels) noexcept {
   const mkl_runtime::use in_use;
-  if (prepare(forward, plan.n, false) != resampler_ok ||
-      failed(DftiComputeForward(transform_of(forward), const_cast<sample *>(input), spectrum)))
+  const auto transform_forward = [&] {
+    return DftiComputeForward(transform_of(forward), const_cast<sample *>(input), spectrum);
+  };
+  if (prepare(forward, plan.n, false) != resampler_ok || failed(mkl_memory::watched_status(transform_forward)))
     Management::addError(resampler_forward);
   auto *const bins = static_cast<sample *>(inverse.aligned_buffer);
   const auto start = static_cast<double>(block * plan.hop());
   for (resampler_channel &channel : channels) {
     fill_bins(plan, channel, start * channel.phase_step + channel.phase_start, spectrum, bins);
-    if (prepare(inverse, plan.m, true) != resampler_ok || failed(DftiComputeBackward(transform_of(inverse), bins)))
+    const auto transform_backward = [&] { return DftiComputeBackward(transform_of(inverse), bins); };
+    if (prepare(inverse, plan.m, true) != resampler_ok || failed(mkl_memory::watched_status(transform_backward)))
       Management::addError(resampler_backward);
     put_out(plan, channel, bins, first);
   }
