@@ -62,6 +62,8 @@ static void *refuse(void) {
   return NULL;
 }
 
+#pragma GCC visibility push(default) /* all libraries are to find these */
+
 void *malloc(size_t size) {
   return fails() ? refuse() : made(__libc_malloc(size));
 }
@@ -99,6 +101,8 @@ void free(void *block) {
   if (block) --live;
   __libc_free(block);
 }
+
+#pragma GCC visibility pop
 
 __attribute__((constructor)) static void begin(void) {
   const char *at = getenv("LUMRA_FAIL_AT"), *count = getenv("LUMRA_FAIL_COUNT");
