@@ -283,14 +283,14 @@ class scratch {
 template <class Work, class... Outputs>
 std::int32_t toolkit_call(Work &&work, Outputs &...outputs) noexcept {
   std::int32_t code = success;
+  const qsrfhs::mkl_memory::watch watched;  // BLAS has no status, and LAPACK's may say success or bad arguments
   try {
     const qsrfhs::mkl_runtime::use computing;
-    const qsrfhs::mkl_memory::watch watched;
     std::forward<Work>(work)();
-    require(!watched.refused(), no_memory);
   } catch (...) {
     code = status_of_current_exception();
   }
+  if (watched.refused()) code = no_memory;
   if (code < 0) (outputs.clear(), ...);
   return code;
 }

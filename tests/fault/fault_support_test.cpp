@@ -2,38 +2,11 @@
 // SPDX-License-Identifier: MIT
 #include <mkl_dfti.h>
 
-#include <new>
-
 #include "support/faults.hpp"
 
 namespace {
 
 using namespace tests;
-
-TEST(FaultInjection, TheChosenAllocationFails) {
-  long left = -1;
-  const int calls = fail_each(
-      allocations,
-      [&] {
-        const long before = allocations.live;
-        void *first = nullptr, *second = nullptr;  // calls that no compiler may leave out
-        first = ::operator new(1, std::nothrow);
-        try {
-          second = ::operator new[](1, std::align_val_t{64});
-        } catch (const std::bad_alloc &) {
-        }
-        const long made = allocations.live - before;
-        ::operator delete(first);
-        ::operator delete[](second, std::align_val_t{64});
-        left = allocations.live - before;
-        return made;
-      },
-      [&](long made, bool failed) {
-        EXPECT_EQ(failed ? 1 : 2, made);
-        EXPECT_EQ(0, left);
-      });
-  EXPECT_EQ(2, calls);
-}
 
 TEST(FaultInjection, TheChosenTransformCallFails) {
   const long before = transforms.live;

@@ -5,36 +5,12 @@
 #include <mkl_lapack.h>
 
 #include <cstdarg>
-#include <cstddef>
-#include <cstdint>
-#include <cstdlib>
-#include <new>
 
 namespace tests {
 
-constinit fault_counter allocations, zeroed, transforms, lapack;
+constinit fault_counter transforms, lapack;
 
 namespace {
-
-constexpr std::align_val_t plain{alignof(std::max_align_t)};
-
-void *allocate(std::size_t size, std::align_val_t alignment) noexcept {
-  const auto unit = static_cast<std::size_t>(alignment);
-  if (allocations.fails() || size > SIZE_MAX - unit) return nullptr;
-  void *memory = std::aligned_alloc(unit, (size + unit - 1) / unit * unit);
-  if (memory) ++allocations.live;
-  return memory;
-}
-
-void *allocate_or_throw(std::size_t size, std::align_val_t alignment) {
-  if (void *memory = allocate(size, alignment)) return memory;
-  throw std::bad_alloc();
-}
-
-void release(void *memory) noexcept {
-  if (memory) --allocations.live;
-  std::free(memory);
-}
 
 // MKL's own calls from one of its functions to another are not counted.
 thread_local int depth = 0;
@@ -59,47 +35,7 @@ using namespace tests;
 using descriptor = DFTI_DESCRIPTOR_HANDLE;
 using size = const MKL_INT *;
 
-// All of them: a sanitizer's own forms do not go together with these.
-#define OPERATORS(NEW, DELETE)                                                             \
-  void *operator NEW(std::size_t n) {                                                      \
-    return allocate_or_throw(n, plain);                                                    \
-  }                                                                                        \
-  void *operator NEW(std::size_t n, std::align_val_t a) {                                  \
-    return allocate_or_throw(n, a);                                                        \
-  }                                                                                        \
-  void *operator NEW(std::size_t n, const std::nothrow_t &) noexcept {                     \
-    return allocate(n, plain);                                                             \
-  }                                                                                        \
-  void *operator NEW(std::size_t n, std::align_val_t a, const std::nothrow_t &) noexcept { \
-    return allocate(n, a);                                                                 \
-  }                                                                                        \
-  void operator DELETE(void *p) noexcept {                                                 \
-    release(p);                                                                            \
-  }                                                                                        \
-  void operator DELETE(void *p, std::size_t) noexcept {                                    \
-    release(p);                                                                            \
-  }                                                                                        \
-  void operator DELETE(void *p, std::align_val_t) noexcept {                               \
-    release(p);                                                                            \
-  }                                                                                        \
-  void operator DELETE(void *p, std::size_t, std::align_val_t) noexcept {                  \
-    release(p);                                                                            \
-  }                                                                                        \
-  void operator DELETE(void *p, const std::nothrow_t &) noexcept {                         \
-    release(p);                                                                            \
-  }                                                                                        \
-  void operator DELETE(void *p, std::align_val_t, const std::nothrow_t &) noexcept {       \
-    release(p);                                                                            \
-  }
-OPERATORS(new, delete)
-OPERATORS(new[], delete[])
-
 extern "C" {
-
-void *__real_calloc(std::size_t, std::size_t);
-void *__wrap_calloc(std::size_t n, std::size_t width) {
-  return zeroed.fails() ? nullptr : __real_calloc(n, width);
-}
 
 // REAL is variadic where MKL's own is: such functions look at a register that other calls leave alone. In-place calls
 // pass no output; the register that is read for it then is handed on and not looked at.

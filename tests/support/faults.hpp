@@ -6,8 +6,6 @@
 
 namespace tests {
 
-extern fault_counter allocations;  // every form of operator new
-extern fault_counter zeroed;       // calloc
 /// DFTI calls; DFTI_MEMORY_ERROR. A call to free a descriptor that fails has freed it nevertheless.
 extern fault_counter transforms;
 extern fault_counter lapack;  // a call that fails does nothing but tell its status as `info`

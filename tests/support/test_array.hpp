@@ -151,6 +151,7 @@ class fake_host {
     const std::size_t header = host::header_size(element, dimensions);
     const std::size_t width = self.unit_ == unit::bytes ? 1 : host::element_size(element);
     void *fresh = new_block(header, static_cast<std::size_t>(size) * width);
+    if (!fresh) return 1;
     if (*handle) std::memcpy(fresh, *handle, header);  // the sizes stay as they were; the elements need not
     free_block(*handle);
     *handle = fresh;
