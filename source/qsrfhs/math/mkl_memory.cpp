@@ -14,9 +14,12 @@
 #include <new>
 
 namespace qsrfhs::mkl_memory {
+
+constinit thread_local std::uint64_t refusals = 0;
+
 namespace {
 
-constinit thread_local watch *innermost = nullptr;
+constinit thread_local descriptor_watch *making = nullptr;
 constinit thread_local bool has_thread_state = false;
 
 void unlink(block &linked) noexcept {
@@ -37,15 +40,14 @@ void link(block &made, block &ring) noexcept {
 /// What MKL calls instead of malloc and its kin.
 struct hooks {
   static void *allocate(std::size_t size) noexcept {
-    auto *const scope =
-        innermost && innermost->makes_descriptor_ ? static_cast<descriptor_watch *>(innermost) : nullptr;
+    descriptor_watch *const scope = making;
     const bool vital = size <= descriptor_watch::vital_size;
     bool reserved = false;
     void *memory = nullptr;
-    if (size <= SIZE_MAX - sizeof(block) && (!scope || !scope->refused_ || vital))
+    if (size <= SIZE_MAX - sizeof(block) && (!scope || !scope->refused() || vital))
       memory = std::malloc(sizeof(block) + size);
     if (!memory) {
-      if (innermost) innermost->refused_ = true;
+      ++refusals;
       reserved = scope && vital && scope->reserve_used_ < descriptor_watch::reserve_count;
       if (!reserved) return nullptr;
       memory = scope->reserve_[scope->reserve_used_++].memory;
@@ -86,14 +88,6 @@ void attach() noexcept {
 #endif
 }
 
-watch::watch() noexcept : outer_(innermost) {
-  innermost = this;
-}
-
-watch::~watch() {
-  innermost = outer_;
-}
-
 descriptor_watch::descriptor_watch() noexcept {
   // MKL's own record of the thread outlives the descriptor: it is made before the descriptor's blocks are told apart.
   if (!has_thread_state) {
@@ -101,10 +95,11 @@ descriptor_watch::descriptor_watch() noexcept {
     has_thread_state = any && !refused();
     mkl_free(any);
   }
-  makes_descriptor_ = true;
+  making = this;
 }
 
 descriptor_watch::~descriptor_watch() {
+  making = nullptr;
   if (refused()) mkl_thread_free_buffers();  // the thread's, not lost
   while (made_.next != &made_) {
     block *const made = made_.next;

@@ -6,6 +6,7 @@
 #include <mkl_dfti.h>
 
 #include <cstddef>
+#include <cstdint>
 
 namespace qsrfhs::mkl_memory {
 
@@ -19,26 +20,26 @@ struct alignas(16) block {
   bool reserved;  // lies in the scope's reserve
 };
 
-/// Held by one thread around calls to MKL; of nested ones the innermost counts.
+/// Of the thread; those that a watch has seen are taken back when it ends.
+extern constinit thread_local std::uint64_t refusals;
+
+/// Held by one thread around calls to MKL; of nested ones the innermost sees a refusal.
 class watch {
  public:
-  watch() noexcept;
+  watch() noexcept = default;
   watch(const watch &) = delete;
   watch &operator=(const watch &) = delete;
-  ~watch();
+  ~watch() {
+    if (refused()) refusals = before_;
+  }
 
   /// True when MKL was refused memory: its results are undefined.
-  [[nodiscard]] bool refused() const noexcept { return refused_; }
+  [[nodiscard]] bool refused() const noexcept { return refusals != before_; }
   /// MKL's status, or DFTI_MEMORY_ERROR where it was refused memory.
-  [[nodiscard]] MKL_LONG status(MKL_LONG of_call) const noexcept { return refused_ ? DFTI_MEMORY_ERROR : of_call; }
-
- protected:
-  bool makes_descriptor_ = false;
+  [[nodiscard]] MKL_LONG status(MKL_LONG of_call) const noexcept { return refused() ? DFTI_MEMORY_ERROR : of_call; }
 
  private:
-  friend struct hooks;
-  watch *const outer_;
-  bool refused_ = false;
+  const std::uint64_t before_ = refusals;
 };
 
 /// The status of one call that may allocate.
