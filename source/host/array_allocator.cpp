@@ -4,6 +4,7 @@
 #include <cstring>
 #include <limits>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 
 namespace host {
@@ -14,6 +15,8 @@ constexpr std::uint64_t max_count = std::numeric_limits<std::int32_t>::max();
 bool is_valid(element_type type, std::int32_t dimensions) noexcept {
   return element_size(type) != 0 && (dimensions == 1 || dimensions == 2);
 }
+
+const platform::fork_participant<array_allocator> takes_part(platform::fork_rank::host_arrays);
 
 }  // namespace
 

@@ -29,6 +29,10 @@ class array_allocator {
   std::int32_t resize(element_type type, std::int32_t dimensions, void ***handle, std::uint64_t count) noexcept;
   void destroy(void ***handle) noexcept;
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
+
  private:
   static constexpr std::align_val_t alignment{64};
   struct aligned_delete {

@@ -2,8 +2,10 @@
 #include "host/resize_service.hpp"
 
 #include <atomic>
+#include <mutex>
 
 #include "host/array_allocator.hpp"
+#include "platform/fork.hpp"
 #include "platform/process.hpp"
 
 namespace host {
@@ -14,12 +16,21 @@ std::int32_t own_service(std::int32_t type, std::int32_t dimensions, void *handl
                                             count);
 }
 
-// The service in use; null until the process has been searched. Threads that search at once find the same.
+// The service in use; null until the process has been searched.
 std::atomic<lumra_array_resize> service_in_use{nullptr};
+
+// Held for the search: no fork may find another thread in it, as the system's loader has a lock of its own.
+constinit std::mutex search_mutex;
+
+constexpr platform::fork_handlers fork_handlers{[]() noexcept { search_mutex.lock(); },
+                                                []() noexcept { search_mutex.unlock(); },
+                                                []() noexcept { search_mutex.unlock(); }};
+const platform::fork_participation takes_part(platform::fork_rank::resize_service, fork_handlers);
 
 lumra_array_resize service() noexcept {
   lumra_array_resize service = service_in_use.load(std::memory_order_acquire);
   if (service) return service;
+  const std::lock_guard lock(search_mutex);
   const auto found = reinterpret_cast<lumra_array_resize>(platform::find_symbol("HostArrayResize"));
   const lumra_array_resize wanted = found ? found : &own_service;
   // A service handed over meanwhile wins.

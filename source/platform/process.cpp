@@ -21,8 +21,8 @@ void pin_library(void *address) noexcept {
 }
 
 std::uint32_t thread_id() noexcept {
-  thread_local const auto id = static_cast<std::uint32_t>(syscall(SYS_gettid));
-  return id;
+  // Asked each time: a thread that remembered its number would take it into the child of a fork.
+  return static_cast<std::uint32_t>(syscall(SYS_gettid));
 }
 
 bool is_readable(const void *begin, std::size_t bytes) noexcept {

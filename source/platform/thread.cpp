@@ -1,20 +1,56 @@
 // SPDX-License-Identifier: MIT
 #include "platform/thread.hpp"
 
-#include <pthread.h>
 #include <sys/resource.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <system_error>
+#include <utility>
+
 namespace platform {
+
+thread::thread(routine run, void *argument) {
+  if (const int error = pthread_create(&id_, nullptr, run, argument))
+    throw std::system_error(error, std::system_category());
+  joinable_ = true;
+}
+
+thread &thread::operator=(thread &&from) noexcept {
+  id_ = from.id_;
+  joinable_ = std::exchange(from.joinable_, false);
+  return *this;
+}
+
+void thread::join() noexcept {
+  (void)pthread_join(id_, nullptr);
+  joinable_ = false;
+}
+
+void thread::detach() noexcept {
+  (void)pthread_detach(id_);
+  joinable_ = false;
+}
+
+thread_end::thread_end(void (*begin)() noexcept, void (*end)() noexcept) noexcept
+    : begin_{this, begin, &end_}, end_{this, end, nullptr} {
+  (void)pthread_key_create(&key_, &take);
+}
+
+/// The system goes over all keys once more where a destructor has set a value: that is behind the others' destructors.
+void thread_end::take(void *value) noexcept {
+  step &taken = *static_cast<step *>(value);
+  taken.call();
+  if (taken.following) taken.of->set(*taken.following);
+}
+
+void thread_end::set(step &next) noexcept {
+  (void)pthread_setspecific(key_, &next);
+}
 
 void raise_thread_priority() noexcept {
   constexpr int highest = -20;
   (void)setpriority(PRIO_PROCESS, static_cast<id_t>(syscall(SYS_gettid)), highest);  // most users may not
-}
-
-void at_fork(void (*before)(), void (*after_in_parent)(), void (*after_in_child)()) noexcept {
-  (void)pthread_atfork(before, after_in_parent, after_in_child);
 }
 
 }  // namespace platform

@@ -10,6 +10,7 @@
 
 #include "qsrfhs/math/fft.hpp"
 #include "qsrfhs/math/mkl_memory.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 
 namespace toolkit {
 namespace {
@@ -35,6 +36,7 @@ void check_transform_size(std::int64_t points) {
 }
 
 transform::transform(const transform_kind &kind) : kind_(kind) {
+  const qsrfhs::mkl_section section;
   const qsrfhs::mkl_memory::descriptor_watch watched;
   const MKL_LONG created = create(&descriptor_, kind);
   try {
@@ -69,6 +71,7 @@ bool transform::fits(const transform_kind &wanted) const {
 }
 
 bool transform::free() noexcept {
+  const qsrfhs::mkl_section section;
   DFTI_DESCRIPTOR_HANDLE held = std::exchange(descriptor_, nullptr);
   return !held || !is_error(DftiFreeDescriptor(&held));
 }

@@ -8,6 +8,7 @@
 #include <cstring>
 #include <string_view>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 
 namespace c_support {
@@ -36,7 +37,35 @@ void write_entry(const qsrfhs::log::entry &entry, char *buffer, std::uint64_t si
   *buffer = '\0';
 }
 
+const platform::fork_participant<SessionManager> takes_part(platform::fork_rank::sessions);
+
 }  // namespace
+
+LumraAlgoSession::LumraAlgoSession() {
+  SessionManager::instance().link(*this);
+}
+
+LumraAlgoSession::~LumraAlgoSession() {
+  SessionManager::instance().unlink(*this);
+}
+
+void LumraAlgoSession::before_fork() noexcept {
+  window_mutex_.lock();
+  context.before_fork();
+  log.before_fork();
+}
+
+void LumraAlgoSession::after_fork_in_parent() noexcept {
+  log.after_fork_in_parent();
+  context.after_fork_in_parent();
+  window_mutex_.unlock();
+}
+
+void LumraAlgoSession::after_fork_in_child() noexcept {
+  log.after_fork_in_child();
+  context.after_fork_in_child();
+  window_mutex_.unlock();
+}
 
 LumraAlgoSession::window LumraAlgoSession::find_window(window_key key, bool *known) const {
   const std::lock_guard lock(window_mutex_);
@@ -81,6 +110,38 @@ SessionManager::session SessionManager::remove(std::uint64_t handle) {
     sessions_.erase(found);
   }
   return removed;
+}
+
+void SessionManager::link(LumraAlgoSession &made) noexcept {
+  const std::lock_guard lock(mutex_);
+  made.older_ = newest_;
+  if (newest_) newest_->newer_ = &made;
+  newest_ = &made;
+}
+
+void SessionManager::unlink(LumraAlgoSession &gone) noexcept {
+  const std::lock_guard lock(mutex_);
+  (gone.newer_ ? gone.newer_->older_ : newest_) = gone.older_;
+  if (gone.older_) gone.older_->newer_ = gone.newer_;
+}
+
+void SessionManager::for_each(void (LumraAlgoSession::*function)() noexcept) noexcept {
+  for (LumraAlgoSession *each = newest_; each; each = each->older_) (each->*function)();
+}
+
+void SessionManager::before_fork() noexcept {
+  mutex_.lock();
+  for_each(&LumraAlgoSession::before_fork);
+}
+
+void SessionManager::after_fork_in_parent() noexcept {
+  for_each(&LumraAlgoSession::after_fork_in_parent);
+  mutex_.unlock();
+}
+
+void SessionManager::after_fork_in_child() noexcept {
+  for_each(&LumraAlgoSession::after_fork_in_child);
+  mutex_.unlock();
 }
 
 }  // namespace c_support

@@ -26,6 +26,7 @@ constexpr std::int32_t fft_size_unsupported = -312432;
 
 fft_transform::fft_transform(std::uint64_t length) : length_(length) {
   if (length > max_fft_length) throw invalid_argument(length_position, fft_size_unsupported);
+  const mkl_section section;
   const mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const MKL_LONG created = DftiCreateDescriptor(&handle, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
@@ -37,6 +38,7 @@ fft_transform::fft_transform(std::uint64_t length) : length_(length) {
 }
 
 fft_transform::fft_transform(const fft_transform &prototype) : length_(prototype.length_) {
+  const mkl_section section;
   const mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const MKL_LONG copied = DftiCopyDescriptor(prototype.descriptor_.get(), &handle);

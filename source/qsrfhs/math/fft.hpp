@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "qsrfhs/math/mkl_runtime.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 
 namespace qsrfhs {
 
@@ -32,7 +33,10 @@ class fft_transform {
 
  private:
   struct free_descriptor {
-    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept { (void)DftiFreeDescriptor(&descriptor); }
+    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept {
+      const mkl_section section;
+      (void)DftiFreeDescriptor(&descriptor);
+    }
   };
   using descriptor = std::unique_ptr<DFTI_DESCRIPTOR, free_descriptor>;
 
@@ -74,6 +78,10 @@ class fft_pool {
   /// Slots to keep for a length that is borrowed without having been prefilled.
   void set_reserve_slots(std::int64_t count) noexcept { reserve_slots_ = count; }
   [[nodiscard]] std::int64_t idle_count() const;
+
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
 
  private:
   friend class fft_lease;

@@ -4,11 +4,17 @@
 #include <algorithm>
 #include <functional>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "qsrfhs/math/filter_design.hpp"
 #include "qsrfhs/util/management.hpp"
 
 namespace qsrfhs {
+namespace {
+
+const platform::fork_participant<filter_registry> takes_part(platform::fork_rank::filters);
+
+}  // namespace
 
 static_assert(sizeof(lumra_filter_key) == 48 && sizeof(lumra_filter_record) == 32);
 

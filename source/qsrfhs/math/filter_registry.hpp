@@ -42,6 +42,10 @@ class filter_registry {
   /// Bytes that all filters count for, erased ones with references included.
   [[nodiscard]] std::uint64_t total_cost() const noexcept;
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
+
  private:
   struct entry : lumra_filter_entry {
     std::unique_ptr<Filter> filter;

@@ -8,6 +8,7 @@
 
 #include "host/host_array.hpp"
 #include "host/resize_service.hpp"
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "qsrfhs/util/management.hpp"
 
@@ -80,6 +81,9 @@ void copy_with_zeros(std::span<const lumra_cf32> array, std::int64_t offset, std
   std::fill(out.begin(), out.begin() + first, zero);
   std::fill(out.begin() + last, out.end(), zero);
 }
+
+const platform::fork_participant<cleanup_registry> registry_takes_part(platform::fork_rank::registered_arrays);
+const platform::fork_participant<recycler> blocks_take_part(platform::fork_rank::recycled_arrays);
 
 }  // namespace
 

@@ -32,6 +32,10 @@ class recycler {
   array_block &take(std::uint32_t count);
   void give_back(array_block &block) noexcept;
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
+
  private:
   static constexpr std::uint32_t large_class = 32768;  // all blocks from 128 MiB on
 
@@ -66,6 +70,10 @@ class cleanup_registry {
     visit();
     return true;
   }
+
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
 
   static constexpr std::int32_t no_memory = -46;  // not a recorded code
 

@@ -84,19 +84,23 @@ std::int32_t batch_scheduler::RunBatch(worker work, void *records, std::uint32_t
 }
 
 /// Fills the team's empty places. A thread that cannot be made leaves its place empty for the next batch to try again.
-void batch_scheduler::start_team(team_kind kind) {
+/// False once stopped.
+bool batch_scheduler::start_team(team_kind kind) {
   std::int32_t failures = 0;
   {
     const std::lock_guard lock(mutex_);
     team &starting = kind == team_kind::shared ? state_.shared : state_.pinned;
-    if (state_.stopping || starting.running == cpu_count_) return;
+    if (state_.stopping) return false;
+    if (starting.running == cpu_count_) return true;
     for (std::int32_t i = 0; i < cpu_count_; ++i) {
       slot &place = starting.slots[static_cast<std::size_t>(i)];
       if (place.occupied) continue;
       if (place.thread.joinable()) place.thread.detach();  // it has left
       try {
-        place.thread = kind == team_kind::shared ? std::thread([this, &place] { serve_shared(place); })
-                                                 : std::thread([this, &place] { serve_pinned(place); });
+        place.scheduler = this;
+        place.thread = platform::thread(
+            kind == team_kind::shared ? &serve<&batch_scheduler::serve_shared> : &serve<&batch_scheduler::serve_pinned>,
+            &place);
         place.occupied = true;
       } catch (const std::exception &) {
         ++failures;
@@ -105,6 +109,7 @@ void batch_scheduler::start_team(team_kind kind) {
   }
   for (; failures > 0; --failures)
     (void)record_(kind == team_kind::shared ? shared_thread_failed : pinned_thread_failed);
+  return true;
 }
 
 void batch_scheduler::fill(batch &filled, worker work, void *records, std::uint32_t count,
@@ -129,7 +134,11 @@ void batch_scheduler::set_work_event() noexcept {
 }
 
 std::int32_t batch_scheduler::run_shared(worker work, void *records, std::uint32_t count, std::size_t record_size) {
-  start_team(team_kind::shared);
+  if (!start_team(team_kind::shared)) {
+    auto *const record = static_cast<std::byte *>(records);
+    for (std::uint32_t i = 0; i < count; ++i) work(record + i * record_size, nullptr);
+    return 0;
+  }
   bool in_time = true;
   {
     const auto deadline = steady_clock::now() + limit_;
@@ -215,7 +224,7 @@ void batch_scheduler::serve_shared(slot &own) {
 }
 
 std::int32_t batch_scheduler::run_pinned(worker work, void *records, std::uint32_t count, std::size_t record_size) {
-  start_team(team_kind::pinned);
+  (void)start_team(team_kind::pinned);
   bool in_time = true;
   {
     const auto deadline = steady_clock::now() + limit_;

@@ -13,7 +13,8 @@
 #include <cstddef>
 #include <cstdint>
 #include <mutex>
-#include <thread>
+
+#include "platform/thread.hpp"
 
 namespace qsrfhs {
 
@@ -41,8 +42,8 @@ class batch_scheduler {
   /// hold the same batch.
   std::int32_t RunBatch(worker work, void *records, std::uint32_t count, std::size_t record_size, std::int32_t mode);
 
-  /// Lets all threads leave and joins them. One that is busy for longer than a second is left alone. No batch runs
-  /// afterwards.
+  /// Lets all threads leave and joins them. One that is busy for longer than a second is left alone. Records in
+  /// shared mode run in their caller from then on, those in pinned mode do not run.
   void stop() noexcept;
 
   /// Starts afresh in the child of a fork, where no thread has survived. The mutex is held.
@@ -68,7 +69,8 @@ class batch_scheduler {
 
   /// Place of a thread in its team.
   struct slot {
-    std::thread thread;
+    batch_scheduler *scheduler = nullptr;
+    platform::thread thread;
     bool occupied = false;  // a thread was made and has not left
     bool stop = false;
     // Pinned team only.
@@ -99,7 +101,7 @@ class batch_scheduler {
 
   std::int32_t run_shared(worker work, void *records, std::uint32_t count, std::size_t record_size);
   std::int32_t run_pinned(worker work, void *records, std::uint32_t count, std::size_t record_size);
-  void start_team(team_kind kind);
+  bool start_team(team_kind kind);
   void fill(batch &filled, worker work, void *records, std::uint32_t count, std::size_t record_size) noexcept;
   bool await(std::unique_lock<std::mutex> &lock, batch &awaited) const;
   batch *take_task(std::uint32_t &index, bool &more) noexcept;
@@ -107,6 +109,14 @@ class batch_scheduler {
   void serve_shared(slot &own);
   void serve_pinned(slot &own);
   void finish_task(batch &of);
+
+  /// A thread's routine; its argument is its slot.
+  template <void (batch_scheduler::*service)(slot &)>
+  static void *serve(void *own) {
+    auto &place = *static_cast<slot *>(own);
+    (place.scheduler->*service)(place);
+    return nullptr;
+  }
 
   std::mutex &mutex_;
   const std::int32_t cpu_count_;

@@ -13,7 +13,6 @@ namespace qsrfhs {
 class brief_mutex {
  public:
   void lock() {
-    static const int rounds = platform::processor_count() > 1 ? 50 : 1;
     for (int round = 0; round < rounds; ++round) {
       if (mutex_.try_lock()) return;
       _mm_pause();
@@ -24,6 +23,9 @@ class brief_mutex {
   void unlock() { mutex_.unlock(); }
 
  private:
+  // Made while the library is loaded; before that nobody waits.
+  static inline const int rounds = platform::processor_count() > 1 ? 50 : 1;
+
   std::mutex mutex_;
 };
 

@@ -10,6 +10,7 @@
 #include <new>
 #include <utility>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 
 namespace qsrfhs {
@@ -19,6 +20,8 @@ using namespace std::chrono_literals;
 
 constexpr std::chrono::milliseconds longest_wait = 100ms;
 constexpr std::int32_t internal_error = -312402;
+
+const platform::fork_participant<fifo_table> takes_part(platform::fork_rank::fifos);
 
 }  // namespace
 
@@ -174,6 +177,27 @@ std::int32_t data_fifo::get_status(std::uint64_t handle, std::uint32_t &capacity
   return fifo_ok;
 }
 
+void data_fifo::before_fork() noexcept {
+  for (end *side : {&writer_, &reader_}) side->mutex.lock();
+  for (end *side : {&writer_, &reader_}) side->wish.before_fork();
+}
+
+void data_fifo::after_fork_in_parent() noexcept {
+  for (end *side : {&reader_, &writer_}) {
+    side->wish.after_fork_in_parent();
+    side->mutex.unlock();
+  }
+}
+
+void data_fifo::after_fork_in_child() noexcept {
+  for (end *side : {&reader_, &writer_}) {
+    side->wish.after_fork_in_child();
+    side->waiting = 0;
+    platform::make_anew(side->idle);
+    side->mutex.unlock();
+  }
+}
+
 fifo_table &fifo_table::instance() noexcept {
   static platform::immortal<fifo_table> table;
   return table.get();
@@ -235,6 +259,7 @@ std::uint64_t fifo_table::open_in(std::size_t slot, std::string_view name, std::
   } else {
     fifo = new (std::nothrow) data_fifo;
     if (!fifo) return 0;
+    fifo->made_before = std::exchange(newest_, fifo);
   }
   const std::uint64_t handle = next_generation_++ * slot_count + slot;
   fifo->open(name, std::move(buffer), capacity, handle);
@@ -273,6 +298,28 @@ std::int32_t fifo_table::unreserve(std::uint64_t **cell) noexcept {
 void fifo_table::recycle(data_fifo &fifo) noexcept {
   const std::lock_guard lock(mutex_);
   fifo.next_spare = std::exchange(spares_, &fifo);
+}
+
+void fifo_table::before_fork() noexcept {
+  mutex_.lock();
+  for (data_fifo *fifo = newest_; fifo; fifo = fifo->made_before) fifo->before_fork();
+}
+
+void fifo_table::after_fork_in_parent() noexcept {
+  for (data_fifo *fifo = newest_; fifo; fifo = fifo->made_before) fifo->after_fork_in_parent();
+  mutex_.unlock();
+}
+
+/// FIFOs that threads of the parent were closing, or still waited in, are over here.
+void fifo_table::after_fork_in_child() noexcept {
+  spares_ = nullptr;
+  for (data_fifo *fifo = newest_; fifo; fifo = fifo->made_before) {
+    fifo->after_fork_in_child();
+    if (std::find(slots_.begin(), slots_.end(), fifo) != slots_.end()) continue;
+    fifo->close();
+    fifo->next_spare = std::exchange(spares_, fifo);
+  }
+  mutex_.unlock();
 }
 
 }  // namespace qsrfhs

@@ -45,6 +45,10 @@ class data_fifo {
   [[nodiscard]] std::string_view name() const noexcept { return name_.data(); }
   [[nodiscard]] std::uint64_t handle() const noexcept { return handle_; }
   data_fifo *next_spare = nullptr;
+  data_fifo *made_before = nullptr;
+  void before_fork() noexcept;
+  void after_fork_in_parent() noexcept;
+  void after_fork_in_child() noexcept;
 
  private:
   enum class state : std::uint32_t { open = 1, closing = 2 };
@@ -92,6 +96,10 @@ class fifo_table {
   /// Keeps an object that nobody uses for the next FIFO.
   void recycle(data_fifo &fifo) noexcept;
 
+  void before_fork() noexcept;
+  void after_fork_in_parent() noexcept;
+  void after_fork_in_child() noexcept;
+
  private:
   static constexpr std::size_t slot_count = 16;
 
@@ -101,6 +109,7 @@ class fifo_table {
   std::array<std::atomic<data_fifo *>, slot_count> slots_{};                   // changed under mutex_
   std::uint64_t next_generation_ = 1;                                          // under mutex_
   data_fifo *spares_ = nullptr;                                                // under mutex_
+  data_fifo *newest_ = nullptr;                                                // under mutex_; all ever made
   std::unordered_map<std::uint64_t *, std::unique_ptr<std::uint64_t>> cells_;  // under mutex_
 };
 

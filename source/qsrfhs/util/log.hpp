@@ -9,6 +9,7 @@
 #include <optional>
 #include <string>
 
+#include "platform/fork.hpp"
 #include "qsrfhs/math/exceptions.hpp"
 
 namespace qsrfhs::log {
@@ -31,6 +32,13 @@ class Logger {
   std::optional<entry> pop();
   /// Drops all entries and wakes all readers; from then on nothing is found.
   void close();
+
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept {
+    platform::make_anew(changed_);
+    mutex_.unlock();
+  }
 
  private:
   std::mutex mutex_;

@@ -5,12 +5,11 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <cstdlib>
 #include <exception>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "platform/processor.hpp"
-#include "platform/thread.hpp"
 
 namespace qsrfhs {
 namespace {
@@ -21,6 +20,13 @@ enum error_list_status : std::int32_t {
   capacity_too_small = -67371113  // 0xFBFBFF97
 };
 
+const platform::fork_participant<Management> takes_part(platform::fork_rank::error_list);
+
+/// Behind the handlers and destructors of those who use the library, which may still call it.
+[[gnu::destructor]] void stop_threads() {
+  Management::instance().stop_threads();
+}
+
 }  // namespace
 
 Management &Management::instance() noexcept {
@@ -28,14 +34,19 @@ Management &Management::instance() noexcept {
   return management.get();
 }
 
-Management::Management() : cpu_count_(std::min(platform::processor_count(), max_cpus)) {
-  (void)std::atexit([] { instance().scheduler_.stop(); });
-  // A child of a fork finds the lock free, the list whole and the teams not started.
-  platform::at_fork([] { instance().mutex_.lock(); }, [] { instance().mutex_.unlock(); },
-                    [] {
-                      instance().scheduler_.forget_threads();
-                      instance().mutex_.unlock();
-                    });
+Management::Management() : cpu_count_(std::min(platform::processor_count(), max_cpus)) {}
+
+void Management::before_fork() noexcept {
+  mutex_.lock();
+}
+
+void Management::after_fork_in_parent() noexcept {
+  mutex_.unlock();
+}
+
+void Management::after_fork_in_child() noexcept {
+  scheduler_.forget_threads();
+  mutex_.unlock();
 }
 
 std::int32_t Management::addError(std::int32_t code) noexcept {

@@ -32,6 +32,13 @@ class Management {
   /// Copies all codes, oldest first; false when they do not fit.
   [[nodiscard]] bool copy_errors(std::span<std::int32_t> codes) const;
 
+  /// At the end of the process; see batch_scheduler.
+  void stop_threads() noexcept { scheduler_.stop(); }
+
+  void before_fork() noexcept;
+  void after_fork_in_parent() noexcept;
+  void after_fork_in_child() noexcept;
+
  private:
   void add(std::int32_t code) noexcept;
 

@@ -1,15 +1,14 @@
-// A fixed set of worker threads that serve one queue of tasks. SPDX-License-Identifier: MIT
+// A fixed set of worker threads that serve one queue of tasks. They are started by the first task: a pool that nobody
+// gives one has no threads. In the child of a fork they are started anew; tasks that were queued will run there, too,
+// those that were running are over. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <atomic>
 #include <cstdint>
 #include <functional>
 #include <future>
 #include <memory>
-#include <thread>
 #include <type_traits>
 #include <utility>
-#include <vector>
 
 namespace ctpl {
 
@@ -20,7 +19,8 @@ class thread_pool {
   thread_pool &operator=(const thread_pool &) = delete;
   ~thread_pool();
 
-  /// Queues task(worker index); its result or exception arrives in the future.
+  /// Queues task(worker index); its result or exception arrives in the future. Throws the system's error where no
+  /// worker can be started.
   template <class Task>
   auto push(Task &&task) -> std::future<std::invoke_result_t<Task &, std::int32_t>> {
     using result = std::invoke_result_t<Task &, std::int32_t>;
@@ -30,28 +30,32 @@ class thread_pool {
     return future;
   }
 
-  /// Starts workers, or lets those beyond `workers` finish their task and leave. Nothing once stopped. Not to be called
-  /// by two threads at once, nor beside stop().
+  /// Sets the number of workers; those beyond it finish their task and leave. Nothing once stopped. Not to be called by
+  /// two threads at once, nor beside stop().
   void resize(std::int32_t workers);
 
   /// Runs what is queued, then joins the workers. Nothing once stopped. From one of the pool's own workers it throws
   /// the standard error for a deadlock.
   void stop();
 
-  [[nodiscard]] std::int32_t size() const noexcept { return static_cast<std::int32_t>(threads_.size()); }
+  /// Workers that serve the pool, or will once there is a task.
+  [[nodiscard]] std::int32_t size() const noexcept;
+
+  void before_fork() noexcept;
+  void after_fork_in_parent() noexcept;
+  void after_fork_in_child() noexcept;
 
  private:
-  // Shared with the workers, so that one that was let go may outlive the pool.
   struct state;
-  using stop_flag = std::shared_ptr<std::atomic<bool>>;
+  struct member;
+  using job = std::function<void(std::int32_t)>;
 
   void finish() noexcept;
-  void enqueue(std::function<void(std::int32_t)> task);
-  static void work(state &shared, const std::atomic<bool> &leave, std::int32_t worker);
+  void enqueue(job added);
+  static void start_missing(state &shared);
+  static void *serve(void *own);
 
-  std::shared_ptr<state> state_;
-  std::vector<std::thread> threads_;
-  std::vector<stop_flag> stop_flags_;
+  state *shared_;
 };
 
 }  // namespace ctpl

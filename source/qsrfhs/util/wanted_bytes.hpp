@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <mutex>
 
+#include "platform/fork.hpp"
 #include "platform/processor.hpp"
 
 namespace qsrfhs {
@@ -50,10 +51,22 @@ class wanted_bytes {
     return granted || withdraw(made);
   }
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  /// Nobody waits in the child.
+  void after_fork_in_child() noexcept {
+    wish_.store(0);
+    sleepers_.store(0);
+    platform::make_anew(granted_);
+    mutex_.unlock();
+  }
+
  private:
+  // Made while the library is loaded; before that nobody waits.
+  static inline const int rounds = platform::processor_count() > 1 ? 100 : 1;
+
   /// Looks for some microseconds before going to sleep, which costs more. Not worth it on a single processor.
   bool granted_soon(wish made) const noexcept {
-    static const int rounds = platform::processor_count() > 1 ? 100 : 1;
     for (int round = 0; round < rounds; ++round) {
       if (wish_.load() != made) return true;
       _mm_pause();

@@ -10,10 +10,12 @@
 #include <new>
 #include <utility>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "qsrfhs/math/fft.hpp"
 #include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_runtime.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 #include "qsrfhs/math/mkl_status.hpp"
 #include "qsrfhs/util/array_store.hpp"
 #include "qsrfhs/util/management.hpp"
@@ -31,6 +33,7 @@ DFTI_DESCRIPTOR_HANDLE transform_of(const resampler_descriptor &descriptor) noex
 }
 
 bool free_transform(resampler_descriptor &descriptor) noexcept {
+  const mkl_section section;
   DFTI_DESCRIPTOR_HANDLE transform = transform_of(descriptor);
   const bool freed = !failed(DftiFreeDescriptor(&transform));
   descriptor.transform = transform;
@@ -46,6 +49,7 @@ std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool
     if (!free_transform(descriptor)) return resampler_free_failed;
   }
   if (length < 1 || length > max_fft_length) return resampler_create;
+  const mkl_section section;
   DFTI_DESCRIPTOR_HANDLE made = nullptr;
   const MKL_LONG created = DftiCreateDescriptor(&made, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
   descriptor.transform = made;
@@ -129,6 +133,8 @@ void put_out(const resampler_plan &plan, resampler_channel &channel, const sampl
   }
   for (std::size_t k = 0; k < count; ++k) out[k] = block[from + k * stride];
 }
+
+const platform::fork_participant<descriptor_cache> takes_part(platform::fork_rank::resampler_descriptors);
 
 }  // namespace
 

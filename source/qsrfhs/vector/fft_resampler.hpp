@@ -47,6 +47,10 @@ class descriptor_cache {
   std::int32_t create(resampler_descriptor **out, std::uint32_t length, std::uint32_t buffer_flag,
                       std::uint32_t inverse_flag, std::uint64_t owner) noexcept;
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
+
  private:
   /// What a descriptor was made for, whatever its owners write into it.
   struct purpose {

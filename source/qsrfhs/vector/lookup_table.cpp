@@ -8,6 +8,7 @@
 
 #include "host/host_array.hpp"
 #include "host/resize_service.hpp"
+#include "platform/fork.hpp"
 #include "qsrfhs/util/management.hpp"
 #include "qsrfhs/vector/floats.hpp"
 
@@ -49,6 +50,13 @@ struct lookup_batch {
 
 /// As many as the scheduler has batches; a call that finds none free works by itself.
 constinit lookup_batch batches[32];
+
+// Those in use belong to threads that do not exist in the child.
+constexpr platform::fork_handlers fork_handlers{[]() noexcept {}, []() noexcept {},
+                                                []() noexcept {
+                                                  for (lookup_batch &batch : batches) batch.users = 0;
+                                                }};
+const platform::fork_participation takes_part(platform::fork_rank::lookup_batches, fork_handlers);
 
 lookup_batch *take_batch(std::uint32_t tasks) noexcept {
   for (lookup_batch &batch : batches) {
