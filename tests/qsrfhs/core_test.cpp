@@ -1,9 +1,13 @@
 // Transform pool, filter, worker pool. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
+#include <filesystem>
 #include <latch>
 #include <memory>
 #include <numeric>
+#include <string_view>
 #include <thread>
 #include <vector>
 
@@ -128,6 +132,48 @@ TEST(ThreadPoolConcurrency, DroppedWorkersFinishTheirTaskAndTheRestServeTheQueue
     pool.resize(3);
     EXPECT_EQ(3, pool.size());
   }
+}
+
+std::ptrdiff_t thread_count() {
+  const std::filesystem::directory_iterator tasks("/proc/self/task");
+  return std::distance(begin(tasks), end(tasks));
+}
+
+TEST(ThreadPool, HasNoThreadsBeforeItsFirstTask) {
+  const auto before = thread_count();
+  ctpl::thread_pool pool(8);
+  EXPECT_EQ(8, pool.size());
+  EXPECT_EQ(before, thread_count());
+  EXPECT_EQ(7, pool.push([](std::int32_t) { return 7; }).get());
+  EXPECT_EQ(before + 8, thread_count());
+}
+
+TEST(ThreadPoolFork, WorkersStartAnewInTheChild) {
+  if (std::string_view(LUMRA_SANITIZE).find("thread") != std::string_view::npos)
+    GTEST_SKIP() << "no threads after a fork";
+  std::latch release(1), running(1);
+  ctpl::thread_pool pool(1);
+  auto held = pool.push([&](std::int32_t) {
+    running.count_down();
+    release.wait();
+  });
+  running.wait();
+  auto queued = pool.push([](std::int32_t) { return 1; });
+  pool.before_fork();
+  const pid_t child = fork();
+  if (child == 0) {
+    pool.after_fork_in_child();
+    alarm(20);
+    const int later = pool.push([](std::int32_t) { return 2; }).get();
+    _exit(queued.get() + later);
+  }
+  pool.after_fork_in_parent();
+  int status = 0;
+  waitpid(child, &status, 0);
+  EXPECT_TRUE(WIFEXITED(status));
+  EXPECT_EQ(3, WEXITSTATUS(status));
+  release.count_down();
+  EXPECT_EQ(1, queued.get());
 }
 
 TEST(Process, KnowsWhatIsReadable) {
