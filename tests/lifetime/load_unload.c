@@ -1,4 +1,4 @@
-/* A host that does not link the library loads it with local symbols and unloads it, 50 times, and measures each time.
+/* A host that does not link the library loads it with local symbols and unloads it, 200 times, and measures each time.
  * Argument: the library's file. SPDX-License-Identifier: MIT */
 #include <dlfcn.h>
 #include <stdint.h>
@@ -19,7 +19,7 @@ int main(int argc, char **argv) {
   if (argc < 2) return EXIT_FAILURE;
   /* A value that the library is to replace while it is loaded and to put back when the process ends. */
   setenv("KMP_DUPLICATE_LIB_OK", "no", 1);
-  for (round = 1; round <= 50; ++round) {
+  for (round = 1; round <= 200; ++round) {
     uint64_t session = 0;
     void *library = dlopen(argv[1], RTLD_NOW | RTLD_LOCAL);
     if (!library) {
