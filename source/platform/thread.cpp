@@ -33,19 +33,18 @@ void thread::detach() noexcept {
 }
 
 thread_end::thread_end(void (*begin)() noexcept, void (*end)() noexcept) noexcept
-    : begin_{this, begin, &end_}, end_{this, end, nullptr} {
-  (void)pthread_key_create(&key_, &take);
-}
+    : begin_{this, begin, &end_}, end_{this, end, nullptr}, has_key_(pthread_key_create(&key_, &take) == 0) {}
 
 /// The system goes over all keys once more where a destructor has set a value: that is behind the others' destructors.
 void thread_end::take(void *value) noexcept {
   step &taken = *static_cast<step *>(value);
   taken.call();
-  if (taken.following) taken.of->set(*taken.following);
+  // This cannot fail: the thread's place for the value is there.
+  if (taken.following) (void)taken.of->set(*taken.following);
 }
 
-void thread_end::set(step &next) noexcept {
-  (void)pthread_setspecific(key_, &next);
+bool thread_end::set(step &next) noexcept {
+  return has_key_ && pthread_setspecific(key_, &next) == 0;
 }
 
 void raise_thread_priority() noexcept {

@@ -40,8 +40,8 @@ class thread_end {
   thread_end(const thread_end &) = delete;
   thread_end &operator=(const thread_end &) = delete;
 
-  /// For the calling thread.
-  void ask() noexcept { set(begin_); }
+  /// For the calling thread. False without memory; without a key of the system's nothing is ever called.
+  bool ask() noexcept { return set(begin_) || !has_key_; }
 
  private:
   struct step {
@@ -50,10 +50,11 @@ class thread_end {
     step *following;
   };
   static void take(void *value) noexcept;
-  void set(step &next) noexcept;
+  bool set(step &next) noexcept;
 
   step begin_, end_;
   pthread_key_t key_{};
+  bool has_key_;
 };
 
 /// Gives the calling thread the highest ordinary priority, as far as the process may.

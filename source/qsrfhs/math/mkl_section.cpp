@@ -16,8 +16,8 @@
 namespace qsrfhs {
 namespace {
 
-thread_local int depth = 0;
-thread_local bool is_set_up = false;
+constinit thread_local int depth = 0;
+constinit thread_local bool is_set_up = false;
 
 class gate {
  public:
@@ -78,12 +78,18 @@ void leave() noexcept {
   if (--depth == 0) gate::instance().leave();
 }
 
-/// MKL closes a thread's account with its memory when the thread ends, in a destructor of its own.
+/// A thread's buffers are given back when it ends; MKL closes the thread's account with its memory then, in a
+/// destructor of its own. Without memory to ask for that, they stay until the process ends.
 platform::thread_end &end_of_thread() noexcept {
-  static platform::thread_end end(&enter, []() noexcept {
-    is_set_up = false;
-    leave();
-  });
+  static platform::thread_end end(
+      []() noexcept {
+        enter();
+        mkl_thread_free_buffers();
+      },
+      []() noexcept {
+        is_set_up = false;
+        leave();
+      });
   return end;
 }
 
@@ -111,10 +117,9 @@ mkl_section::~mkl_section() {
 
 void mkl_section::set_up_thread() noexcept {
   if (is_set_up) return;
-  is_set_up = true;
   static std::once_flag process_is_set_up;
   const mkl_section section;
-  end_of_thread().ask();  // made before MKL's key
+  is_set_up = end_of_thread().ask();  // its key is older than MKL's
   std::call_once(process_is_set_up, &set_up_process);
   mkl_free(mkl_malloc(1, 64));  // opens the thread's account with MKL's memory
 }
