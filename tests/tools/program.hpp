@@ -89,14 +89,18 @@ class ProgramTest : public testing::Test {
   }
   void TearDown() override { std::filesystem::remove_all(folder_); }
 
-  /// Starts the program; paths are relative to the folder.
-  [[nodiscard]] pid_t start(const std::vector<std::string> &arguments) const {
+  /// Starts the program; paths are relative to the folder. More may be put in front of the environment.
+  [[nodiscard]] pid_t start(const std::vector<std::string> &arguments, std::vector<std::string> settings = {}) const {
     std::vector<std::string> all{LUMRA_PROGRAM};
     all.insert(all.end(), arguments.begin(), arguments.end());
     std::vector<char *> argv;
     argv.reserve(all.size() + 1);
     for (std::string &argument : all) argv.push_back(argument.data());
     argv.push_back(nullptr);
+    std::vector<char *> environment;
+    for (std::string &setting : settings) environment.push_back(setting.data());
+    for (char **inherited = environ; *inherited; ++inherited) environment.push_back(*inherited);
+    environment.push_back(nullptr);
     const std::string out = logs_ + "out", err = logs_ + "err";
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
@@ -104,7 +108,7 @@ class ProgramTest : public testing::Test {
     posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
     posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
     pid_t child = -1;
-    EXPECT_EQ(0, ::posix_spawn(&child, LUMRA_PROGRAM, &actions, nullptr, argv.data(), environ));
+    EXPECT_EQ(0, ::posix_spawn(&child, LUMRA_PROGRAM, &actions, nullptr, argv.data(), environment.data()));
     posix_spawn_file_actions_destroy(&actions);
     return child;
   }
@@ -120,6 +124,11 @@ class ProgramTest : public testing::Test {
     (void)std::filesystem::remove(folder_ / (logs_ + "out"));
     (void)std::filesystem::remove(folder_ / (logs_ + "err"));
     return result;
+  }
+
+  static std::vector<std::string> words(const std::string &line) {
+    std::istringstream text(line);
+    return {std::istream_iterator<std::string>(text), {}};
   }
 
   /// The arguments, separated by blanks.
@@ -184,11 +193,6 @@ class ProgramTest : public testing::Test {
   std::filesystem::path folder_;
 
  private:
-  static std::vector<std::string> words(const std::string &line) {
-    std::istringstream text(line);
-    return {std::istream_iterator<std::string>(text), {}};
-  }
-
   std::string logs_ = ".std";
 };
 

@@ -1,4 +1,6 @@
 // What the subcommands of lumra have in common: refusals in one line, interruption. SPDX-License-Identifier: MIT
+#include <array>
+#include <cstdlib>
 #include <lumra/lumra.hpp>
 
 #include "tools/program.hpp"
@@ -8,6 +10,7 @@ namespace {
 using tests::bytes_of;
 using tests::metadata;
 using tests::noise;
+using tests::outcome;
 using tests::samples;
 
 using Program = tests::ProgramTest;
@@ -49,12 +52,20 @@ TEST_F(Program, RefusesBadInputInOneLine) {
            {"order", metadata("", R"({"core:sample_start": 10}, {"core:sample_start": 9})")},
            {"header", metadata("", R"({"core:header_bytes": -1})")},
            {"outside", metadata(R"(, "core:dataset": "../x.cf32")")},
-           {"note", metadata("", "", R"({}, {"core:sample_start": -1})")}}) {
+           {"note", metadata("", "", R"({}, {"core:sample_start": -1})")},
+           {"nothing", ""},
+           {"control", R"({"global": {"core:datatype": "\u001B[2J\n", "core:sample_rate": 1}})"},
+           {"nul", metadata(R"(, "core:dataset": "x.cf32\u0000")")},
+           {"deep", metadata(R"(, "x": )" + std::string(63, '[') + std::string(63, ']'))},
+           {"deepest", metadata(R"(, "x": )" + std::string(62, '[') + std::string(62, ']'))},
+           {"abyss", metadata(R"(, "x": )" + std::string(100000, '['))},
+           {"large", std::string((std::size_t{64} << 20) + 1, ' ')}}) {
     write(name + ".sigmf-meta", meta);
     write(name + ".sigmf-data", bytes);
   }
   for (const char *name : {"full.png", "full.svg", "full.sigmf-data", "fullmeta.sigmf-meta"})
     std::filesystem::create_symlink("/dev/full", folder_ / name);
+  std::filesystem::create_directory(folder_ / "folder.sigmf-meta");
   const auto before = files();
 
   const struct {
@@ -89,6 +100,14 @@ TEST_F(Program, RefusesBadInputInOneLine) {
       {1, "core:header_bytes", "spectrum header"},
       {1, "same folder", "spectrum outside"},
       {1, "No such file", "spectrum alone"},
+      {1, "not valid JSON near byte 1", "spectrum nothing"},
+      {1, "\\x1B[2J\\x0A", "spectrum control"},
+      {1, "same folder", "spectrum nul"},
+      {1, "deeper than 64", "resample deep --rate 1"},
+      {1, "deeper than 64", "evm abyss abyss"},
+      {1, "64 MiB", "spectrum large"},
+      {1, "not a regular file", "spectrum folder.sigmf-meta"},
+      {1, "a name of its own", "spectrum x.cf32 --rate 1 --csv y.svg --plot ./y.svg"},
       {1, "archives", "spectrum x.sigmf"},
       {1, "part of the recording", "spectrum x.cf32 --rate 1 --csv x.cf32"},
       {1, "No such file", "spectrum x.cf32 --rate 1 --csv none/x.csv"},
@@ -153,8 +172,8 @@ TEST_F(Program, RefusesBadInputInOneLine) {
     EXPECT_EQ(before, files());
   }
   EXPECT_EQ(2, run("").exit_code);
-  for (const char *line :
-       {"spectrum --help", "evm rate1000 rate2000 --rate 5", "evm x.cf32 short.cf32 --rate 1 --samples 90"})
+  for (const char *line : {"spectrum --help", "spectrum deepest", "evm rate1000 rate2000 --rate 5",
+                           "evm x.cf32 short.cf32 --rate 1 --samples 90"})
     succeed(line);
 }
 
@@ -180,6 +199,67 @@ TEST_F(Program, InterruptionLeavesNothing) {
     EXPECT_EQ(before, files());
   }
 }
+
+TEST_F(Program, OutputsAppearTogetherOrNotAtAll) {
+  write("x.cf32", bytes_of(noise(4000)));
+  write("o.csv", "from before");
+  const auto before = files();
+  // What the shell limits or closes in front of the program.
+  for (const auto &[shell, line, says] : std::initializer_list<std::array<std::string, 3>>{
+           {"", "spectrum x.cf32 --rate 1 --csv o.csv --plot o.svg >/dev/full", "standard output: No space left"},
+           {"ulimit -f 1;", "evm x.cf32 x.cf32 --rate 1 --csv o.csv", "o.csv: File too large"},
+           {"ulimit -f 1;", "resample x.cf32 --input-rate 1 --rate 2 --output o", "o.sigmf-data: File too large"},
+           {"", "--help >/dev/full", "standard output: No space left"}}) {
+    SCOPED_TRACE(shell + line);
+    const int status = std::system(
+        ("cd " + folder_.string() + "; " + shell + " " + LUMRA_PROGRAM + " " + line + " 2>.err").c_str());  // NOLINT
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+    const std::string err = read(".err");
+    std::filesystem::remove(folder_ / ".err");
+    EXPECT_NE(std::string::npos, err.find(says)) << err;
+    EXPECT_EQ(1, std::count(err.begin(), err.end(), '\n')) << err;
+    EXPECT_EQ(before, files());
+    EXPECT_EQ("from before", read("o.csv"));
+  }
+}
+
+#ifdef LUMRA_FAILING_MALLOC
+TEST_F(Program, EndsInOneLineWheneverMemoryRunsOut) {
+  write("x.sigmf-data", bytes_of(noise(200)));
+  write("x.sigmf-meta", metadata(R"(, "core:description": "longer than a string that needs no memory")",
+                                 R"({"core:frequency": 1e9})", R"({"core:sample_count": 9, "core:label": "a"})"));
+  const auto before = files();
+  const auto run_failing = [&](const char *line, long at, long count) {
+    const outcome result = finish(
+        start(words(line), {std::string("LD_PRELOAD=") + LUMRA_FAILING_MALLOC, "LUMRA_FAIL_REPORT=.report",
+                            "LUMRA_FAIL_AT=" + std::to_string(at), "LUMRA_FAIL_COUNT=" + std::to_string(count)}));
+    for (const std::string &name : files())
+      if (name == ".report" || (result.exit_code == 0 && name.starts_with("o.")))
+        std::filesystem::remove(folder_ / name);
+    return result;
+  };
+  for (const char *line : {"info", "spectrum x --fft 16 --csv o.csv --plot o.svg", "evm x x --align --csv o.csv",
+                           "resample x --rate 500 --output o"}) {
+    (void)finish(start(words(line), {std::string("LD_PRELOAD=") + LUMRA_FAILING_MALLOC, "LUMRA_FAIL_REPORT=.report"}));
+    const long all = std::stol(read(".report"));
+    (void)run_failing(line, 0, 1);
+    ASSERT_GT(all, 100);
+    for (const long count : {1, 0})
+      // The first two thirds make the command line ready, one option like another.
+      for (long at = 1; at <= all; at += at < 2 * all / 3 ? 23 : count == 1 ? 1 : 7) {
+        const outcome result = run_failing(line, at, count);
+        SCOPED_TRACE(testing::Message() << line << ", " << at << " of " << all << " fails, then " << result.signal
+                                        << result.err);
+        ASSERT_EQ(before, files());
+        if (result.exit_code == 0 && result.err.empty()) continue;  // the C and C++ runtimes have reserves
+        ASSERT_EQ(1, result.exit_code);
+        ASSERT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n'));
+        // gnuplot has no memory either, and says so in its own words.
+        ASSERT_TRUE(result.err.starts_with("lumra: not enough memory; ") || result.err.starts_with("lumra: gnuplot"));
+      }
+  }
+}
+#endif
 
 TEST_F(Program, InfoNamesLibraryPathAndMkl) {
   const auto result = succeed("info");

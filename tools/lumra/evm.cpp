@@ -13,7 +13,7 @@
 #include "failure.hpp"
 #include "output_file.hpp"
 #include "recording.hpp"
-#include "summary.hpp"
+#include "results.hpp"
 #include "units.hpp"
 
 namespace tool {
@@ -87,35 +87,36 @@ std::string gain_text(std::complex<double> gain, int decimals, const char *unit)
                      unit);
 }
 
-void print_summary(const evm_command &command, const recording &reference, const recording &measured,
-                   const evm_result &result) {
+void summarise(results &shown, const evm_command &command, const recording &reference, const recording &measured,
+               const evm_result &result) {
   const double rate = reference.rate;
   const std::uint64_t samples = command.settings.samples;
   const auto name = [](const recording &r) { return fmt::format("{} ({})", r.data.string(), r.format.name()); };
-  summary_line("Reference", name(reference));
-  summary_line("Measured", name(measured));
+  shown.add_line("Reference", name(reference));
+  shown.add_line("Measured", name(measured));
   std::string length = fmt::format("{} ({:.6g} s)", samples, static_cast<double>(samples) / rate);
   if (samples < reference.samples() || samples < measured.samples())
     length += fmt::format(", the first of {} and {}", reference.samples(), measured.samples());
-  summary_line("Samples", length);
-  summary_line("Sample rate", exact_text(rate));
-  summary_line("Reference level", fmt::format("{:.2f} dBFS RMS, which is 100 %", level(result.reference_rms)));
-  summary_line("Alignment", command.settings.align
-                                ? "least-squares complex gain " + gain_text(result.gain, 4, " deg") + ", divided out"
-                                : "none; a difference in gain or phase is an error (see --align)");
-  summary_line("EVM RMS", ratio_text(result.error.rms));
-  summary_line("EVM peak", ratio_text(result.error.peak) + " " + place_text(result.error.peak_at, rate));
-  summary_line("Magnitude error", deviation_text(result.magnitude, 100, "%", rate));
-  summary_line("Phase error", result.without_phase == samples ? "none: each sample is zero in one of the recordings"
-                                                              : deviation_text(result.phase, degrees, "deg", rate));
+  shown.add_line("Samples", length);
+  shown.add_line("Sample rate", exact_text(rate));
+  shown.add_line("Reference level", fmt::format("{:.2f} dBFS RMS, which is 100 %", level(result.reference_rms)));
+  shown.add_line("Alignment", command.settings.align
+                                  ? "least-squares complex gain " + gain_text(result.gain, 4, " deg") + ", divided out"
+                                  : "none; a difference in gain or phase is an error (see --align)");
+  shown.add_line("EVM RMS", ratio_text(result.error.rms));
+  shown.add_line("EVM peak", ratio_text(result.error.peak) + " " + place_text(result.error.peak_at, rate));
+  shown.add_line("Magnitude error", deviation_text(result.magnitude, 100, "%", rate));
+  shown.add_line("Phase error", result.without_phase == samples ? "none: each sample is zero in one of the recordings"
+                                                                : deviation_text(result.phase, degrees, "deg", rate));
   if (result.without_phase > 0 && result.without_phase < samples)
-    summary_line("Note", fmt::format("{} samples are zero in one of the recordings and are no part of the phase error",
-                                     result.without_phase));
-  if (!command.csv.empty()) summary_line("CSV", command.csv);
-  if (!command.plot.empty()) summary_line("Picture", command.plot);
+    shown.add_line("Note",
+                   fmt::format("{} samples are zero in one of the recordings and are no part of the phase error",
+                               result.without_phase));
+  if (!command.csv.empty()) shown.add_line("CSV", command.csv);
+  if (!command.plot.empty()) shown.add_line("Picture", command.plot);
 }
 
-void run(evm_command &command) {
+results run(evm_command &command) {
   command.reference_options.rate = command.measured_options.rate;
   command.reference_options.format = command.measured_options.format;
   const recording reference = open_recording(command.reference, command.reference_options);
@@ -125,13 +126,10 @@ void run(evm_command &command) {
   inputs.insert(inputs.end(), measured.files.begin(), measured.files.end());
 
   // Made first, so that an output that cannot be written is known before the work.
-  std::unique_ptr<output_file> csv, plot;
-  picture_type type = picture_type::png;
-  if (!command.csv.empty()) csv = std::make_unique<output_file>(command.csv, inputs);
-  if (!command.plot.empty()) {
-    type = picture_type_of(command.plot);
-    plot = std::make_unique<output_file>(command.plot, inputs);
-  }
+  results given(std::move(inputs));
+  output_file *const csv = command.csv.empty() ? nullptr : &given.add_file(command.csv);
+  const picture_type type = command.plot.empty() ? picture_type::png : picture_type_of(command.plot);
+  output_file *const plot = command.plot.empty() ? nullptr : &given.add_file(command.plot);
 
   constellation points(command.settings.samples);
   if (csv) csv->print("sample,evm_percent,magnitude_error_percent,phase_error_deg\n");
@@ -145,14 +143,13 @@ void run(evm_command &command) {
     if (command.settings.align) figures += "  ·  gain " + gain_text(result.gain, 2, "°") + " removed";
     draw(constellation_script(points, measured.name + " against " + reference.name, figures, type), type, *plot);
   }
-  if (csv) csv->commit();
-  if (plot) plot->commit();
-  print_summary(command, reference, measured, result);
+  summarise(given, command, reference, measured, result);
+  return given;
 }
 
 }  // namespace
 
-void add_evm(CLI::App &program) {
+void add_evm(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<evm_command>();
   CLI::App *app = program.add_subcommand("evm", "Error vectors of a recording against a reference");
   app->footer(
@@ -176,7 +173,7 @@ void add_evm(CLI::App &program) {
       ->option_text("INDEX");
   // For tests: how much is read at a time must not change the result.
   app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
-  app->callback([command] { run(*command); });
+  app->callback([command, &work] { work = [command] { return run(*command); }; });
 }
 
 }  // namespace tool

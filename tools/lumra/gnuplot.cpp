@@ -2,6 +2,7 @@
 // name and can leave nothing behind. SPDX-License-Identifier: MIT
 #include "gnuplot.hpp"
 
+#include <fcntl.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -10,7 +11,6 @@
 #include <cerrno>
 #include <cstdlib>
 #include <memory>
-#include <system_error>
 
 #include "failure.hpp"
 
@@ -24,7 +24,7 @@ using scratch_file = std::unique_ptr<std::FILE, closer>;
 
 scratch_file make_scratch() {
   scratch_file file(std::tmpfile());
-  if (!file) throw failure("no temporary file for gnuplot: {}", std::generic_category().message(errno));
+  if (!file) throw failure("no temporary file for gnuplot: {}", system_reason(errno));
   return file;
 }
 
@@ -70,18 +70,17 @@ std::string complaint(std::FILE *errors) {
 }
 
 /// A full disk does not fail gnuplot: the picture's last bytes tell.
-bool is_complete(std::FILE *picture, picture_type type) {
+bool is_complete(int picture, picture_type type) {
   constexpr std::string_view png_end("IEND\xAE\x42\x60\x82", 8);
   constexpr std::string_view svg_end("</svg>");
   std::array<char, 32> tail{};
-  const int file = ::fileno(picture);
-  const off_t size = ::lseek(file, 0, SEEK_END);
+  const off_t size = ::lseek(picture, 0, SEEK_END);
   if (size < static_cast<off_t>(tail.size())) return size == -1;  // not seekable: a pipe or a terminal
-  // The stream is write-only; its file is opened anew to be read.
-  const scratch_file reader(std::fopen(fmt::format("/proc/self/fd/{}", file).c_str(), "r"));
-  if (!reader || ::pread(::fileno(reader.get()), tail.data(), tail.size(), size - static_cast<off_t>(tail.size())) <
-                     static_cast<ssize_t>(tail.size()))
-    return false;
+  // The descriptor is write-only; its file is opened anew to be read.
+  const int reader = ::open(fmt::format("/proc/self/fd/{}", picture).c_str(), O_RDONLY | O_CLOEXEC);
+  const ssize_t got = ::pread(reader, tail.data(), tail.size(), size - static_cast<off_t>(tail.size()));
+  ::close(reader);
+  if (got < static_cast<ssize_t>(tail.size())) return false;
   const std::string_view text(tail.data(), tail.size());
   return type == picture_type::png ? text.ends_with(png_end) : text.find(svg_end) != std::string_view::npos;
 }
@@ -128,26 +127,28 @@ void draw(const std::string &script, picture_type type, output_file &out) {
   const scratch_file input = make_scratch();
   const scratch_file errors = make_scratch();
   if (std::fwrite(script.data(), 1, script.size(), input.get()) != script.size() || std::fflush(input.get()) != 0)
-    throw failure("cannot write the plot's temporary file: {}", std::generic_category().message(errno));
+    throw failure("cannot write the plot's temporary file: {}", system_reason(errno));
   (void)::lseek(::fileno(input.get()), 0, SEEK_SET);
 
   posix_spawn_file_actions_t actions;
   posix_spawn_file_actions_init(&actions);
-  posix_spawn_file_actions_adddup2(&actions, ::fileno(input.get()), STDIN_FILENO);
-  posix_spawn_file_actions_adddup2(&actions, ::fileno(out.stream()), STDOUT_FILENO);
-  posix_spawn_file_actions_adddup2(&actions, ::fileno(errors.get()), STDERR_FILENO);
+  int refused = 0;
+  for (const auto &[file, stream] : {std::pair{::fileno(input.get()), STDIN_FILENO},
+                                     {out.descriptor(), STDOUT_FILENO},
+                                     {::fileno(errors.get()), STDERR_FILENO}})
+    if (refused == 0) refused = posix_spawn_file_actions_adddup2(&actions, file, stream);
   char name[] = "gnuplot";
   char no_start_files[] = "-d";
   char *arguments[] = {name, no_start_files, nullptr};
   pid_t child = 0;
-  const int refused = ::posix_spawnp(&child, name, &actions, nullptr, arguments, environ);
+  if (refused == 0) refused = ::posix_spawnp(&child, name, &actions, nullptr, arguments, environ);
   posix_spawn_file_actions_destroy(&actions);
-  if (refused != 0) throw failure("gnuplot does not start: {}", std::generic_category().message(refused));
+  if (refused != 0) throw failure("gnuplot does not start: {}", system_reason(refused));
   int status = 0;
   while (::waitpid(child, &status, 0) < 0 && errno == EINTR) {
   }
   if (status != 0) throw failure("gnuplot failed: {}", complaint(errors.get()));
-  if (!is_complete(out.stream(), type))
+  if (!is_complete(out.descriptor(), type))
     throw failure("gnuplot drew no complete picture ({}); is the disk full?", complaint(errors.get()));
 }
 

@@ -4,26 +4,29 @@
 #include <lumra/lumra.hpp>
 
 #include "commands.hpp"
+#include "results.hpp"
 
 namespace tool {
 namespace {
 
-void show_info() {
+results show_info() {
   const lumra::library_info info = lumra::library();
-  fmt::print("{:<18}{}\n", "Library", info.name);
-  fmt::print("{:<18}{} ({}.{}.{})\n", "Version", info.version_text, LUMRA_VERSION_MAJOR, LUMRA_VERSION_MINOR,
-             LUMRA_VERSION_PATCH);
-  fmt::print("{:<18}{}\n", "Description", info.description);
-  fmt::print("{:<18}{}\n", "Processor path", info.uses_avx ? "AVX" : "baseline (no AVX)");
-  fmt::print("{:<18}{}\n", "Processors", qsUtilHS_NumCPUs());
-  fmt::print("{:<18}{}\n", "MKL", LUMRA_MKL_VERSION);
+  results shown;
+  shown.add_line("Library", info.name);
+  shown.add_line("Version", fmt::format("{} ({}.{}.{})", info.version_text, LUMRA_VERSION_MAJOR, LUMRA_VERSION_MINOR,
+                                        LUMRA_VERSION_PATCH));
+  shown.add_line("Description", info.description);
+  shown.add_line("Processor path", info.uses_avx ? "AVX" : "baseline (no AVX)");
+  shown.add_line("Processors", std::to_string(qsUtilHS_NumCPUs()));
+  shown.add_line("MKL", LUMRA_MKL_VERSION);
+  return shown;
 }
 
 }  // namespace
 
-void add_info(CLI::App &program) {
+void add_info(CLI::App &program, work_to_do &work) {
   program.add_subcommand("info", "Show the library's version, the processor path in use and the MKL version")
-      ->callback(show_info);
+      ->callback([&work] { work = show_info; });
 }
 
 }  // namespace tool

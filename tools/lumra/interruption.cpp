@@ -13,7 +13,8 @@
 namespace tool {
 namespace {
 
-constexpr int signals[] = {SIGINT, SIGTERM, SIGHUP, SIGPIPE};
+constexpr int signals[] = {SIGINT, SIGTERM, SIGHUP, SIGPIPE, SIGQUIT, SIGXCPU};
+constexpr int crashes[] = {SIGABRT, SIGBUS, SIGFPE, SIGILL, SIGSEGV};
 
 struct slot {
   std::atomic<bool> taken{false};
@@ -23,11 +24,8 @@ struct slot {
 slot slots[4];
 std::atomic<bool> bar_shown{false};
 
-/// Calls only functions that POSIX allows in a handler.
-void clean_up(int number) {
-  for (slot &s : slots)
-    if (s.armed) ::unlink(s.name);
-  if (bar_shown) (void)!::write(STDERR_FILENO, "\n", 1);
+void end_by_signal(int number) {
+  abandon_work();
   // The disposition is the default one again (SA_RESETHAND); the signal arrives when the handler returns.
   (void)::raise(number);
 }
@@ -41,9 +39,16 @@ sigset_t all_signals() noexcept {
 
 }  // namespace
 
+/// Calls only functions that POSIX allows in a handler.
+void abandon_work() noexcept {
+  for (slot &s : slots)
+    if (s.armed) ::unlink(s.name);
+  if (bar_shown) (void)!::write(STDERR_FILENO, "\n", 1);
+}
+
 void install_interruption() {
   struct sigaction action = {};
-  action.sa_handler = clean_up;
+  action.sa_handler = end_by_signal;
   action.sa_flags = static_cast<int>(SA_RESETHAND);
   action.sa_mask = all_signals();
   for (const int number : signals) {
@@ -52,11 +57,13 @@ void install_interruption() {
     if (::sigaction(number, nullptr, &before) == 0 && before.sa_handler != SIG_IGN)
       (void)::sigaction(number, &action, nullptr);
   }
+  for (const int number : crashes) (void)::sigaction(number, &action, nullptr);
+  (void)std::signal(SIGXFSZ, SIG_IGN);
 }
 
 unfinished_file::unfinished_file(const std::filesystem::path &file) : slot_(-1) {
   const std::string name = std::filesystem::absolute(file).string();
-  if (name.size() >= sizeof slot::name) throw failure("{}: name too long", file.string());
+  if (name.size() >= sizeof slot::name) throw failure("{}: name too long; use a shorter one", file.string());
   const auto *free = std::find_if(std::begin(slots), std::end(slots), [](slot &s) { return !s.taken.exchange(true); });
   if (free == std::end(slots)) throw failure("{}: too many output files at once", file.string());
   slot_ = static_cast<int>(free - slots);
@@ -66,8 +73,13 @@ unfinished_file::unfinished_file(const std::filesystem::path &file) : slot_(-1) 
 }
 
 unfinished_file::~unfinished_file() {
-  slots[slot_].armed = false;
+  if (slots[slot_].armed) ::unlink(slots[slot_].name);
+  is_finished();
   slots[slot_].taken = false;
+}
+
+void unfinished_file::is_finished() noexcept {
+  slots[slot_].armed = false;
 }
 
 held_signals::held_signals() noexcept {

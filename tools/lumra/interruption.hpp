@@ -9,16 +9,21 @@
 
 namespace tool {
 
-/// To be called once, at the start.
+/// To be called once, at the start. A file that grows beyond the limit for its size fails then, which is no signal.
 void install_interruption();
 
-/// A file that is removed when a signal ends the program while this lives.
+/// Removes unfinished files and ends the line of a progress bar; for an end at once, in handlers too.
+void abandon_work() noexcept;
+
+/// A file that is removed at the end of this, also when that is a signal or a lack of memory, unless it is finished.
 class unfinished_file {
  public:
   explicit unfinished_file(const std::filesystem::path &file);  // throws failure
   unfinished_file(const unfinished_file &) = delete;
   unfinished_file &operator=(const unfinished_file &) = delete;
   ~unfinished_file();
+
+  void is_finished() noexcept;
 
  private:
   int slot_;

@@ -1,4 +1,4 @@
-// A result on disk that appears whole or not at all. SPDX-License-Identifier: MIT
+// A file that appears whole or not at all. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <fmt/format.h>
@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <utility>
 #include <vector>
 
@@ -13,15 +14,12 @@
 
 namespace tool {
 
-/// Written under a temporary name in the same folder and renamed by commit; removed otherwise. Something that is not
-/// a regular file (a pipe, a terminal) is written in place.
+/// Written under a temporary name in the same folder, and removed unless it came to stay. Something that is not a
+/// regular file (a pipe, a terminal) is written in place.
 class output_file {
  public:
   /// Throws failure, also when the file is one of those that are read.
   output_file(std::filesystem::path target, const std::vector<std::filesystem::path> &inputs);
-  output_file(const output_file &) = delete;
-  output_file &operator=(const output_file &) = delete;
-  ~output_file();
 
   template <class... Args>
   void print(fmt::format_string<Args...> text, Args &&...args) {
@@ -30,24 +28,32 @@ class output_file {
     write(text_.data(), text_.size());
   }
   void write(const char *data, std::size_t size);
-  [[nodiscard]] std::FILE *stream() const noexcept { return file_.get(); }
+  [[nodiscard]] int descriptor() const noexcept { return ::fileno(file_.get()); }
 
-  /// Throws failure when anything could not be written.
-  void commit();
-  /// Commits two results that belong together: both appear, or neither, and then what stood in their places stays.
-  void commit_with(output_file &other);
+  /// Closes the file; throws failure when not all could be written. Nothing is written afterwards.
+  void finish();
+
+  // Once it is finished; none of these allocates, and signals are held from appear on.
+
+  /// Takes the target's place; what stood there is kept aside if that is asked for. Gives 0, or the errno with which it
+  /// changed nothing.
+  int appear(bool keep_former) noexcept;
+  /// Undoes appear(true), where it was successful.
+  void disappear() noexcept;
+  /// Gives up what was kept aside.
+  void stay() noexcept;
+
+  /// Throws the failure for an errno.
+  [[noreturn]] void fail(int code) const;
 
  private:
   struct closer {
     void operator()(std::FILE *file) const noexcept { (void)std::fclose(file); }
   };
 
-  void finish();
-  void take_place();
-
-  std::filesystem::path target_;
-  std::filesystem::path temporary_;  // empty: written in place, or in its place
-  std::unique_ptr<unfinished_file> unfinished_;
+  std::filesystem::path target_, temporary_, former_;
+  std::optional<unfinished_file> unfinished_;  // none: written in place, or in its place
+  bool appeared_ = false, replaced_ = false;
   std::unique_ptr<std::FILE, closer> file_;
   fmt::memory_buffer text_;
 };

@@ -13,6 +13,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
+/// Whether there is a regular file of this name, as far as can be seen.
+bool is_file(const fs::path &file) noexcept {
+  std::error_code error;
+  return fs::is_regular_file(fs::status(file, error));
+}
+
 recording open_raw(const fs::path &path, const recording_options &options) {
   const std::uint64_t size = readable_size(path);
   recording result;
@@ -67,14 +73,14 @@ recording open_recording(const fs::path &path, const recording_options &options)
     readable_size(path);
     fs::path meta = path;
     meta.replace_extension(".sigmf-meta");
-    if (fs::exists(meta)) return open_sigmf(meta, options);
+    if (is_file(meta)) return open_sigmf(meta, options);
     if (!options.format)
       throw failure("{}: no {} beside it; say --format and {}", path.string(), meta.string(), options.rate_option);
     return open_raw(path, options);
   }
   fs::path meta = path;
   meta += ".sigmf-meta";
-  if (!fs::is_regular_file(path) && fs::exists(meta)) return open_sigmf(meta, options);
+  if (!is_file(path) && is_file(meta)) return open_sigmf(meta, options);
   return open_raw(path, options);
 }
 

@@ -12,8 +12,8 @@
 #include "recording.hpp"
 #include "resampled_metadata.hpp"
 #include "resampling.hpp"
+#include "results.hpp"
 #include "sigmf_writer.hpp"
-#include "summary.hpp"
 #include "units.hpp"
 
 namespace tool {
@@ -53,29 +53,30 @@ std::string length_text(std::uint64_t samples, double rate) {
   return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, short_text(rate));
 }
 
-void print_summary(const resample_command &command, const recording &source, const resampling_filter &filter,
-                   double ratio, double rate, std::uint64_t written, const std::string &base) {
+void summarise(results &shown, const resample_command &command, const recording &source,
+               const resampling_filter &filter, double ratio, double rate, std::uint64_t written,
+               const std::string &base) {
   const double lower = std::min(source.rate, rate);
-  summary_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
-  summary_line("Input samples", length_text(source.samples(), source.rate));
-  summary_line("Output samples", length_text(written, rate));
-  summary_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
-  summary_line("Ratio", fmt::format("{:.17g} input samples per output sample", ratio));
+  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  shown.add_line("Input samples", length_text(source.samples(), source.rate));
+  shown.add_line("Output samples", length_text(written, rate));
+  shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
+  shown.add_line("Ratio", fmt::format("{:.17g} input samples per output sample", ratio));
   if (rate != command.rate)
-    summary_line("Note", fmt::format("the ratio is rounded to single precision: the new rate, as in the metadata, is "
-                                     "{:.17g} Hz ({:+.2g} ppm)",
-                                     rate, 1e6 * (rate / command.rate - 1)));
-  summary_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
-                                        filter.coefficients.size(), filter.phases));
-  summary_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
-                                        short_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
-  summary_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
-                                        short_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
-  summary_line("Data", base + ".sigmf-data");
-  summary_line("Metadata", base + ".sigmf-meta");
+    shown.add_line("Note", fmt::format("the ratio is rounded to single precision: the new rate, as in the metadata, is "
+                                       "{:.17g} Hz ({:+.2g} ppm)",
+                                       rate, 1e6 * (rate / command.rate - 1)));
+  shown.add_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
+                                          filter.coefficients.size(), filter.phases));
+  shown.add_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
+                                          short_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
+  shown.add_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
+                                          short_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
+  shown.add_line("Data", base + ".sigmf-data");
+  shown.add_line("Metadata", base + ".sigmf-meta");
 }
 
-void run(const resample_command &command) {
+results run(const resample_command &command) {
   const recording source = open_recording(command.path, command.options);
   if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
   const float ratio = ratio_of(source, command.rate);
@@ -84,7 +85,8 @@ void run(const resample_command &command) {
   const double rate = source.rate / command.rate == exact ? command.rate : source.rate / exact;
 
   const fs::path base = output_base(command, source);
-  sigmf_writer output(base, source.files);
+  results given(source.files);
+  sigmf_writer output(given, base);
   const resampling_filter filter = design_resampling_filter();
   const std::uint64_t written = resampled_count(source, ratio);
   const nlohmann::json metadata =
@@ -92,13 +94,14 @@ void run(const resample_command &command) {
                          fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate), short_text(rate),
                                      lumra::library().version_text));
   resample(source, filter, ratio, command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
-  output.commit(metadata);
-  print_summary(command, source, filter, exact, rate, written, base.string());
+  output.write(metadata);
+  summarise(given, command, source, filter, exact, rate, written, base.string());
+  return given;
 }
 
 }  // namespace
 
-void add_resample(CLI::App &program) {
+void add_resample(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<resample_command>();
   CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
   app->footer(
@@ -120,7 +123,7 @@ void add_resample(CLI::App &program) {
       ->option_text("INDEX");
   // For tests: how much is read at a time must not change the result.
   app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
-  app->callback([command] { run(*command); });
+  app->callback([command, &work] { work = [command] { return run(*command); }; });
 }
 
 }  // namespace tool

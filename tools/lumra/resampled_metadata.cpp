@@ -29,9 +29,10 @@ struct index_map {
   }
 };
 
-json list_of(const recording &source, const char *name) {
+const json &list_of(const recording &source, const char *name) {
+  static const json none = json::array();
   const auto list = source.metadata->find(name);
-  if (list == source.metadata->end()) return json::array();
+  if (list == source.metadata->end()) return none;
   if (!list->is_array()) throw failure("{}: {} must be a list", source.files.front().string(), name);
   return *list;
 }
@@ -86,7 +87,11 @@ json resampled_metadata(const recording &source, double ratio, double rate, std:
   global["core:sample_rate"] = rate;
   global["core:version"] = "1.2.0";
   global["core:description"] = description + ", " + text;
-  return {{"global", global}, {"captures", captures}, {"annotations", annotations}};
+  json result;
+  result["global"] = std::move(global);
+  result["captures"] = std::move(captures);
+  result["annotations"] = std::move(annotations);
+  return result;
 }
 
 }  // namespace tool

@@ -8,7 +8,6 @@
 #include <bit>
 #include <cerrno>
 #include <cmath>
-#include <system_error>
 
 #include "failure.hpp"
 
@@ -29,15 +28,11 @@ bool all_finite(std::span<const std::complex<float>> samples) noexcept {
   return finite;
 }
 
-std::string reason(int code) {
-  return std::generic_category().message(code);
-}
-
 }  // namespace
 
 sample_reader::sample_reader(const recording &source)
     : source_(source), file_(::open(source.data.c_str(), O_RDONLY | O_CLOEXEC)), bytes_(piece_bytes) {
-  if (file_ < 0) throw failure("{}: {}", source.data.string(), reason(errno));
+  if (file_ < 0) throw failure("{}: {}", source.data.string(), system_reason(errno));
   (void)::posix_fadvise(file_, 0, 0, POSIX_FADV_SEQUENTIAL);
 }
 
@@ -69,7 +64,7 @@ void sample_reader::read_piece(std::span<std::complex<float>> out, std::uint64_t
   for (std::size_t got = 0; got < wanted;) {
     const ssize_t count = ::pread(file_, bytes_.data() + got, wanted - got, static_cast<off_t>(offset + got));
     if (count < 0 && errno == EINTR) continue;
-    if (count < 0) throw failure("{}: {}", source_.data.string(), reason(errno));
+    if (count < 0) throw failure("{}: {}", source_.data.string(), system_reason(errno));
     if (count == 0) throw failure("{}: became shorter while it was read; try again", source_.data.string());
     got += static_cast<std::size_t>(count);
   }

@@ -3,11 +3,11 @@
 #include "sigmf.hpp"
 
 #include <cmath>
-#include <fstream>
 #include <nlohmann/json.hpp>
 
 #include "failure.hpp"
 #include "metadata_fields.hpp"
+#include "metadata_file.hpp"
 
 namespace tool {
 namespace {
@@ -21,18 +21,6 @@ struct capture {
   std::optional<double> frequency;
   std::optional<std::uint64_t> global_index;
 };
-
-json parse(const fs::path &meta) {
-  readable_size(meta);
-  std::ifstream file(meta, std::ios::binary);
-  try {
-    return json::parse(file);
-  } catch (const json::parse_error &error) {
-    throw failure("{}: not valid JSON near byte {}; is this the metadata file?", meta.string(), error.byte);
-  } catch (const json::exception &) {
-    throw failure("{}: a number is out of range; correct the metadata", meta.string());
-  }
-}
 
 std::vector<capture> read_captures(const json &root, const fs::path &meta) {
   const auto list = root.find("captures");
@@ -72,7 +60,7 @@ void require_one_signal(const std::vector<capture> &captures, const fs::path &me
 fs::path data_file(const fields &global, const fs::path &meta) {
   const auto dataset = global.text("core:dataset");
   if (!dataset) return fs::path(meta).replace_extension(".sigmf-data");
-  if (dataset->empty() || fs::path(*dataset).has_parent_path())
+  if (dataset->empty() || dataset->find('\0') != std::string::npos || fs::path(*dataset).has_parent_path())
     throw failure("{}: core:dataset must be the name of a file in the same folder", meta.string());
   return meta.parent_path() / *dataset;
 }
@@ -104,7 +92,7 @@ std::vector<extent> locate(const std::vector<capture> &captures, std::uint64_t f
 }  // namespace
 
 recording open_sigmf(const fs::path &meta, const recording_options &options) {
-  const auto metadata = std::make_shared<const json>(parse(meta));
+  const auto metadata = std::make_shared<const json>(read_metadata(meta));
   const json &root = *metadata;
   if (!root.is_object() || !root.contains("global")) throw failure("{}: no SigMF metadata (no global)", meta.string());
   const fields global(root["global"], meta.string() + ": global");

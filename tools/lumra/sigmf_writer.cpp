@@ -13,18 +13,34 @@ std::filesystem::path with_suffix(std::filesystem::path base, const char *suffix
   return base += suffix;
 }
 
+std::string text_of(const nlohmann::json &value) {
+  return value.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+}
+
 }  // namespace
 
-sigmf_writer::sigmf_writer(const std::filesystem::path &base, const std::vector<std::filesystem::path> &inputs)
-    : data_(with_suffix(base, ".sigmf-data"), inputs), meta_(with_suffix(base, ".sigmf-meta"), inputs) {}
+sigmf_writer::sigmf_writer(results &among, const std::filesystem::path &base)
+    : data_(among.add_file(with_suffix(base, ".sigmf-data"))),
+      meta_(among.add_file(with_suffix(base, ".sigmf-meta"))) {}
 
 void sigmf_writer::write(std::span<const std::complex<float>> samples) {
   data_.write(reinterpret_cast<const char *>(samples.data()), samples.size_bytes());
 }
 
-void sigmf_writer::commit(const nlohmann::json &metadata) {
-  meta_.print("{}\n", metadata.dump(2, ' ', false, nlohmann::json::error_handler_t::replace));
-  data_.commit_with(meta_);
+void sigmf_writer::write(const nlohmann::json &metadata) {
+  const char *before = "{";
+  for (const auto &[name, part] : metadata.items()) {
+    meta_.print("{}\n  {}: {}", before, text_of(name), part.is_object() ? "{" : "[");
+    before = "";
+    for (const auto &item : part.items()) {
+      const std::string key = part.is_object() ? text_of(item.key()) + ": " : "";
+      meta_.print("{}\n    {}{}", before, key, text_of(item.value()));
+      before = ",";
+    }
+    meta_.print("{}{}", part.empty() ? "" : "\n  ", part.is_object() ? "}" : "]");
+    before = ",";
+  }
+  meta_.print("\n}}\n");
 }
 
 }  // namespace tool

@@ -14,8 +14,8 @@
 #include "output_file.hpp"
 #include "progress.hpp"
 #include "recording.hpp"
+#include "results.hpp"
 #include "spectrum_picture.hpp"
-#include "summary.hpp"
 #include "units.hpp"
 
 namespace tool {
@@ -51,47 +51,44 @@ void write_csv(output_file &csv, const averaged_spectrum &spectrum, double centr
   }
 }
 
-void print_summary(const spectrum_command &command, const recording &source, const averaged_spectrum &spectrum,
-                   std::size_t peak) {
+void summarise(results &shown, const spectrum_command &command, const recording &source,
+               const averaged_spectrum &spectrum, std::size_t peak) {
   const double rbw = spectrum.resolution_bandwidth();
-  summary_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
-  summary_line("Samples",
-               fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
-  summary_line("Sample rate", exact_text(source.rate));
-  summary_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
-  summary_line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
-  summary_line("Window", fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window),
-                                     spectrum.noise_bandwidth));
-  summary_line("Averaged",
-               fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
-  summary_line("Resolution bandwidth",
-               fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
+  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  shown.add_line("Samples",
+                 fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
+  shown.add_line("Sample rate", exact_text(source.rate));
+  shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
+  shown.add_line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
+  shown.add_line("Window", fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window),
+                                       spectrum.noise_bandwidth));
+  shown.add_line("Averaged",
+                 fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
+  shown.add_line("Resolution bandwidth",
+                 fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
   const double offset = spectrum.offset(peak);
   const double centre = source.frequency.value_or(0);
   std::string where = frequency_text(centre + offset, spectrum.df);
   if (source.frequency) where += fmt::format(" (offset {})", offset_text(offset, spectrum.df, unit_for(offset)));
-  summary_line("Peak", spectrum.power[peak] > 0
-                           ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
-                           : "none: all samples are zero");
+  shown.add_line("Peak", spectrum.power[peak] > 0
+                             ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
+                             : "none: all samples are zero");
   if (spectrum.power[peak] > 1.01)
-    summary_line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
-  if (!command.csv.empty()) summary_line("CSV", command.csv);
-  if (!command.plot.empty()) summary_line("Picture", command.plot);
+    shown.add_line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
+  if (!command.csv.empty()) shown.add_line("CSV", command.csv);
+  if (!command.plot.empty()) shown.add_line("Picture", command.plot);
 }
 
-void run(spectrum_command &command) {
+results run(spectrum_command &command) {
   const recording source = open_recording(command.path, command.options);
   if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
   if (command.settings.fft_size == 0) command.settings.fft_size = fitting_size(source.samples());
 
   // Made first, so that an output that cannot be written is known before the work.
-  std::unique_ptr<output_file> csv, plot;
-  picture_type type = picture_type::png;
-  if (!command.csv.empty()) csv = std::make_unique<output_file>(command.csv, source.files);
-  if (!command.plot.empty()) {
-    type = picture_type_of(command.plot);
-    plot = std::make_unique<output_file>(command.plot, source.files);
-  }
+  results given(source.files);
+  output_file *const csv = command.csv.empty() ? nullptr : &given.add_file(command.csv);
+  const picture_type type = command.plot.empty() ? picture_type::png : picture_type_of(command.plot);
+  output_file *const plot = command.plot.empty() ? nullptr : &given.add_file(command.plot);
 
   const averaged_spectrum spectrum = average_spectrum(source, command.settings);
   const auto peak =
@@ -105,14 +102,13 @@ void run(spectrum_command &command) {
                     unit_for(spectrum.resolution_bandwidth()).name);
     draw(spectrum_script(source, spectrum, peak, settings, type), type, *plot);
   }
-  if (csv) csv->commit();
-  if (plot) plot->commit();
-  print_summary(command, source, spectrum, peak);
+  summarise(given, command, source, spectrum, peak);
+  return given;
 }
 
 }  // namespace
 
-void add_spectrum(CLI::App &program) {
+void add_spectrum(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<spectrum_command>();
   CLI::App *app = program.add_subcommand("spectrum", "Averaged power spectrum of a recording, in dB of full scale");
   app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
@@ -136,7 +132,7 @@ void add_spectrum(CLI::App &program) {
       ->option_text("INDEX");
   // For tests: how much is read at a time must not change the result.
   app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
-  app->callback([command] { run(*command); });
+  app->callback([command, &work] { work = [command] { return run(*command); }; });
 }
 
 }  // namespace tool
