@@ -18,20 +18,12 @@
 #define LUMRA_HOST_ARRAY_H
 
 #include <lumra/export.h>
+#include <lumra/types.h>
 #include <stdint.h>
 
 #ifdef __cplusplus
 extern "C" {
 #endif
-
-/* Complex samples: I, then Q. */
-typedef struct lumra_cf32 {
-  float re, im;
-} lumra_cf32;
-
-typedef struct lumra_cf64 {
-  double re, im;
-} lumra_cf64;
 
 /* Blocks. `elements` has as many elements as the sizes say; elements of 4-byte parts start 4 bytes into a vector's
  * block, all others 8 bytes into theirs. */
@@ -85,10 +77,7 @@ typedef lumra_f64_matrix_block **lumra_f64_matrix;
 typedef lumra_cf32_matrix_block **lumra_cf32_matrix;
 typedef lumra_cf64_matrix_block **lumra_cf64_matrix;
 
-/* Type codes of the resize service. */
-enum lumra_type_code { LUMRA_TYPE_F32 = 9, LUMRA_TYPE_F64 = 10, LUMRA_TYPE_CF32 = 12, LUMRA_TYPE_CF64 = 13 };
-
-/* A host's resize service. handleAddress is the address of a handle; the service may replace the block, and the
+/* A host's resize service. typeCode is one of enum lumra_type_code. handleAddress is the address of a handle; the service may replace the block, and the
  * handle where that is null. newSize is the size argument that the calling function names. 0 on success. */
 typedef int32_t (*lumra_array_resize)(int32_t typeCode, int32_t dimensions, void *handleAddress, uint64_t newSize);
 

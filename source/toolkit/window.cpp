@@ -1,118 +1,19 @@
 // Sum-of-cosines windows, multiplied onto a record. SPDX-License-Identifier: MIT
 #include <lumra/toolkit.h>
 
-#include <algorithm>
-#include <cmath>
 #include <cstdint>
-#include <numbers>
 
+#include "signal/cosine_window.hpp"
 #include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
 
 namespace toolkit {
 namespace {
 
-struct cosine_window {
-  std::int32_t terms;
-  double a[7];
-};
-
-// By type number; 10 is not used.
-constexpr cosine_window windows[] = {
-    {1, {1.0}},
-    {2, {0.5, 0.5}},
-    {2, {0.54, 0.46}},
-    {3, {0.42323, 0.49755, 0.07922}},
-    {3, {0.4265907136715391, 0.4965606190885641, 0.07684866723989682}},
-    {3, {0.42, 0.5, 0.08}},
-    {5, {0.215578948, 0.41663158, 0.277263158, 0.083578947, 0.006947368}},
-    {4, {0.35875, 0.48829, 0.14128, 0.01168}},
-    {7,
-     {0.27105140069342415, 0.43329793923448606, 0.21812299954311062, 0.0659254463880309, 0.010811742098372268,
-      0.0007765848252250934, 1.3887217350903198e-05}},
-    {5, {0.323215218, 0.471492057, 0.17553428, 0.028497078, 0.001261367}},
-    {0, {}},
-    {4, {0.3635819, 0.4891775, 0.1365995, 0.0106411}},
-};
-
-const cosine_window &find_window(std::int32_t type) {
-  require(type >= 0 && type < static_cast<std::int32_t>(std::size(windows)) && windows[type].terms != 0, bad_option);
-  return windows[type];
-}
-
-// With u = sin^2(pi i / n) a window is a polynomial in u: (-1)^k cos(2 pi k i / n) = T_k(2u - 1), T_k the Chebyshev
-// polynomials. One sine per sample then serves all harmonics, and where the window comes close to zero, at its ends,
-// u does, so that nothing cancels.
-
-/// Coefficients of the polynomial, of u^0 first. `tables` holds 4 * terms values and receives them in its first ones.
-void expand(const cosine_window &window, double divisor, std::span<double> tables) noexcept {
-  const auto m = static_cast<std::size_t>(window.terms);
-  std::fill(tables.begin(), tables.end(), 0.0);
-  const auto polynomial = tables.subspan(0, m);
-  auto next = tables.subspan(m, m), current = tables.subspan(2 * m, m), before = tables.subspan(3 * m, m);
-  // T_(k+1)(v) = 2 v T_k(v) - T_(k-1)(v) with v = 2u - 1, from T_0 = 1 and T_(-1) = v.
-  current[0] = 1.0;
-  before[0] = -1.0;
-  before[1] = 2.0;
-  for (std::size_t k = 0; k < m; ++k) {
-    for (std::size_t i = 0; i < m; ++i) {
-      polynomial[i] += window.a[k] / divisor * current[i];
-      next[i] = (i > 0 ? 4.0 * current[i - 1] : 0.0) - 2.0 * current[i] - before[i];
-    }
-    std::swap(before, current);
-    std::swap(current, next);
-  }
-}
-
-/// Sines and cosines of j * step for j below `block`, each made from two others by at most log2(block) rotations.
-struct rotations {
-  static constexpr std::int64_t block = 512;
-  alignas(64) double cosine[block], sine[block];
-
-  rotations(double step, std::int64_t count) noexcept {
-    cosine[0] = 1.0;
-    sine[0] = 0.0;
-    for (std::int64_t half = 1; half < count; half *= 2) {
-      const double c = std::cos(step * static_cast<double>(half)), s = std::sin(step * static_cast<double>(half));
-      for (std::int64_t j = 0; j < half; ++j) {
-        cosine[half + j] = cosine[j] * c - sine[j] * s;
-        sine[half + j] = sine[j] * c + cosine[j] * s;
-      }
-    }
-  }
-};
-
-/// Multiplies samples by the window whose polynomial is given; n is the window's period and the number of samples. As
-/// w[i] = w[n - i], half of the window is computed.
-template <int terms, class T, class Real = decltype(std::real(T{}))>
-void apply_polynomial(const double *coefficients, T *data, std::int64_t n) noexcept {
-  double p[terms];
-  std::copy_n(coefficients, terms, p);
-  const auto at = [&p](double u) {
-    double w = p[terms - 1];
-    for (int k = terms - 2; k >= 0; --k) w = w * u + p[k];
-    return w;
-  };
-  const double step = std::numbers::pi / static_cast<double>(n);
-  const rotations table(step, std::min(n, rotations::block));
-  const std::int64_t pairs = (n - 1) / 2;
-  data[0] *= static_cast<Real>(at(0.0));
-  if (n % 2 == 0) data[n / 2] *= static_cast<Real>(at(1.0));
-  for (std::int64_t first = 1; first <= pairs; first += rotations::block) {
-    // Every block starts from an angle of its own, so that errors do not add up.
-    const double angle = step * static_cast<double>(first);
-    const double c = std::cos(angle), s = std::sin(angle);
-    const std::int64_t count = std::min(pairs - first + 1, rotations::block);
-    Real w[rotations::block];
-    for (std::int64_t j = 0; j < count; ++j) {
-      const double sine = s * table.cosine[j] + c * table.sine[j];
-      w[j] = static_cast<Real>(at(sine * sine));
-    }
-    T *const rising = data + first;
-    T *const falling = data + n - first;
-    for (std::int64_t j = 0; j < count; ++j) rising[j] *= w[j];
-    for (std::int64_t j = 0; j < count; ++j) falling[-j] *= w[j];
-  }
+const dsp::cosine_sum &find_window(std::int32_t type) {
+  constexpr std::int32_t last = 11;  // those behind it came later, at another door
+  require(type >= 0 && type <= last && dsp::cosine_sums[type].terms != 0, bad_option);
+  return dsp::cosine_sums[type];
 }
 
 template <class E>
@@ -122,26 +23,15 @@ void apply_window(output<E> &data, std::int32_t type, bool normalised, scratch<d
   require(n >= 1, empty_input);
   refuse_sharing(room, data);
   if (n == 1) return;
-  const cosine_window &window = find_window(type);
+  const dsp::cosine_sum &window = find_window(type);
   const double divisor = normalised ? window.a[0] : 1.0;
   if (window.terms == 1) {
     scale(static_cast<std::int32_t>(n), static_cast<real_of<E>>(window.a[0] / divisor), values.data());
     return;
   }
-  const auto tables = room.resize(std::int64_t{4} * window.terms);
-  expand(window, divisor, tables);
-  switch (window.terms) {
-    case 2:
-      return apply_polynomial<2>(tables.data(), values.data(), n);
-    case 3:
-      return apply_polynomial<3>(tables.data(), values.data(), n);
-    case 4:
-      return apply_polynomial<4>(tables.data(), values.data(), n);
-    case 5:
-      return apply_polynomial<5>(tables.data(), values.data(), n);
-    default:
-      return apply_polynomial<7>(tables.data(), values.data(), n);
-  }
+  const auto tables = room.resize(static_cast<std::int64_t>(dsp::expansion_size(window)));
+  dsp::expand(window, divisor, tables);
+  dsp::multiply_by(window, tables.data(), values.data(), n);
 }
 
 }  // namespace

@@ -6,22 +6,14 @@
 #include <numbers>
 
 #include "host/host_array.hpp"
+#include "signal/bessel.hpp"
 
 namespace qsrfhs {
 namespace {
 
-constexpr double pi = std::numbers::pi;
+using dsp::bessel_i0;
 
-/// Modified Bessel function of order 0, by its power series: all terms are positive, so that nothing cancels.
-double bessel_i0(double x) noexcept {
-  const double quarter = x * x / 4;
-  double sum = 1, term = 1;
-  for (double k = 1; term > sum * 1e-17; ++k) {
-    term *= quarter / (k * k);
-    sum += term;
-  }
-  return sum;
-}
+constexpr double pi = std::numbers::pi;
 
 double sinc(double x) noexcept {
   return x == 0 ? 1 : std::sin(pi * x) / (pi * x);
