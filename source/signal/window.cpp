@@ -127,7 +127,7 @@ window_quality measure_window(const window_shape &shape, window_span span, std::
   double sum = 0, squares = 0;
   std::complex<double> between = 0;  // the transform half a bin away from 0
   for (std::uint64_t k = 0; k < n; ++k) {
-    const double value = period == 0 ? 1 : w(static_cast<double>(k) / static_cast<double>(period));
+    const double value = n == 1 ? 1 : w(static_cast<double>(k) / static_cast<double>(period));
     sum += value;
     squares += value * value;
     between += std::polar(value, -std::numbers::pi * static_cast<double>(k) / static_cast<double>(n));

@@ -1,0 +1,142 @@
+# SPDX-License-Identifier: MIT
+"""The shared library as another language sees it: functions, records and constants as the C headers declare them.
+
+LUMRA_LIBRARY names the library. `call` runs a function that must succeed, `Test.refused` one that must not; NumPy
+arrays, records and None stand for pointers. Records are fresh copies of their initialisers: record("fft", points=64).
+"""
+import ctypes
+import os
+import pathlib
+import re
+import unittest
+
+import numpy as np
+
+_c_types = {
+    "int32_t": ctypes.c_int32, "uint32_t": ctypes.c_uint32, "int64_t": ctypes.c_int64, "uint64_t": ctypes.c_uint64,
+    "float": ctypes.c_float, "double": ctypes.c_double, "lumra_status": ctypes.c_int32, "void": None,
+}  # fmt: skip
+_headers = pathlib.Path(__file__).resolve().parents[2] / "include" / "lumra"
+_open = sorted(h for h in _headers.glob("*.h") if " qs" not in h.read_text().replace("lumra.h", ""))
+_source = re.sub(r"/\*.*?\*/|\\\n", " ", "".join(h.read_text() for h in [_headers / "status.h", *_open]), flags=re.S)
+
+
+def _constants():
+    found = {}
+    for body in re.findall(r"enum \w+ \{(.*?)\}", _source, re.S):
+        for name, value in re.findall(r"(LUMRA_\w+)\s*=\s*(-?\w+)", body):
+            found[name] = int(value, 0)
+    return found
+
+
+def _c_type(text):
+    text = text.replace("const ", "").strip()
+    if text.startswith("char *"):
+        return ctypes.c_char_p
+    return ctypes.c_void_p if "*" in text else _c_types[text.split()[0]]
+
+
+def _record_type(name, body):
+    fields = []
+    for kind, members in re.findall(r"(\w+)\s+([^;]+);", body):
+        for member in members.split(","):
+            called, count = re.fullmatch(r"\s*(\w+)(?:\[(\w+)\])?\s*", member).groups()
+            fields.append((called, _c_types[kind] * int(count) if count else _c_types[kind]))
+    return type(name, (ctypes.Structure,), {"_fields_": fields})
+
+
+constants = _constants()
+for _name, _body in re.findall(r"typedef struct (lumra_\w+) \{(.*?)\}", _source, re.S):
+    _c_types[_name] = _record_type(_name, _body)
+records = {name: kind for name, kind in _c_types.items() if isinstance(kind, type(ctypes.Structure))}
+initialisers = {
+    name.lower(): values for name, values in re.findall(r"#define (LUMRA_\w+_OPTIONS)\s+\{(.*?)\}\s*\n", _source, re.S)
+}
+
+_library = ctypes.CDLL(os.environ["LUMRA_LIBRARY"])
+functions = {}
+for _returned, _name, _arguments in re.findall(r"LUMRA_EXPORT ([\w ]+?\*?)\s*(lumra_\w+)\(([^)]*)\);", _source):
+    _function = functions[_name[6:]] = getattr(_library, _name)
+    _function.restype = _c_type(_returned)
+    _function.argtypes = [_c_type(a) for a in _arguments.split(",") if a != "void"]
+
+
+def record(name, **changes):
+    """A copy of the options' initialiser, or an empty record, with some members changed."""
+    options = f"lumra_{name}_options"
+    made = records.get(options, records.get(f"lumra_{name}"))()
+    if options in initialisers:
+        made.size = ctypes.sizeof(made)
+        values = [v.strip() for v in initialisers[options].split(",")]
+        for (member, _), value in list(zip(made._fields_, values))[1:]:
+            setattr(made, member, constants[value] if value in constants else float(value) if "." in value else int(value))
+    for member, value in changes.items():
+        setattr(made, member, value)
+    return made
+
+
+def _pointer(argument):
+    if isinstance(argument, np.ndarray):
+        return argument.ctypes.data
+    return ctypes.byref(argument) if isinstance(argument, (ctypes.Structure, ctypes._SimpleCData)) else argument
+
+
+def run(function, *arguments):
+    """What the function returns."""
+    types = functions[function].argtypes
+    return functions[function](*(a if type(a) is t else _pointer(a) for a, t in zip(arguments, types, strict=True)))
+
+
+def last_error():
+    return run("last_error").decode()
+
+
+def call(function, *arguments):
+    status = run(function, *arguments)
+    assert status == 0, f"{last_error()} ({status})"
+
+
+def create(kind, **changes):
+    """An object, freed with the interpreter's last reference to it."""
+    handle = ctypes.c_void_p()
+    call(f"{kind}_create", record(kind, **changes), handle)
+    return Object(kind, handle.value)
+
+
+class Object(ctypes.c_void_p):
+    def __init__(self, kind, address):
+        super().__init__(address)
+        self.kind = kind
+
+    def __del__(self):
+        run(f"{self.kind}_free", self.value)
+
+
+def odd(x):
+    """A copy that lies where only its real numbers are aligned."""
+    x = np.asarray(x)
+    step = x.real.itemsize
+    room = np.empty(x.nbytes + 128, np.uint8)
+    first = -room.ctypes.data % 64 + step
+    copy = room[first : first + x.nbytes].view(x.dtype).reshape(x.shape)
+    copy[...] = x
+    return copy
+
+
+class Test(unittest.TestCase):
+    def refused(self, code, function, *arguments, says=""):
+        """The function fails with that code and a sentence, and no array has changed."""
+        arrays = [a for a in arguments if isinstance(a, np.ndarray)]
+        before = [a.tobytes() for a in arrays]
+        shown = (function, *[a if not isinstance(a, np.ndarray) else a.shape for a in arguments])
+        self.assertEqual(constants[code], run(function, *arguments), shown)
+        self.assertRegex(last_error(), rf"^lumra_{function}: .*{re.escape(says)}", shown)
+        self.assertEqual(before, [a.tobytes() for a in arrays], shown)
+
+    def close(self, expected, actual, tolerance, what=None):
+        """Largest difference relative to the largest expected magnitude; NaN only where NaN is expected."""
+        expected, actual = np.asarray(expected), np.asarray(actual)
+        self.assertEqual(expected.shape, actual.shape, what)
+        if expected.size:
+            largest = np.abs(expected).max()
+            np.testing.assert_allclose(actual, expected, rtol=0, atol=tolerance * largest, err_msg=str(what))
