@@ -53,7 +53,7 @@ class Frame(lumra.Test):
                 longer = (ctypes.c_uint8 * (size + 8))(*bytes(lumra.record(kind)))
                 ctypes.c_uint32.from_buffer(longer).value = size + 8
                 lumra.call(f"{kind}_create", longer, handle)
-                for address in (handle.value, handle.value, None, 64):  # freed again, or never an object: nothing happens
+                for address in (handle.value, handle.value, None, 64):  # freed again, or never one: no matter
                     lumra.run(f"{kind}_free", address)
                 longer[size + 7] = 1
                 self.refused("LUMRA_BAD_SIZE_FIELD", f"{kind}_create", longer, handle, says="does not know")

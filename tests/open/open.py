@@ -1,8 +1,9 @@
 # SPDX-License-Identifier: MIT
 """The shared library as another language sees it: functions, records and constants as the C headers declare them.
 
-LUMRA_LIBRARY names the library. `call` runs a function that must succeed, `Test.refused` one that must not; NumPy
-arrays, records and None stand for pointers. Records are fresh copies of their initialisers: record("fft", points=64).
+LUMRA_LIBRARY names the library. `call` runs a function that must succeed, `Test.refused` one that must not. NumPy
+arrays, records, ctypes numbers that are written, and None stand for pointers. record("fft", points=64) is a fresh copy
+of an options record's initialiser, create("fft", points=64) an object.
 """
 import ctypes
 import os
@@ -69,13 +70,16 @@ def record(name, **changes):
         made.size = ctypes.sizeof(made)
         values = [v.strip() for v in initialisers[options].split(",")]
         for (member, _), value in list(zip(made._fields_, values))[1:]:
-            setattr(made, member, constants[value] if value in constants else float(value) if "." in value else int(value))
+            number = constants.get(value) if value in constants else float(value) if "." in value else int(value)
+            setattr(made, member, number)
     for member, value in changes.items():
         setattr(made, member, value)
     return made
 
 
-def _pointer(argument):
+def _passed(argument, kind):
+    if kind is not ctypes.c_void_p or isinstance(argument, Object):
+        return argument
     if isinstance(argument, np.ndarray):
         return argument.ctypes.data
     return ctypes.byref(argument) if isinstance(argument, (ctypes.Structure, ctypes._SimpleCData)) else argument
@@ -83,8 +87,8 @@ def _pointer(argument):
 
 def run(function, *arguments):
     """What the function returns."""
-    types = functions[function].argtypes
-    return functions[function](*(a if type(a) is t else _pointer(a) for a, t in zip(arguments, types, strict=True)))
+    kinds = functions[function].argtypes
+    return functions[function](*(_passed(a, k) for a, k in zip(arguments, kinds, strict=True)))
 
 
 def last_error():
