@@ -4,11 +4,15 @@
 
 namespace qsrfhs::mkl_runtime {
 
-/// Held while a thread computes with MKL. The first one of a thread arranges for its clean-up.
+/// A computation of the calling thread begins or ends. The first one sets the thread up, and arranges for its clean-up.
+void begin_use() noexcept;
+void end_use() noexcept;
+
+/// Held while a thread computes with MKL.
 class use {
  public:
-  use() noexcept;
-  ~use();
+  use() noexcept { begin_use(); }
+  ~use() { end_use(); }
   use(const use &) = delete;
   use &operator=(const use &) = delete;
 };

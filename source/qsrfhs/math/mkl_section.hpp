@@ -8,13 +8,14 @@ namespace qsrfhs {
 /// May be nested. No other lock of the library is taken inside.
 class mkl_section {
  public:
-  mkl_section() noexcept;
-  ~mkl_section();
+  mkl_section() noexcept { enter(); }
+  ~mkl_section() { leave(); }
   mkl_section(const mkl_section &) = delete;
   mkl_section &operator=(const mkl_section &) = delete;
 
-  /// Called by each thread before it computes: the first time it lets MKL set itself up inside of a section.
-  static void set_up_thread() noexcept;
+  /// For a section that begins in one function and ends in another.
+  static void enter() noexcept;
+  static void leave() noexcept;
 };
 
 }  // namespace qsrfhs
