@@ -56,6 +56,7 @@
 #include <lumra/session.h>
 #include <lumra/status.h>
 #include <lumra/toolkit.h>
+#include <lumra/transform.h>
 #include <lumra/types.h>
 #include <lumra/vector_utilities.h>
 #include <lumra/version.h>

@@ -5,6 +5,8 @@
 #include <cstring>
 #include <new>
 
+#include "signal/failure.hpp"
+
 namespace doors {
 namespace {
 
@@ -31,6 +33,9 @@ lumra_status keep_failure(const char *function) noexcept {
     throw;
   } catch (const refusal &reason) {
     return keep(function, reason.code(), reason.text());
+  } catch (const dsp::transform_failure &reason) {
+    if (!reason.out_of_memory()) return keep(function, LUMRA_TRANSFORM_FAILED, reason.what());
+    return keep(function, LUMRA_NO_MEMORY, "not enough memory for a transform; free some, or ask for less");
   } catch (const std::bad_alloc &) {
     return keep(function, LUMRA_NO_MEMORY, "not enough memory; free some, or ask for less");
   } catch (const std::exception &reason) {

@@ -1,0 +1,74 @@
+// An MKL transform and who frees it. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <mkl_dfti.h>
+
+#include <cstdint>
+#include <memory>
+
+#include "signal/failure.hpp"
+
+namespace dsp {
+
+/// Longest transform in points. Sizes beyond it make MKL 2020.4 divide by zero or run without end.
+inline constexpr std::uint64_t most_fft_points = std::uint64_t{1} << 27;
+
+/// What a transform was being asked when it failed.
+enum class dfti_step { create, copy, placement, storage, scale, commit, forward, backward };
+
+class dfti_failure : public transform_failure {
+ public:
+  dfti_failure(dfti_step step, MKL_LONG status) noexcept;
+  [[nodiscard]] dfti_step step() const noexcept { return step_; }
+  [[nodiscard]] MKL_LONG status() const noexcept { return status_; }
+
+ private:
+  dfti_step step_;
+  MKL_LONG status_;
+};
+
+struct dfti_settings {
+  DFTI_CONFIG_VALUE precision = DFTI_SINGLE;
+  DFTI_CONFIG_VALUE domain = DFTI_COMPLEX;  // spectra of real records are the half with the bins from 0 on
+  MKL_LONG lengths[2] = {1, 0};             // points and 0 for one dimension, or rows and columns
+  bool in_place = false;
+  double forward_scale = 1, backward_scale = 1;
+};
+
+/// A committed descriptor, or none. All throw dfti_failure.
+class dfti_descriptor {
+ public:
+  dfti_descriptor() = default;
+  explicit dfti_descriptor(const dfti_settings &settings);
+  /// A copy with workspace of its own.
+  dfti_descriptor(const dfti_descriptor &other);
+  dfti_descriptor(dfti_descriptor &&) = default;
+  dfti_descriptor &operator=(dfti_descriptor &&) = default;
+
+  explicit operator bool() const noexcept { return static_cast<bool>(handle_); }
+
+  // In place, and from one memory to another, as the settings say.
+  void forward(void *data) const { check(DftiComputeForward(handle_.get(), data), dfti_step::forward); }
+  void backward(void *data) const { check(DftiComputeBackward(handle_.get(), data), dfti_step::backward); }
+  void forward(const void *in, void *out) const {
+    check(DftiComputeForward(handle_.get(), const_cast<void *>(in), out), dfti_step::forward);
+  }
+  void backward(const void *in, void *out) const {
+    check(DftiComputeBackward(handle_.get(), const_cast<void *>(in), out), dfti_step::backward);
+  }
+
+ private:
+  struct release {
+    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept { (void)DftiFreeDescriptor(&descriptor); }
+  };
+
+  static void check(MKL_LONG status, dfti_step step) {
+    if (status != 0) [[unlikely]]
+      fail_unless_no_error(status, step);
+  }
+  static void fail_unless_no_error(MKL_LONG status, dfti_step step);
+
+  std::unique_ptr<DFTI_DESCRIPTOR, release> handle_;
+};
+
+}  // namespace dsp
