@@ -50,6 +50,7 @@
 #define LUMRA_LUMRA_H
 
 #include <lumra/core_services.h>
+#include <lumra/elementwise.h>
 #include <lumra/error_vector.h>
 #include <lumra/host_array.h>
 #include <lumra/library_info.h>

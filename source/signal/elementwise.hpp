@@ -1,0 +1,60 @@
+// Element by element. Complex single precision goes through the kernels, whose order of operations is the one of all
+// types here. Outputs have the size of the inputs, and may be one of those that have their type.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <complex>
+#include <cstdint>
+#include <span>
+
+namespace dsp {
+
+template <class T>
+struct real_of {
+  using type = T;
+};
+template <class T>
+struct real_of<std::complex<T>> {
+  using type = T;
+};
+/// The type of a sample's magnitude.
+template <class T>
+using real_t = typename real_of<T>::type;
+
+// T: float, double and complex numbers of them.
+
+template <class T>
+void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexcept;
+template <class T>
+void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept;
+template <class T>
+void scale(std::span<const T> x, real_t<T> factor, std::span<T> out) noexcept;
+template <class T>
+void magnitude(std::span<const T> x, std::span<real_t<T>> out) noexcept;
+template <class T>
+void power(std::span<const T> x, std::span<real_t<T>> out) noexcept;
+
+/// out = a log2(x) + b for real T.
+template <class T>
+void log2(std::span<const T> x, T a, T b, std::span<T> out) noexcept;
+/// out = a log2(|x|^2) + b.
+template <class T>
+void log2_power(std::span<const T> x, real_t<T> a, real_t<T> b, std::span<real_t<T>> out) noexcept;
+
+/// The polynomial of at least one coefficient, c[0] first; x is of the type of C or of its real parts.
+template <class T, class C>
+void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept;
+
+/// Gains at keys start + k * step; 1 to 2^31 - 1 of them.
+template <class Real>
+struct gain_table {
+  std::span<const std::complex<Real>> gains;
+  Real start, step;
+};
+
+/// out = x times the gain at its key, interpolated. Throws std::bad_alloc.
+template <class Real>
+void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
+             std::span<std::complex<Real>> out);
+
+}  // namespace dsp
