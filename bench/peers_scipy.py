@@ -2,6 +2,7 @@
 import time
 
 import numpy as np
+import scipy.fft
 import scipy.signal
 
 
@@ -28,3 +29,6 @@ for name, x in (("real", record.real.copy()), ("complex", record)):
     coefficients = b.astype(np.float32), a.astype(np.float32)
     print(f"scipy.signal.lfilter, order 4, {name}: "
           f"{rate(record.size * 20, lambda: [scipy.signal.lfilter(*coefficients, x) for _ in range(20)]):.0f} Msamples/s")
+for n in (1024, 65536, 1009):
+    for name, x, transform in (("fft", samples[:n], scipy.fft.fft), ("rfft", samples.real[:n].copy(), scipy.fft.rfft)):
+        print(f"scipy.fft.{name}/{n}: {n / rate(n, lambda: transform(x)):.1f} us")
