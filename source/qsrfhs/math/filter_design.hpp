@@ -10,9 +10,6 @@
 
 namespace qsrfhs {
 
-/// Longest filter that is designed: a second's work.
-inline constexpr double longest_design = 1 << 24;
-
 /// The filter of a key, computed in double precision; null where key, input and number of coefficients (0: any) make
 /// none. Throws std::bad_alloc.
 std::unique_ptr<Filter> design_filter(const lumra_filter_key &key, const void *input, std::uint64_t count);

@@ -4,6 +4,7 @@
 #include "element_wise.inl"
 //
 #include "complex.inl"
+#include "fir.inl"
 #include "log2.inl"
 #include "lookup.inl"
 #include "polynomial.inl"
@@ -42,4 +43,9 @@ static constexpr kernel_table table = {
     .complex_polyphase = &complex_polyphase,
     .stretched = &stretched,
     .complex_stretched = &complex_stretched,
+    .fir = &fir,
+    .fir_double = &fir_double,
+    .complex_fir = &complex_fir,
+    .complex_fir_double = &complex_fir_double,
+    .multiply_double = &multiply_double,
 };

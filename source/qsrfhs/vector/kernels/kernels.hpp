@@ -117,6 +117,20 @@ struct kernel_table {
   /// The same with complex x and out, offsets in complex_tap_order.
   void (*complex_stretched)(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps,
                             const float *x, float *out);
+
+  // out[k] = sum over j < count, in this order, of taps[j] * x[k - j], for n outputs apart from x. 32 bytes behind the
+  // last sample can be read, not only used.
+
+  /// Values that are `width` apart, n of them in all: 1 for real samples, 2 for complex ones.
+  void (*fir)(const float *x, const float *taps, std::size_t count, std::size_t width, float *out, std::size_t n);
+  void (*fir_double)(const double *x, const double *taps, std::size_t count, std::size_t width, double *out,
+                     std::size_t n);
+  /// Complex taps, samples and outputs.
+  void (*complex_fir)(const float *x, const float *taps, std::size_t count, float *out, std::size_t n);
+  void (*complex_fir_double)(const double *x, const double *taps, std::size_t count, double *out, std::size_t n);
+
+  /// a[k] *= b[k], n complex.
+  void (*multiply_double)(double *a, const double *b, std::size_t n);
 };
 
 extern const kernel_table avx_kernels;

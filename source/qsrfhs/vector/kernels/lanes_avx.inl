@@ -9,6 +9,9 @@ static constexpr std::size_t polynomial_coefficients = 32;
 static constexpr std::size_t polynomial_boundary = 32;
 static constexpr bool peak_sums_in_lanes = true;
 
+/// Sums that a filter keeps in registers; results do not depend on it.
+static constexpr std::size_t filter_sums = 8;
+
 static inline f8 load(const float *p) {
   return {_mm256_loadu_ps(p)};
 }
@@ -199,4 +202,44 @@ static inline f8 multiply_in_double(f8 a, double factor) {
 static inline void sum_pairs(f8 a, float *sums) {
   const __m128 four = _mm_add_ps(_mm256_castps256_ps128(a.v), _mm256_extractf128_ps(a.v, 1));
   _mm_storel_pi(reinterpret_cast<__m64 *>(sums), _mm_add_ps(four, _mm_movehl_ps(four, four)));
+}
+
+/// a - b in even lanes, a + b in odd ones.
+static inline f8 subtract_and_add(f8 a, f8 b) {
+  return {_mm256_addsub_ps(a.v, b.v)};
+}
+static inline f8 load_repeated(const float *p) {
+  return {_mm256_broadcast_ss(p)};
+}
+
+/// Four doubles.
+struct d4 {
+  __m256d v;
+};
+
+static inline d4 load(const double *p) {
+  return {_mm256_loadu_pd(p)};
+}
+static inline void store(double *p, d4 a) {
+  _mm256_storeu_pd(p, a.v);
+}
+static inline d4 load_repeated(const double *p) {
+  return {_mm256_broadcast_sd(p)};
+}
+static inline d4 operator+(d4 a, d4 b) {
+  return {_mm256_add_pd(a.v, b.v)};
+}
+static inline d4 operator*(d4 a, d4 b) {
+  return {_mm256_mul_pd(a.v, b.v)};
+}
+static inline d4 swap_pairs(d4 a) {
+  return {_mm256_permute_pd(a.v, 0x5)};
+}
+static inline d4 subtract_and_add(d4 a, d4 b) {
+  return {_mm256_addsub_pd(a.v, b.v)};
+}
+/// Two complex values.
+static inline d4 multiply_pairs(d4 a, d4 b) {
+  const __m256d by_re = _mm256_mul_pd(a.v, _mm256_movedup_pd(b.v));
+  return {_mm256_addsub_pd(by_re, _mm256_mul_pd(_mm256_permute_pd(a.v, 0x5), _mm256_permute_pd(b.v, 0xf)))};
 }

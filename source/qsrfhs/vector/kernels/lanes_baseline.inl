@@ -9,6 +9,9 @@ static constexpr std::size_t polynomial_coefficients = 16;
 static constexpr std::size_t polynomial_boundary = 0;
 static constexpr bool peak_sums_in_lanes = false;
 
+/// Sums that a filter keeps in registers; results do not depend on it.
+static constexpr std::size_t filter_sums = 4;
+
 static inline f8 load(const float *p) {
   return {_mm_loadu_ps(p), _mm_loadu_ps(p + 4)};
 }
@@ -203,4 +206,50 @@ static inline f8 multiply_in_double(f8 a, double factor) {
 static inline void sum_pairs(f8 a, float *sums) {
   const __m128 four = _mm_add_ps(a.low, a.high);
   _mm_storel_pi(reinterpret_cast<__m64 *>(sums), _mm_add_ps(four, _mm_movehl_ps(four, four)));
+}
+
+/// a - b in even lanes, a + b in odd ones.
+static inline f8 subtract_and_add(f8 a, f8 b) {
+  const __m128 signs = _mm_setr_ps(-0.F, 0.F, -0.F, 0.F);
+  return {_mm_add_ps(a.low, _mm_xor_ps(b.low, signs)), _mm_add_ps(a.high, _mm_xor_ps(b.high, signs))};
+}
+static inline f8 load_repeated(const float *p) {
+  return broadcast(*p);
+}
+
+/// Four doubles.
+struct d4 {
+  __m128d low, high;
+};
+
+static inline d4 load(const double *p) {
+  return {_mm_loadu_pd(p), _mm_loadu_pd(p + 2)};
+}
+static inline void store(double *p, d4 a) {
+  _mm_storeu_pd(p, a.low);
+  _mm_storeu_pd(p + 2, a.high);
+}
+static inline d4 load_repeated(const double *p) {
+  return {_mm_set1_pd(*p), _mm_set1_pd(*p)};
+}
+static inline d4 operator+(d4 a, d4 b) {
+  return {_mm_add_pd(a.low, b.low), _mm_add_pd(a.high, b.high)};
+}
+static inline d4 operator*(d4 a, d4 b) {
+  return {_mm_mul_pd(a.low, b.low), _mm_mul_pd(a.high, b.high)};
+}
+static inline d4 swap_pairs(d4 a) {
+  return {_mm_shuffle_pd(a.low, a.low, 1), _mm_shuffle_pd(a.high, a.high, 1)};
+}
+static inline d4 subtract_and_add(d4 a, d4 b) {
+  const __m128d signs = _mm_setr_pd(-0.0, 0.0);
+  return {_mm_add_pd(a.low, _mm_xor_pd(b.low, signs)), _mm_add_pd(a.high, _mm_xor_pd(b.high, signs))};
+}
+static inline __m128d multiply_one(__m128d a, __m128d b) {
+  const __m128d by_im = _mm_mul_pd(_mm_shuffle_pd(a, a, 1), _mm_unpackhi_pd(b, b));
+  return _mm_add_pd(_mm_mul_pd(a, _mm_unpacklo_pd(b, b)), _mm_xor_pd(by_im, _mm_setr_pd(-0.0, 0.0)));
+}
+/// Two complex values.
+static inline d4 multiply_pairs(d4 a, d4 b) {
+  return {multiply_one(a.low, b.low), multiply_one(a.high, b.high)};
 }

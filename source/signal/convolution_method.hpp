@@ -1,0 +1,94 @@
+// How a convolution is computed, and what the ways cost. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <lumra/filter.h>
+
+#include <algorithm>
+#include <bit>
+#include <cmath>
+#include <complex>
+#include <cstddef>
+#include <cstdint>
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/block_transform.hpp"
+
+namespace dsp {
+
+enum class convolution_method : std::int32_t {
+  automatic = LUMRA_METHOD_AUTO,
+  direct = LUMRA_METHOD_DIRECT,
+  fourier = LUMRA_METHOD_FOURIER
+};
+
+/// out[k] = sum over j < count of taps[j] * x[k - j], n outputs apart from x, summed in this order wherever k lies.
+/// `readable` bytes behind the last sample are read, too.
+template <class Sample, class Tap>
+void apply_taps(const Sample *x, const Tap *taps, std::size_t count, Sample *out, std::size_t n) noexcept {
+  using real = real_of<Sample>;
+  const auto &kernels = qsrfhs::kernels::active();
+  const auto *samples = reinterpret_cast<const real *>(x);
+  const auto *values = reinterpret_cast<const real *>(taps);
+  auto *sums = reinterpret_cast<real *>(out);
+  constexpr std::size_t width = sizeof(Sample) / sizeof(real);
+  constexpr bool is_single = sizeof(real) == sizeof(float);
+  if constexpr (is_complex<Tap> && is_single)
+    kernels.complex_fir(samples, values, count, sums, n);
+  else if constexpr (is_complex<Tap>)
+    kernels.complex_fir_double(samples, values, count, sums, n);
+  else if constexpr (is_single)
+    kernels.fir(samples, values, count, width, sums, width * n);
+  else
+    kernels.fir_double(samples, values, count, width, sums, width * n);
+}
+inline constexpr std::size_t readable = 32;
+
+/// a[k] *= b[k].
+inline void multiply_bins(std::complex<float> *a, const std::complex<float> *b, std::size_t n) noexcept {
+  qsrfhs::kernels::active().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
+}
+inline void multiply_bins(std::complex<double> *a, const std::complex<double> *b, std::size_t n) noexcept {
+  qsrfhs::kernels::active().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
+}
+
+// Costs in multiply-adds of real taps and samples in single precision, which are done eight at a time. The constants
+// are measured beside MKL's transforms (open_filter_bench).
+
+/// Of one tap for one output.
+template <class Sample, class Tap>
+inline constexpr double tap_cost = sizeof(real_of<Sample>) / sizeof(float) * (is_complex<Sample> ? 2.0 : 1.0) *
+                                   (is_complex<Tap> ? 2.0 : 1.0);
+
+/// Of a block through both transforms: of `length` points, with copies and the product of the spectra.
+template <class Sample>
+double block_cost(std::size_t length) noexcept {
+  constexpr double caches[] = {48e3, 1e6};        // bytes
+  constexpr double slower[] = {1.0, 1.8, 5.0};    // where a block fits neither
+  constexpr double transforms = 0.9, rest = 3.0;  // of a point and stage; of a point
+  constexpr double sample = (is_complex<Sample> ? 1.7 : 1.0) * (sizeof(real_of<Sample>) / sizeof(float));
+  const auto points = static_cast<double>(length);
+  const double bytes = 3 * points * sizeof(Sample);
+  const double slowness = slower[bytes <= caches[0] ? 0 : bytes <= caches[1] ? 1 : 2];
+  return sample * (transforms * slowness * points * std::log2(points) + rest * points);
+}
+
+/// The transform for overlap-save blocks of that many taps, at most most_fft_points / 2: a power of two, and the
+/// shortest that costs no more than a tenth above the cheapest for one sample.
+template <class Sample>
+std::size_t best_block(std::size_t taps) noexcept {
+  constexpr std::size_t shortest = 64, tries = 6;
+  const auto cost = [taps](std::size_t length) {
+    return block_cost<Sample>(length) / static_cast<double>(length - taps + 1);
+  };
+  const std::size_t first = std::max(shortest, std::bit_ceil(2 * taps));
+  double cheapest = cost(first);
+  std::size_t last = first;
+  for (std::size_t k = 1; k < tries && 2 * last <= most_fft_points; ++k) {
+    last *= 2;
+    cheapest = std::min(cheapest, cost(last));
+  }
+  for (std::size_t length = first;; length *= 2)
+    if (length >= last || cost(length) <= 1.1 * cheapest) return length;
+}
+
+}  // namespace dsp
