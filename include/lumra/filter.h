@@ -28,8 +28,8 @@ enum lumra_method { LUMRA_METHOD_AUTO = 0, LUMRA_METHOD_DIRECT = 1, LUMRA_METHOD
  * LUMRA_METHOD_AUTO is direct. With more taps it takes blocks through transforms (overlap-save) where these are faster;
  * outputs are then within rounding of those of any other cut. A long call costs two transforms a block; a short one
  * adds its samples directly to what the latest block left for outputs to come, until another block is cheaper. So no
- * sample costs more than the directly summed filter would, and no call more than two transforms for each block that it
- * begins. A filter by transforms holds some 4 transform lengths of samples, up to 64 times the taps. */
+ * sample costs more than in the direct filter, and no call more than two transforms for each block that it begins. A
+ * filter by transforms holds four of their lengths in samples, each 2 to 8 times the taps where these are many. */
 typedef struct lumra_fir lumra_fir;
 
 typedef struct lumra_fir_options {

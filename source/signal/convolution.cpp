@@ -11,16 +11,6 @@
 namespace dsp {
 namespace {
 
-/// Smallest number not below `least` without prime factors above 7.
-std::size_t smooth_length(std::size_t least) noexcept {
-  for (std::size_t n = least;; ++n) {
-    std::size_t rest = n;
-    for (const std::size_t prime : {7, 5, 3, 2})
-      while (rest % prime == 0) rest /= prime;
-    if (rest == 1) return n;
-  }
-}
-
 /// Copies x[first] to x[first + count - 1], where there is silence around x.
 template <class Sample>
 void copy_with_silence(std::span<const Sample> x, std::ptrdiff_t first, std::size_t count, Sample *to) noexcept {
@@ -72,7 +62,7 @@ void convolve_in_blocks(std::span<const Sample> x, std::span<const Sample> taps,
 
 /// Points of one transform for all: what wraps around must not reach the part.
 std::size_t whole_length(std::size_t nx, std::size_t ny, const convolution_part &part) noexcept {
-  return smooth_length(std::max({nx + ny - 1 - part.first, part.first + part.count, nx}));
+  return fast_length(std::max({nx + ny - 1 - part.first, part.first + part.count, nx}));
 }
 
 template <class Sample>

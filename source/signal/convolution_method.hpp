@@ -62,33 +62,42 @@ inline constexpr double tap_cost = sizeof(real_of<Sample>) / sizeof(float) * (is
 /// Of a block through both transforms: of `length` points, with copies and the product of the spectra.
 template <class Sample>
 double block_cost(std::size_t length) noexcept {
-  constexpr double caches[] = {48e3, 1e6};        // bytes
-  constexpr double slower[] = {1.0, 1.8, 5.0};    // where a block fits neither
-  constexpr double transforms = 0.9, rest = 3.0;  // of a point and stage; of a point
-  constexpr double sample = (is_complex<Sample> ? 1.7 : 1.0) * (sizeof(real_of<Sample>) / sizeof(float));
+  constexpr double caches[] = {50e3, 1e6};      // bytes
+  constexpr double slower[] = {1.0, 1.6, 3.0};  // where a block fits neither
+  constexpr bool is_double = sizeof(real_of<Sample>) == sizeof(double);
+  constexpr double stage = is_double ? (is_complex<Sample> ? 5.6 : 3.4) : (is_complex<Sample> ? 3.2 : 1.4);
+  constexpr double rest = 2.0 * sizeof(Sample);  // beside the stages
   const auto points = static_cast<double>(length);
   const double bytes = 3 * points * sizeof(Sample);
   const double slowness = slower[bytes <= caches[0] ? 0 : bytes <= caches[1] ? 1 : 2];
-  return sample * (transforms * slowness * points * std::log2(points) + rest * points);
+  return points * (stage * slowness * std::log2(points) + rest);
+}
+
+/// Smallest number of points not below `least` for which MKL is fast: a multiple of 32 without prime factors above 7.
+inline std::size_t fast_length(std::size_t least) noexcept {
+  for (std::size_t n = (least + 31) / 32;; ++n) {
+    std::size_t rest = n;
+    for (const unsigned prime : {7U, 5U, 3U, 2U})
+      while (rest % prime == 0) rest /= prime;
+    if (rest == 1) return 32 * n;
+  }
 }
 
 /// The transform for overlap-save blocks of that many taps, at most most_fft_points / 2: a power of two, and the
-/// shortest that costs no more than a tenth above the cheapest for one sample.
+/// shortest that costs no more than a tenth above the cheapest for one sample. Long ones are kept short, for memory.
 template <class Sample>
 std::size_t best_block(std::size_t taps) noexcept {
-  constexpr std::size_t shortest = 64, tries = 6;
+  constexpr std::size_t shortest = 64, long_enough = std::size_t{1} << 18;
   const auto cost = [taps](std::size_t length) {
     return block_cost<Sample>(length) / static_cast<double>(length - taps + 1);
   };
   const std::size_t first = std::max(shortest, std::bit_ceil(2 * taps));
+  const std::size_t last = std::clamp(2 * first, long_enough, most_fft_points);
   double cheapest = cost(first);
-  std::size_t last = first;
-  for (std::size_t k = 1; k < tries && 2 * last <= most_fft_points; ++k) {
-    last *= 2;
-    cheapest = std::min(cheapest, cost(last));
-  }
-  for (std::size_t length = first;; length *= 2)
-    if (length >= last || cost(length) <= 1.1 * cheapest) return length;
+  for (std::size_t length = 2 * first; length <= last; length *= 2) cheapest = std::min(cheapest, cost(length));
+  std::size_t length = first;
+  while (cost(length) > 1.1 * cheapest) length *= 2;
+  return length;
 }
 
 }  // namespace dsp

@@ -47,11 +47,16 @@ Sample *overlap_save<Sample, Tap>::run() {
 }
 
 template <class Sample, class Tap>
-fir_filter<Sample, Tap>::by_blocks::by_blocks(std::span<const Tap> taps, std::size_t length)
-    : blocks(taps, length),
-      most_recent(std::min(blocks.step(),
-                           static_cast<std::size_t>(std::sqrt(block_cost<Sample>(length) / tap_cost<Sample, Tap>)))),
-      recent(2 * most_recent + readable / sizeof(Sample)) {
+fir_filter<Sample, Tap>::by_blocks::by_blocks(std::span<const Tap> taps)
+    : blocks(taps, best_block<Sample>(taps.size())) {
+  std::size_t shortest = fast_length(2 * taps.size());
+  if (4 * shortest <= 3 * blocks.length())
+    short_blocks.emplace(taps, shortest);
+  else
+    shortest = blocks.length();
+  const double worth = std::sqrt(block_cost<Sample>(shortest) / tap_cost<Sample, Tap>);
+  most_recent = std::min(shortest - taps.size() + 1, static_cast<std::size_t>(worth));
+  recent = qsrfhs::aligned_buffer<Sample>(2 * most_recent + readable / sizeof(Sample));
   std::fill_n(recent.data(), recent.size(), Sample{});
 }
 
@@ -60,7 +65,7 @@ fir_filter<Sample, Tap>::fir_filter(std::span<const Tap> taps, convolution_metho
     : taps_(taps.size()), block_(direct_block), line_(0, 0) {
   std::copy(taps.begin(), taps.end(), taps_.data());
   if (takes_blocks<Sample, Tap>(taps.size(), method)) {
-    fourier_.emplace(taps, best_block<Sample>(taps.size()));
+    fourier_.emplace(taps);
     block_ = fourier_->blocks.step();
   }
   line_ = delay_line<Sample>(taps.size() - 1, block_);
@@ -93,15 +98,17 @@ void fir_filter<Sample, Tap>::process_block(by_blocks &fourier, std::span<const 
     fourier.ahead_count -= n;
     return;
   }
+  const bool is_short = fourier.short_blocks && n <= fourier.short_blocks->step();
+  overlap_save<Sample, Tap> &blocks = is_short ? *fourier.short_blocks : fourier.blocks;
   const std::size_t past = taps_.size() - 1;
-  const auto window = fourier.blocks.window();
+  const auto window = blocks.window();
   const auto rest = std::copy_n(first - past, past + n, window.begin());
   std::fill(rest, window.end(), Sample{});
   fourier.recent_count = fourier.ahead_count = 0;  // until the block is there
-  const Sample *const results = fourier.blocks.run();
+  const Sample *const results = blocks.run();
   std::copy_n(results, n, out);
   fourier.ahead = results + n;
-  fourier.ahead_count = fourier.blocks.step() - n;
+  fourier.ahead_count = blocks.step() - n;
 }
 
 template <class Sample, class Tap>

@@ -56,6 +56,7 @@ class overlap_save {
   /// At most most_fft_points / 2 taps, and transforms of at least as many points.
   overlap_save(std::span<const Tap> taps, std::size_t length);
 
+  [[nodiscard]] std::size_t length() const noexcept { return transform_.length(); }
   /// New samples that a block takes.
   [[nodiscard]] std::size_t step() const noexcept { return transform_.length() - past_; }
 
@@ -95,11 +96,12 @@ class fir_filter {
   /// come. Short calls take that and add directly what the samples since then do, until this would take longer than
   /// the next block.
   struct by_blocks {
-    by_blocks(std::span<const Tap> taps, std::size_t length);
+    explicit by_blocks(std::span<const Tap> taps);
 
     overlap_save<Sample, Tap> blocks;
-    std::size_t most_recent;                // samples worth adding directly
-    qsrfhs::aligned_buffer<Sample> recent;  // as much silence, then the samples since the block
+    std::optional<overlap_save<Sample, Tap>> short_blocks;  // for calls that are no longer than the filter
+    std::size_t most_recent;                                // samples that are worth adding directly
+    qsrfhs::aligned_buffer<Sample> recent;                  // as much silence, then the samples since the block
     std::size_t recent_count = 0;
     const Sample *ahead = nullptr;  // outputs to come
     std::size_t ahead_count = 0;
