@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include "qsrfhs/math/mkl_runtime.hpp"
 
@@ -62,13 +63,12 @@ fir_filter<Sample, Tap>::by_blocks::by_blocks(std::span<const Tap> taps)
 
 template <class Sample, class Tap>
 fir_filter<Sample, Tap>::fir_filter(std::span<const Tap> taps, convolution_method method)
-    : taps_(taps.size()), block_(direct_block), line_(0, 0) {
+    : taps_(taps.size()),
+      fourier_(takes_blocks<Sample, Tap>(taps.size(), method) ? std::optional<by_blocks>(std::in_place, taps)
+                                                              : std::nullopt),
+      block_(fourier_ ? fourier_->blocks.step() : direct_block),
+      line_(taps.size() - 1, block_) {
   std::copy(taps.begin(), taps.end(), taps_.data());
-  if (takes_blocks<Sample, Tap>(taps.size(), method)) {
-    fourier_.emplace(taps);
-    block_ = fourier_->blocks.step();
-  }
-  line_ = delay_line<Sample>(taps.size() - 1, block_);
 }
 
 template <class Sample, class Tap>
