@@ -100,8 +100,8 @@ void convolve(std::span<const Sample> x, std::span<const Sample> y, const convol
   const double direct = static_cast<double>(part.count) * static_cast<double>(y.size()) * tap_cost<Sample, Sample>;
   if (method == convolution_method::direct || y.size() > longest_in_blocks) return convolve_directly(x, y, part, out);
   const std::size_t block = best_block<Sample>(y.size()), step = block - y.size() + 1;
+  // Beside the blocks there are the taps to transform; in one piece, three transforms instead of a block's two.
   const double blocks = block_cost<Sample>(block) * static_cast<double>(1 + (part.count + step - 1) / step);
-  // The transform of one block is taken for granted; that of all data is a third more work, with the second record.
   const std::size_t whole = x.size() <= most_fft_points / 4 ? whole_length(x.size(), y.size(), part) : 0;
   const double one = whole == 0 ? blocks : 1.5 * block_cost<Sample>(whole);
   if (method == convolution_method::automatic && direct <= std::min(blocks, one))

@@ -4,6 +4,7 @@ import ctypes
 import threading
 import unittest
 
+import numpy as np
 import open as lumra
 
 
@@ -41,22 +42,24 @@ class Frame(lumra.Test):
         for kind in kinds:
             with self.subTest(kind):
                 options = lumra.record(kind)
+                between = lumra.functions[f"{kind}_create"].argtypes[1:-1]
+                data = [np.ones(16) if t is ctypes.c_void_p else 1 for t in between]
                 size = ctypes.sizeof(options)
                 self.assertEqual(size, sum(ctypes.sizeof(t) for _, t in options._fields_))
                 initialiser = lumra.initialisers[f"lumra_{kind}_options"]
                 self.assertEqual(len(options._fields_), initialiser.count(",") + 1)
-                self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_create", options, None, says="null")
+                self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_create", options, *data, None, says="null")
                 handle = ctypes.c_void_p(1)
                 for bad in (0, 7, 4097, 2**32 - 1):
                     options.size = bad
-                    self.refused("LUMRA_BAD_SIZE_FIELD", f"{kind}_create", options, handle, says=f"size is {bad}")
+                    self.refused("LUMRA_BAD_SIZE_FIELD", f"{kind}_create", options, *data, handle, says=f"size is {bad}")
                 longer = (ctypes.c_uint8 * (size + 8))(*bytes(lumra.record(kind)))
                 ctypes.c_uint32.from_buffer(longer).value = size + 8
-                lumra.call(f"{kind}_create", longer, handle)
+                lumra.call(f"{kind}_create", longer, *data, handle)
                 for address in (handle.value, handle.value, None, 64):  # freed again, or never one: no matter
                     lumra.run(f"{kind}_free", address)
                 longer[size + 7] = 1
-                self.refused("LUMRA_BAD_SIZE_FIELD", f"{kind}_create", longer, handle, says="does not know")
+                self.refused("LUMRA_BAD_SIZE_FIELD", f"{kind}_create", longer, *data, handle, says="does not know")
 
 
 if __name__ == "__main__":

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <complex>
+#include <initializer_list>
 #include <limits>
 #include <vector>
 
@@ -28,8 +29,8 @@ void expect_sums(Fir kernel_table::*fir, ComplexFir kernel_table::*complex_fir) 
   constexpr std::size_t behind = 32 / sizeof(Real);
   const auto taps = values<Real>(2 * 70, 1);
   for (const kernel_table *table : {&baseline_kernels, &active()})
-    for (const std::size_t count : {1, 2, 3, 64, 70})
-      for (const std::size_t n : {0, 1, 2, 3, 7, 8, 9, 31, 64, 100, 131}) {
+    for (const std::size_t count : std::initializer_list<std::size_t>{1, 2, 3, 64, 70})
+      for (const std::size_t n : std::initializer_list<std::size_t>{0, 1, 2, 3, 7, 8, 9, 31, 64, 100, 131}) {
         auto x = values<Real>(2 * (n + count - 1), 7);
         x.resize(x.size() + behind, std::numeric_limits<Real>::quiet_NaN());
         for (const std::size_t width : {std::size_t{1}, std::size_t{2}}) {
@@ -68,7 +69,7 @@ TEST(FirKernels, SumsInOrder) {
 }
 
 TEST(FirKernels, ProductsOfSpectra) {
-  for (const std::size_t n : {0, 1, 2, 5}) {
+  for (const std::size_t n : std::initializer_list<std::size_t>{0, 1, 2, 5}) {
     const auto a = values<double>(2 * n, 1), b = values<double>(2 * n, 2);
     for (const kernel_table *table : {&baseline_kernels, &active()}) {
       auto got = a;
