@@ -31,11 +31,13 @@ class handles {
     *out = reinterpret_cast<Handle *>(take_cell(&kind_, object.get()));
     (void)object.release();
   }
+  /// Null where there is no such object.
+  static Object *find(const Handle *handle) noexcept { return static_cast<Object *>(find_object(handle, &kind_)); }
   static Object &get(const Handle *handle, std::string_view name) {
     require_present(handle, name);
-    void *const object = find_object(handle, &kind_);
+    Object *const object = find(handle);
     require(object != nullptr, LUMRA_WRONG_OBJECT, name, " was freed, or is another kind of object; make one first");
-    return *static_cast<Object *>(object);
+    return *object;
   }
   static void free(Handle *handle) noexcept { delete static_cast<Object *>(release_cell(handle, &kind_)); }
 

@@ -9,6 +9,7 @@
 #include "lookup.inl"
 #include "polynomial.inl"
 #include "polyphase.inl"
+#include "recursion.inl"
 #include "resampler.inl"
 #include "rms.inl"
 #include "spectrum.inl"
@@ -48,4 +49,5 @@ static constexpr kernel_table table = {
     .complex_fir = &complex_fir,
     .complex_fir_double = &complex_fir_double,
     .multiply_double = &multiply_double,
+    .recursion = &recursion,
 };

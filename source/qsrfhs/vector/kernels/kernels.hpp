@@ -42,6 +42,15 @@ struct tap_offsets {
 /// Where tap k of eight stands for complex samples, so that taps can be doubled within the halves of a register.
 constexpr int complex_tap_order[8] = {0, 1, 4, 5, 2, 3, 6, 7};
 
+/// A recursion of outputs that goes on by blocks of eight samples: each output is a sum over the outputs in front of
+/// the block and the block's samples up to its own.
+struct block_recursion {
+  std::size_t order;
+  const double *responses;  // order x 8: what the outputs before, newest first, leave in the block's outputs
+  const double *own;        // 4 x 4: what each of four samples adds to the outputs at their places, 0 in front of it
+  const double *later;      // 4 x 4: what each of the first four samples adds to the last four outputs
+};
+
 struct kernel_table {
   /// out[k] = x[k], n complex.
   void (*copy)(const float *x, float *out, std::size_t n);
@@ -131,6 +140,11 @@ struct kernel_table {
 
   /// a[k] *= b[k], n complex.
   void (*multiply_double)(double *a, const double *b, std::size_t n);
+
+  /// Turns samples into outputs, in place, in whole blocks of `count` streams, 1 or 2. In front of each stream stand as
+  /// many outputs as the order, rounded up to a multiple of 4. Samples are finite: where one is not, the outputs of its
+  /// block in front of it become NaN, too.
+  void (*recursion)(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count);
 };
 
 extern const kernel_table avx_kernels;

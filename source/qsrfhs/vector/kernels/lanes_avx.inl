@@ -243,3 +243,9 @@ static inline d4 multiply_pairs(d4 a, d4 b) {
   const __m256d by_re = _mm256_mul_pd(a.v, _mm256_movedup_pd(b.v));
   return {_mm256_addsub_pd(by_re, _mm256_mul_pd(_mm256_permute_pd(a.v, 0x5), _mm256_permute_pd(b.v, 0xf)))};
 }
+
+/// True when all are smaller than `least`; false with a NaN.
+static inline bool all_below(d4 a, d4 least) {
+  const __m256d size = _mm256_andnot_pd(_mm256_set1_pd(-0.0), a.v);
+  return _mm256_movemask_pd(_mm256_cmp_pd(size, least.v, _CMP_LT_OQ)) == 0xf;
+}

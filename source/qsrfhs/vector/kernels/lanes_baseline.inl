@@ -253,3 +253,11 @@ static inline __m128d multiply_one(__m128d a, __m128d b) {
 static inline d4 multiply_pairs(d4 a, d4 b) {
   return {multiply_one(a.low, b.low), multiply_one(a.high, b.high)};
 }
+
+/// True when all are smaller than `least`; false with a NaN.
+static inline bool all_below(d4 a, d4 least) {
+  const __m128d sign = _mm_set1_pd(-0.0);
+  const __m128d low = _mm_cmplt_pd(_mm_andnot_pd(sign, a.low), least.low);
+  const __m128d high = _mm_cmplt_pd(_mm_andnot_pd(sign, a.high), least.high);
+  return _mm_movemask_pd(_mm_and_pd(low, high)) == 3;
+}
