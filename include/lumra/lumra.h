@@ -55,6 +55,7 @@
 #include <lumra/filter.h>
 #include <lumra/host_array.h>
 #include <lumra/library_info.h>
+#include <lumra/linear_algebra.h>
 #include <lumra/session.h>
 #include <lumra/status.h>
 #include <lumra/toolkit.h>
