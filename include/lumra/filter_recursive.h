@@ -76,8 +76,9 @@ LUMRA_EXPORT lumra_status lumra_iir_process(lumra_iir *filter, const void *in, v
 /* Puts the filter back to rest. Returns 0, LUMRA_NULL_ARGUMENT or LUMRA_WRONG_OBJECT. */
 LUMRA_EXPORT lumra_status lumra_iir_reset(lumra_iir *filter);
 
-/* The method that the filter uses: LUMRA_IIR_IN_ORDER or LUMRA_IIR_BLOCKS. Codes as lumra_iir_reset, then
- * LUMRA_NULL_ARGUMENT method. */
+/* The type of the filter's samples, and the method that it uses: LUMRA_IIR_IN_ORDER or LUMRA_IIR_BLOCKS. Codes as
+ * lumra_iir_reset, then LUMRA_NULL_ARGUMENT for the result. */
+LUMRA_EXPORT lumra_status lumra_iir_get_type(const lumra_iir *filter, int32_t *type);
 LUMRA_EXPORT lumra_status lumra_iir_get_method(const lumra_iir *filter, int32_t *method);
 
 /* The state of the transposed direct form II, as scipy.signal's zi: max(M, N) values of the samples' kind in double

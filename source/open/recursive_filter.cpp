@@ -188,6 +188,14 @@ lumra_status lumra_iir_reset(lumra_iir *filter) {
   return enter(__func__, [&] { iirs::get(filter, "filter").filter.reset(); });
 }
 
+lumra_status lumra_iir_get_type(const lumra_iir *filter, int32_t *type) {
+  return enter(__func__, [&] {
+    const iir &object = iirs::get(filter, "filter");
+    require_present(type, "type");
+    *type = object.type;
+  });
+}
+
 lumra_status lumra_iir_get_method(const lumra_iir *filter, int32_t *method) {
   return enter(__func__, [&] {
     const iir &object = iirs::get(filter, "filter");
