@@ -5,6 +5,7 @@
 #define LUMRA_FILTER_H
 
 #include <lumra/export.h>
+#include <lumra/filter_recursive.h>
 #include <lumra/status.h>
 #include <lumra/types.h>
 #include <stdint.h>

@@ -77,8 +77,9 @@ typedef lumra_f64_matrix_block **lumra_f64_matrix;
 typedef lumra_cf32_matrix_block **lumra_cf32_matrix;
 typedef lumra_cf64_matrix_block **lumra_cf64_matrix;
 
-/* A host's resize service. typeCode is one of enum lumra_type_code. handleAddress is the address of a handle; the service may replace the block, and the
- * handle where that is null. newSize is the size argument that the calling function names. 0 on success. */
+/* A host's resize service. typeCode is one of enum lumra_type_code. handleAddress is the address of a handle; the
+ * service may replace the block, and the handle where that is null. newSize is the size argument that the calling
+ * function names. 0 on success. */
 typedef int32_t (*lumra_array_resize)(int32_t typeCode, int32_t dimensions, void *handleAddress, uint64_t newSize);
 
 /* Hands over the host's resize service; null goes back to the search among the process's symbols, made afresh at the

@@ -14,16 +14,16 @@
  * Outputs are the caller's. How much a call writes is known before: a formula in the header, and a function where it
  * depends on more than the arguments. Too little room is refused before anything is taken or written.
  *
- * Statuses: every function that can fail returns a lumra_status, 0 for success. After a failure nothing was written, and
- * an object is as it was before, unless the header says otherwise. lumra_status_text says what a code means;
- * lumra_last_error what happened to the calling thread last: function, argument, value, and what would be right. Nothing
- * is printed, no environment is read or changed, nothing throws or aborts. Codes are listed in the order of the checks;
- * every function can also return LUMRA_NO_MEMORY, before it has changed anything.
+ * Statuses: every function that can fail returns a lumra_status, 0 for success. After a failure nothing was written,
+ * and an object is as it was before, unless the header says otherwise. lumra_status_text says what a code means;
+ * lumra_last_error what happened to the calling thread last: function, argument, value, and what would be right.
+ * Nothing is printed, no environment is read or changed, nothing throws or aborts. Codes are listed in the order of
+ * the checks; every function can also return LUMRA_NO_MEMORY, before it has changed anything.
  *
- * Objects are opaque: lumra_x_create makes one from a lumra_x_options and writes its address, lumra_x_free frees it and
- * takes null, too. A function that is given a freed object, or another kind of one, refuses it (LUMRA_WRONG_OBJECT). One
- * thread at a time may use an object; any number of objects may be used at once. Functions without an object may be
- * called by any number of threads. An object starts threads only where its options say so.
+ * Objects are opaque: lumra_x_create makes one from a lumra_x_options and writes its address, lumra_x_free frees it
+ * and takes null, too. A function that is given a freed object, or another kind of one, refuses it
+ * (LUMRA_WRONG_OBJECT). One thread at a time may use an object; any number of objects may be used at once. Functions
+ * without an object may be called by any number of threads. An object starts threads only where its options say so.
  *
  * Options are records that begin with their own size, so that they can grow. Begin with the header's initialiser, then
  * change what you need:
@@ -37,8 +37,8 @@
  * header shows.
  *
  * States: what streams can be saved to bytes (lumra_x_save; lumra_x_state_size tells how many) and loaded again, in
- * another process and on another machine (lumra_x_load). The bytes are versioned and checked: what is cut, changed or of
- * another kind of object is refused (LUMRA_BAD_STATE).
+ * another process and on another machine (lumra_x_load). The bytes are versioned and checked: what is cut, changed or
+ * of another kind of object is refused (LUMRA_BAD_STATE).
  *
  * Results do not depend on how a stream was cut into calls, on the number of threads, or on which build of the loops
  * the processor gets, but where a header says so. The last bits of a Fourier transform may differ between models of

@@ -7,6 +7,8 @@
 #include <functional>
 #include <mutex>
 
+#include "platform/fork.hpp"
+
 namespace doors {
 namespace {
 
@@ -39,6 +41,9 @@ class cell_table {
     return nullptr;
   }
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork() noexcept { mutex_.unlock(); }
+
  private:
   struct slab {
     slab *older = nullptr;
@@ -61,6 +66,11 @@ class cell_table {
 };
 
 constinit cell_table table;
+
+constexpr platform::fork_handlers fork_handlers{[]() noexcept { table.before_fork(); },
+                                                []() noexcept { table.after_fork(); },
+                                                []() noexcept { table.after_fork(); }};
+const platform::fork_participation takes_part(platform::fork_rank::object_handles, fork_handlers);
 
 }  // namespace
 

@@ -20,6 +20,8 @@ enum class fork_rank : std::size_t {
   host_arrays,
   resize_service,
   lookup_batches,
+  object_handles,
+  idle_transforms,
   error_list,
   mkl,
   count

@@ -6,6 +6,7 @@
 #include <mutex>
 #include <utility>
 
+#include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "qsrfhs/math/mkl_runtime.hpp"
 
@@ -27,6 +28,11 @@ transform_kind kind_of(std::size_t length) noexcept {
 /// The latest few descriptors that nobody uses.
 class idle_descriptors {
  public:
+  static idle_descriptors &instance() noexcept {
+    static platform::immortal<idle_descriptors> kept;
+    return kept.get();
+  }
+
   /// None where there is none of that kind.
   dfti_descriptor take(const transform_kind &kind) {
     const std::lock_guard lock(mutex_);
@@ -44,6 +50,10 @@ class idle_descriptors {
     oldest_ = (oldest_ + 1) % idle_.size();
   }
 
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  void after_fork_in_child() noexcept { mutex_.unlock(); }
+
  private:
   struct entry {
     transform_kind kind;
@@ -54,16 +64,13 @@ class idle_descriptors {
   std::size_t oldest_ = 0;
 };
 
-idle_descriptors &idle() {
-  static platform::immortal<idle_descriptors> kept;
-  return kept.get();
-}
+const platform::fork_participant<idle_descriptors> takes_part(platform::fork_rank::idle_transforms);
 
 }  // namespace
 
 template <class Sample>
 block_transform<Sample>::block_transform(std::size_t length)
-    : length_(length), descriptor_(idle().take(kind_of<Sample>(length))) {
+    : length_(length), descriptor_(idle_descriptors::instance().take(kind_of<Sample>(length))) {
   if (descriptor_) return;
   const qsrfhs::mkl_runtime::use in_use;
   const auto kind = kind_of<Sample>(length);
@@ -73,7 +80,7 @@ block_transform<Sample>::block_transform(std::size_t length)
 
 template <class Sample>
 block_transform<Sample>::~block_transform() {
-  idle().keep(kind_of<Sample>(length_), std::move(descriptor_));
+  idle_descriptors::instance().keep(kind_of<Sample>(length_), std::move(descriptor_));
 }
 
 template class block_transform<float>;

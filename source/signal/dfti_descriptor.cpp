@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "signal/dfti_descriptor.hpp"
 
+#include <utility>
+
 namespace dsp {
 namespace {
 
@@ -21,14 +23,16 @@ void dfti_descriptor::fail_unless_no_error(MKL_LONG status, dfti_step step) {
 }
 
 dfti_descriptor::dfti_descriptor(const dfti_settings &settings) {
+  const qsrfhs::mkl_section section;
+  const qsrfhs::mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   auto lengths = settings.lengths;
   const MKL_LONG created =
       settings.lengths[1] == 0
           ? DftiCreateDescriptor(&handle, settings.precision, settings.domain, 1, settings.lengths[0])
           : DftiCreateDescriptor(&handle, settings.precision, settings.domain, 2, lengths);
-  handle_.reset(handle);
-  check(created, dfti_step::create);
+  owned made(handle);
+  check(watched.status(created), dfti_step::create);
   check(DftiSetValue(handle, DFTI_PLACEMENT, settings.in_place ? DFTI_INPLACE : DFTI_NOT_INPLACE),
         dfti_step::placement);
   if (settings.domain == DFTI_REAL)
@@ -37,16 +41,20 @@ dfti_descriptor::dfti_descriptor(const dfti_settings &settings) {
     check(DftiSetValue(handle, DFTI_FORWARD_SCALE, settings.forward_scale), dfti_step::scale);
   if (settings.backward_scale != 1)
     check(DftiSetValue(handle, DFTI_BACKWARD_SCALE, settings.backward_scale), dfti_step::scale);
-  check(DftiCommitDescriptor(handle), dfti_step::commit);
+  check(watched.status(DftiCommitDescriptor(handle)), dfti_step::commit);
+  handle_ = std::move(made);
 }
 
 dfti_descriptor::dfti_descriptor(const dfti_descriptor &other) {
   if (!other) return;
+  const qsrfhs::mkl_section section;
+  const qsrfhs::mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const MKL_LONG copied = DftiCopyDescriptor(other.handle_.get(), &handle);
-  handle_.reset(handle);
-  check(copied, dfti_step::copy);
-  check(DftiCommitDescriptor(handle), dfti_step::commit);
+  owned made(handle);
+  check(watched.status(copied), dfti_step::copy);
+  check(watched.status(DftiCommitDescriptor(handle)), dfti_step::commit);
+  handle_ = std::move(made);
 }
 
 }  // namespace dsp

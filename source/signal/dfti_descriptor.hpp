@@ -6,6 +6,8 @@
 #include <cstdint>
 #include <memory>
 
+#include "qsrfhs/math/mkl_memory.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 #include "signal/failure.hpp"
 
 namespace dsp {
@@ -48,27 +50,39 @@ class dfti_descriptor {
   explicit operator bool() const noexcept { return static_cast<bool>(handle_); }
 
   // In place, and from one memory to another, as the settings say.
-  void forward(void *data) const { check(DftiComputeForward(handle_.get(), data), dfti_step::forward); }
-  void backward(void *data) const { check(DftiComputeBackward(handle_.get(), data), dfti_step::backward); }
+  void forward(void *data) const {
+    compute([&] { return DftiComputeForward(handle_.get(), data); }, dfti_step::forward);
+  }
+  void backward(void *data) const {
+    compute([&] { return DftiComputeBackward(handle_.get(), data); }, dfti_step::backward);
+  }
   void forward(const void *in, void *out) const {
-    check(DftiComputeForward(handle_.get(), const_cast<void *>(in), out), dfti_step::forward);
+    compute([&] { return DftiComputeForward(handle_.get(), const_cast<void *>(in), out); }, dfti_step::forward);
   }
   void backward(const void *in, void *out) const {
-    check(DftiComputeBackward(handle_.get(), const_cast<void *>(in), out), dfti_step::backward);
+    compute([&] { return DftiComputeBackward(handle_.get(), const_cast<void *>(in), out); }, dfti_step::backward);
   }
 
  private:
   struct release {
-    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept { (void)DftiFreeDescriptor(&descriptor); }
+    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept {
+      const qsrfhs::mkl_section section;
+      (void)DftiFreeDescriptor(&descriptor);
+    }
   };
+  using owned = std::unique_ptr<DFTI_DESCRIPTOR, release>;
 
+  template <class Call>
+  static void compute(Call call, dfti_step step) {
+    check(qsrfhs::mkl_memory::watched_status(call), step);
+  }
   static void check(MKL_LONG status, dfti_step step) {
     if (status != 0) [[unlikely]]
       fail_unless_no_error(status, step);
   }
   static void fail_unless_no_error(MKL_LONG status, dfti_step step);
 
-  std::unique_ptr<DFTI_DESCRIPTOR, release> handle_;
+  owned handle_;
 };
 
 }  // namespace dsp
