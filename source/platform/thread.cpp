@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "platform/thread.hpp"
 
+#include <linux/membarrier.h>
 #include <sys/resource.h>
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -45,6 +46,15 @@ void thread_end::take(void *value) noexcept {
 
 bool thread_end::set(step &next) noexcept {
   return has_key_ && pthread_setspecific(key_, &next) == 0;
+}
+
+bool has_fence_for_all_threads() noexcept {
+  return syscall(SYS_membarrier, MEMBARRIER_CMD_REGISTER_PRIVATE_EXPEDITED, 0, 0) == 0;
+}
+
+void fence_all_threads() noexcept {
+  (void)has_fence_for_all_threads();  // which the process may have lost in a fork
+  (void)syscall(SYS_membarrier, MEMBARRIER_CMD_PRIVATE_EXPEDITED, 0, 0);
 }
 
 void raise_thread_priority() noexcept {

@@ -40,8 +40,8 @@ class thread_end {
   thread_end(const thread_end &) = delete;
   thread_end &operator=(const thread_end &) = delete;
 
-  /// For the calling thread. False without memory; without a key of the system's nothing is ever called.
-  bool ask() noexcept { return set(begin_) || !has_key_; }
+  /// For the calling thread. False where the system keeps no more of such data.
+  [[nodiscard]] bool ask() noexcept { return set(begin_); }
 
  private:
   struct step {
@@ -56,6 +56,12 @@ class thread_end {
   pthread_key_t key_{};
   bool has_key_;
 };
+
+/// True where the system has fence_all_threads().
+bool has_fence_for_all_threads() noexcept;
+
+/// Lets every thread of the process pass a full memory barrier, so that those on a hot path need none of their own.
+void fence_all_threads() noexcept;
 
 /// Gives the calling thread the highest ordinary priority, as far as the process may.
 void raise_thread_priority() noexcept;

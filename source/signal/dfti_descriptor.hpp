@@ -74,6 +74,7 @@ class dfti_descriptor {
 
   template <class Call>
   static void compute(Call call, dfti_step step) {
+    const qsrfhs::mkl_section section;
     check(qsrfhs::mkl_memory::watched_status(call), step);
   }
   static void check(MKL_LONG status, dfti_step step) {

@@ -77,11 +77,13 @@ bool transform::free() noexcept {
 }
 
 void transform::forward(const void *in, void *out) const {
+  const qsrfhs::mkl_section section;
   const auto compute = [&] { return DftiComputeForward(descriptor_, const_cast<void *>(in), out); };
   check(qsrfhs::mkl_memory::watched_status(compute), transform_failed);
 }
 
 void transform::backward(const void *in, void *out) const {
+  const qsrfhs::mkl_section section;
   const auto compute = [&] { return DftiComputeBackward(descriptor_, const_cast<void *>(in), out); };
   check(qsrfhs::mkl_memory::watched_status(compute), transform_failed);
 }

@@ -10,6 +10,7 @@
 #include "c_support/base/session.hpp"
 #include "host/resize_service.hpp"
 #include "platform/process.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
@@ -63,12 +64,15 @@ std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, cons
   const auto *x = reinterpret_cast<const float *>(input.data());
   auto *buffer = reinterpret_cast<float *>(work.data());
 
+  // One for all segments: entering it for each would take as long as the shortest transforms.
+  qsrfhs::mkl_section section;
   if (w)
     kernels.apply_window(x, w, buffer, n);
   else
     kernels.copy(x, buffer, n);
   for (std::uint64_t segment = 1; segment < segments; ++segment) {
     transform.forward(work.data());
+    section.let_forks_pass();
     const float *next = x + 2 * segment * step;
     if (w) {
       // What the segment after this one adds comes into the caches meanwhile.

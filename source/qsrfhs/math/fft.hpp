@@ -28,6 +28,7 @@ class fft_transform {
   explicit fft_transform(const fft_transform &prototype);
   fft_transform &operator=(const fft_transform &) = delete;
 
+  /// Inside of an mkl_section.
   void forward(std::complex<float> *data);
   [[nodiscard]] std::uint64_t length() const noexcept { return length_; }
 

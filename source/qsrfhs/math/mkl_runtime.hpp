@@ -1,18 +1,16 @@
-// MKL's own memory: given back by each thread that used it, and once more when the process ends.
-// SPDX-License-Identifier: MIT
+// MKL's own memory: given back by each thread that used it, and once more when the process ends, unless other threads
+// still compute. SPDX-License-Identifier: MIT
 #pragma once
+
+#include "qsrfhs/math/mkl_section.hpp"
 
 namespace qsrfhs::mkl_runtime {
 
-/// A computation of the calling thread begins or ends. The first one sets the thread up, and arranges for its clean-up.
-void begin_use() noexcept;
-void end_use() noexcept;
-
-/// Held while a thread computes with MKL.
+/// Held while a thread computes with MKL. The first one sets the thread up, and arranges for its clean-up.
 class use {
  public:
-  use() noexcept { begin_use(); }
-  ~use() { end_use(); }
+  use() noexcept { mkl_section::begin_use(); }
+  ~use() { mkl_section::end_use(); }
   use(const use &) = delete;
   use &operator=(const use &) = delete;
 };

@@ -63,6 +63,17 @@ std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool
   return failed(watched.status(DftiCommitDescriptor(made))) ? resampler_commit : resampler_ok;
 }
 
+bool transform_forward(const resampler_descriptor &descriptor, const sample *in, sample *out) noexcept {
+  const mkl_section section;
+  const auto compute = [&] { return DftiComputeForward(transform_of(descriptor), const_cast<sample *>(in), out); };
+  return !failed(mkl_memory::watched_status(compute));
+}
+
+bool transform_backward(const resampler_descriptor &descriptor, sample *data) noexcept {
+  const mkl_section section;
+  return !failed(mkl_memory::watched_status([&] { return DftiComputeBackward(transform_of(descriptor), data); }));
+}
+
 bool make_buffer(resampler_descriptor &descriptor) noexcept {
   constexpr std::uintptr_t page = 4096;
   descriptor.buffer_block = ::operator new (std::size_t{descriptor.length} * sizeof(sample) + 2 * page, std::nothrow);
@@ -245,17 +256,13 @@ void process_block(const resampler_plan &plan, resampler_descriptor &forward, re
                    const sample *input, sample *spectrum, std::uint64_t block, bool first,
                    std::span<resampler_channel> channels) noexcept {
   const mkl_runtime::use in_use;
-  const auto transform_forward = [&] {
-    return DftiComputeForward(transform_of(forward), const_cast<sample *>(input), spectrum);
-  };
-  if (prepare(forward, plan.n, false) != resampler_ok || failed(mkl_memory::watched_status(transform_forward)))
+  if (prepare(forward, plan.n, false) != resampler_ok || !transform_forward(forward, input, spectrum))
     Management::addError(resampler_forward);
   auto *const bins = static_cast<sample *>(inverse.aligned_buffer);
   const auto start = static_cast<double>(block * plan.hop());
   for (resampler_channel &channel : channels) {
     fill_bins(plan, channel, start * channel.phase_step + channel.phase_start, spectrum, bins);
-    const auto transform_backward = [&] { return DftiComputeBackward(transform_of(inverse), bins); };
-    if (prepare(inverse, plan.m, true) != resampler_ok || failed(mkl_memory::watched_status(transform_backward)))
+    if (prepare(inverse, plan.m, true) != resampler_ok || !transform_backward(inverse, bins))
       Management::addError(resampler_backward);
     put_out(plan, channel, bins, first);
   }
