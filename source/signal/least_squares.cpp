@@ -5,7 +5,10 @@
 #include <array>
 #include <cmath>
 #include <limits>
+#include <new>
 
+#include "qsrfhs/math/mkl_memory.hpp"
+#include "qsrfhs/math/mkl_section.hpp"
 #include "signal/lapack.hpp"
 
 namespace dsp {

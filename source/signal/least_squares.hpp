@@ -23,7 +23,7 @@ class least_squares {
   least_squares(MKL_INT rows, MKL_INT columns, MKL_INT right_sides);
 
   /// Matrices row by row, all elements finite. Singular values up to rcond times the largest count as zero. The rank
-  /// found; nothing where the singular values did not converge.
+  /// found; nothing where the singular values did not converge. Throws std::bad_alloc.
   std::optional<MKL_INT> solve(std::span<const T> a, std::span<const T> b, real rcond, std::span<T> x);
 
   [[nodiscard]] MKL_INT rows() const noexcept { return rows_; }
