@@ -13,6 +13,7 @@
 
 #include "platform/fork.hpp"
 #include "platform/thread.hpp"
+#include "qsrfhs/math/mkl_memory.hpp"
 
 namespace qsrfhs {
 
@@ -157,6 +158,7 @@ void set_up(thread_state &self) noexcept {
   self.at = thread_state::stage::known;
   static std::once_flag process_is_set_up;
   const mkl_section section;
+  const mkl_memory::watch not_of_the_caller;  // what is refused here, the computation asks for again
   std::call_once(process_is_set_up, &set_up_process);
   mkl_free(mkl_malloc(1, 64));  // opens the thread's account
 }
