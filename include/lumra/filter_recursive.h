@@ -93,17 +93,17 @@ LUMRA_EXPORT lumra_status lumra_iir_get_method(const lumra_iir *filter, int32_t 
 LUMRA_EXPORT lumra_status lumra_iir_get_state(const lumra_iir *filter, void *state, uint64_t count);
 LUMRA_EXPORT lumra_status lumra_iir_set_state(lumra_iir *filter, const void *state, uint64_t count);
 
-/* The number of values of the state; 0 for null or a freed filter. */
-LUMRA_EXPORT uint64_t lumra_iir_order(const lumra_iir *filter);
+/* The number of values of the state. Codes as lumra_iir_reset, then LUMRA_NULL_ARGUMENT order. */
+LUMRA_EXPORT lumra_status lumra_iir_order(const lumra_iir *filter, uint64_t *order);
 
 /* Saves a filter with its coefficients and all that its stream continues from, and makes one from saved bytes: the same
- * bits follow from both. lumra_iir_state_size is 0 for null or a freed filter.
+ * bits follow from both. lumra_iir_state_size has the codes of lumra_iir_reset, then LUMRA_NULL_ARGUMENT size.
  *
  * bytes  at least lumra_iir_state_size bytes to write, room of them; or size saved bytes
  *
  * Return 0, or in the order of the checks: LUMRA_NULL_ARGUMENT, LUMRA_WRONG_OBJECT filter; LUMRA_TOO_LITTLE_ROOM;
  * LUMRA_NULL_ARGUMENT bytes. For loading: LUMRA_NULL_ARGUMENT out, bytes; LUMRA_BAD_STATE. */
-LUMRA_EXPORT uint64_t lumra_iir_state_size(const lumra_iir *filter);
+LUMRA_EXPORT lumra_status lumra_iir_state_size(const lumra_iir *filter, uint64_t *size);
 LUMRA_EXPORT lumra_status lumra_iir_save(const lumra_iir *filter, void *bytes, uint64_t room);
 LUMRA_EXPORT lumra_status lumra_iir_load(const void *bytes, uint64_t size, lumra_iir **out);
 

@@ -4,6 +4,7 @@
 
 #include <lumra/lumra.h>
 
+#include <lumra/elementwise.hpp>
 #include <lumra/error.hpp>
 #include <lumra/error_vector.hpp>
 #include <lumra/filter.hpp>
@@ -13,5 +14,6 @@
 #include <lumra/services.hpp>
 #include <lumra/session.hpp>
 #include <lumra/toolkit.hpp>
+#include <lumra/transform.hpp>
 #include <lumra/vector_utilities.hpp>
 #include <lumra/window.hpp>

@@ -226,14 +226,20 @@ lumra_status lumra_iir_set_state(lumra_iir *filter, const void *state, uint64_t 
   });
 }
 
-uint64_t lumra_iir_order(const lumra_iir *filter) {
-  const iir *object = iirs::find(filter);
-  return object ? object->filter.state_count() / object->filter.streams() : 0;
+lumra_status lumra_iir_order(const lumra_iir *filter, uint64_t *order) {
+  return enter(__func__, [&] {
+    const dsp::recursive_filter &kept = iirs::get(filter, "filter").filter;
+    require_present(order, "order");
+    *order = kept.state_count() / kept.streams();
+  });
 }
 
-uint64_t lumra_iir_state_size(const lumra_iir *filter) {
-  const iir *object = iirs::find(filter);
-  return object ? state_size([object](state_writer &to) { write(to, *object); }) : 0;
+lumra_status lumra_iir_state_size(const lumra_iir *filter, uint64_t *size) {
+  return enter(__func__, [&] {
+    const iir &object = iirs::get(filter, "filter");
+    require_present(size, "size");
+    *size = state_size([&object](state_writer &to) { write(to, object); });
+  });
 }
 
 lumra_status lumra_iir_save(const lumra_iir *filter, void *bytes, uint64_t room) {

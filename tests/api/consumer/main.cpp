@@ -3,12 +3,51 @@
 
 #include <complex>
 #include <iostream>
+#include <span>
+#include <vector>
+
+namespace {
+
+/// The open interface over vectors, with results that are known.
+bool open_interface_is_right() {
+  using cf32 = std::complex<float>;
+  const std::vector<float> ramp{1, 2, 3, 4}, two{1, 1};
+  lumra::fourier_transform<float> transform(4);
+  const auto bins = transform.forward(ramp);
+  const bool transforms = bins.size() == 3 && bins[0] == cf32(10) && transform.backward(bins) == ramp;
+  lumra::fir_filter<cf32> fir(two);
+  const std::vector<cf32> ones(4, 1.0F);
+  const auto first = fir(ones);
+  const auto saved = fir.save();
+  const auto second = fir(ones);
+  fir.load(saved);
+  const bool streams = first[0] == cf32(1) && first[3] == cf32(2) && second[0] == cf32(2) && fir(ones) == second;
+  const std::vector<double> b{1}, a{1, -0.5}, step(3, 1.0);
+  lumra::recursive_filter<double> iir(b, a);
+  const bool recurs = iir(step) == std::vector<double>{1, 1.5, 1.75} && iir.state() == std::vector<double>{0.875};
+  std::vector<float> levels(4);
+  lumra::decibels<cf32>(first, levels);
+  const bool levelled = levels[0] == 0 && lumra::convolve<float>(ramp, two, lumra::mode::valid)[2] == 7;
+  lumra::least_squares_solver<double> solver(3, 2);
+  const std::vector<double> matrix{1, 0, 0, 1, 0, 0};
+  const auto solution = solver(matrix, step);
+  const bool figures = lumra::make_window("hann", 4)[2] == 1 && lumra::window_figures("hann", 64).coherent_gain == 0.5;
+  try {
+    fir(ones, std::span<cf32>());
+    return false;
+  } catch (const lumra::error &e) {
+    return transforms && streams && recurs && levelled && figures && solution.rank == 2 &&
+           e.status().code() == LUMRA_TOO_LITTLE_ROOM;
+  }
+}
+
+}  // namespace
 
 int main() {
+  if (!open_interface_is_right()) return 1;
   lumra::session session;
   lumra::host_array<std::complex<float>> samples(256);
   for (auto &s : samples.elements()) s = 1.0F;
-  session.initialize_window(lumra::window::none, 256);
   lumra::spectrum spectrum;
   session.power_spectrum(lumra::window::none, 256, 50, samples, 1e-6, spectrum);
   samples.resize(300);
