@@ -5,6 +5,8 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
+#include <cstdio>
 #include <filesystem>
 #include <thread>
 #include <vector>
@@ -20,6 +22,7 @@ using lifetime::shared_objects;
 /// once: exit() would have it destroy what threads of the parent use.
 template <class Work>
 int in_child(Work &&work) {
+  std::fflush(nullptr);
   const pid_t child = fork();
   if (child == 0) {
     alarm(10);
@@ -49,9 +52,16 @@ class busy_threads {
   std::vector<std::jthread> threads_;
 };
 
-class InsideFamily : public testing::TestWithParam<int> {};
+/// The sanitizers' own allocator has locks that no handler of a fork frees: children hang in it where threads of the
+/// parent allocate.
+class Fork : public testing::TestWithParam<int> {
+ protected:
+  void SetUp() override {
+    if (*LUMRA_SANITIZE) GTEST_SKIP() << "sanitizers do not survive forks beside threads that allocate";
+  }
+};
 
-TEST_P(InsideFamily, ChildUsesAllFamilies) {
+TEST_P(Fork, InsideAFamily) {
   shared_objects shared;
   caller first(shared, 1), second(shared, 2), forking(shared, 3);
   const busy_threads busy(2, [&](int i) { (i == 0 ? first : second).call(GetParam()); });
@@ -67,9 +77,9 @@ TEST_P(InsideFamily, ChildUsesAllFamilies) {
   EXPECT_TRUE(forking.call_all());
 }
 
-INSTANTIATE_TEST_SUITE_P(Fork, InsideFamily, testing::Range(0, lifetime::family_count));
+INSTANTIATE_TEST_SUITE_P(Families, Fork, testing::Range(0, lifetime::family_count));
 
-TEST(Fork, BesideThreadsThatComeAndGo) {
+TEST_F(Fork, BesideThreadsThatComeAndGo) {
   shared_objects shared;
   caller forking(shared, 3);
   // A thread's first and last calls are where MKL opens and closes what it keeps for the thread.
@@ -77,7 +87,7 @@ TEST(Fork, BesideThreadsThatComeAndGo) {
   for (int i = 0; i < 30; ++i) ASSERT_EQ(0, in_child([&] { return forking.call_all(); })) << "fork " << i;
 }
 
-TEST(Fork, ByTwoThreadsAtOnceAndInChildren) {
+TEST_F(Fork, ByTwoThreadsAtOnceAndInChildren) {
   shared_objects shared;
   const auto fork_often = [&](int number) {
     for (int i = 0; i < 20; ++i)
@@ -90,7 +100,7 @@ TEST(Fork, ByTwoThreadsAtOnceAndInChildren) {
   fork_often(6);
 }
 
-TEST(Fork, WaitersStayInTheParent) {
+TEST(QuietFork, WaitersStayInTheParent) {
   shared_objects shared;
   std::jthread reader([&] {
     char text[100];
@@ -127,7 +137,7 @@ std::int32_t fork_and_resize(std::int32_t type, std::int32_t dimensions, void *h
   return qsHost_ArrayResize(type, dimensions, handle, size);
 }
 
-TEST(Fork, InsideAHostsResizeService) {
+TEST(QuietFork, InsideAHostsResizeService) {
   shared_objects shared;
   seen_by_host = &shared;
   caller calling(shared, 1);
