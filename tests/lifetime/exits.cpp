@@ -24,11 +24,10 @@ int main(int argc, char **argv) {
   alarm(60);
   if (!std::freopen("/dev/null", "w", stdout)) return EXIT_FAILURE;  // codes that are recorded are also written there
   (void)std::atexit(&call_at_exit);
-  shared = new lifetime::shared_objects;
-  static lifetime::shared_objects *const kept = shared;  // threads use it to the end
+  shared = new lifetime::shared_objects;  // used to the end
   for (int i = 0; i < 3; ++i)
     std::thread([i] {
-      auto *const own = new lifetime::caller(*kept, i);
+      auto *const own = new lifetime::caller(*shared, i);
       for (;;) (void)own->call_all();
     }).detach();
   std::this_thread::sleep_for(std::chrono::milliseconds(200));
