@@ -45,12 +45,13 @@ constexpr std::string_view no_memory = no_memory_line.substr(7, no_memory_line.s
 std::string library_reason(const lumra::error &error) {
   const std::int32_t code = error.status().code();
   switch (code) {
-    case -20001:   // arrays, toolkit
-    case -312498:  // error vectors
+    case LUMRA_TOOLKIT_NO_MEMORY:
+    case LUMRA_ALLOCATION_FAILED:
+    case LUMRA_NO_MEMORY:
       return std::string(no_memory);
     case LUMRA_INTERNAL_ERROR:
-    case -359501:  // transforms
-    case -359502:
+    case LUMRA_TOOLKIT_TRANSFORM_FAILED:
+    case LUMRA_TOOLKIT_NO_TRANSFORM:
       return fmt::format("{}, as far as status {} of the library tells", no_memory, code);
     default:
       return fmt::format("the library refuses the work: {} (status {}); please report it with the command line",
