@@ -179,7 +179,7 @@ bool call::check(std::int32_t code, std::initializer_list<std::int32_t> codes, i
   check_code(code, codes, line);
   for (const auto &a : arrays_) {
     if (!a->handle || !*a->handle) continue;
-    hold(code != 0 || !a->shared_work, "workspace that is another array, too", line);
+    hold(code != 0 || !a->shared_work || idle_, "workspace that is another array, too", line);
     const bool empties = (a->roles & works) || (code != 0 && (a->roles & writes));
     hold(!empties || (a->size(0) == 0 && (a->dimensions == 1 || a->size(1) == 0)), "an array is not empty", line);
   }

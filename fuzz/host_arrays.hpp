@@ -80,6 +80,8 @@ class call {
   /// No array is there twice or without a handle, and the host has done what it was asked for.
   [[nodiscard]] bool plain() const noexcept { return plain_ && !host_.failed(); }
   [[nodiscard]] bool host_threw() const noexcept { return host_.threw(); }
+  /// Whether the call has anything to do: one without does not look whether arrays are shared.
+  void set_idle(bool idle) noexcept { idle_ = idle; }
   /// Workspace is empty and what is only read unchanged; the code is a listed one; failures leave empty outputs.
   bool check(std::int32_t code, std::initializer_list<std::int32_t> codes, int line = __builtin_LINE()) const;
   /// What is only read is unchanged.
@@ -88,7 +90,7 @@ class call {
  private:
   input &in_;
   hosting &host_;
-  bool plain_ = true;
+  bool plain_ = true, idle_ = false;
   std::vector<std::unique_ptr<array>> arrays_;
 };
 

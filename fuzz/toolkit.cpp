@@ -386,6 +386,7 @@ void iir(bench &b) {
     else
       code = partial_family<E>::filter(vec<E>(data), vec<F>(reverse), vec<F>(forward_part), vec<E>(inputs),
                                        vec<E>(outputs), reset, vec<F>(room), vec<F>(more), vec<E>(saved));
+    on.set_idle(data.values.empty() || (f.empty() && a.empty()));
     if (!on.check(code, {-20008, -20061, -20001, -20999}))
       return hold(!on.plain() || (f.empty() && !a.empty()), "valid arguments");
     hold(data.count() == data.values.size(), "number of samples");
