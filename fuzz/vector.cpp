@@ -176,7 +176,8 @@ void level(input &in, call &on) {
 void lookup(input &in, call &on) {
   auto &keys = real_array(on, reads), &x = complex_array(on, reads), &table = complex_array(on, reads);
   auto &out = complex_array(on, writes);
-  if (&out == &table || (x.values.size() < keys.values.size() && x.handle && *x.handle)) return;
+  const bool has_samples = x.handle && *x.handle;  // the call may make a block for an output that is x, too
+  if (&out == &table || (x.values.size() < keys.values.size() && has_samples)) return;
   auto *const to = address<lumra_cf32_block>(in, out);
   const auto start = static_cast<float>(in.real()), step = static_cast<float>(in.real());
   const auto code = qsUtilHS_LookupTable(fvec(keys), cvec(x), to, cvec(table), start, step);
@@ -186,7 +187,7 @@ void lookup(input &in, call &on) {
   const samples t = narrow(table.values), from = narrow(x.values);
   const std::size_t entries = t.size() / 2;
   samples want;
-  for (std::size_t i = 0; i < keys.values.size() && x.handle && *x.handle; ++i) {
+  for (std::size_t i = 0; i < keys.values.size() && has_samples; ++i) {
     const float place = (narrow(keys.values[i]).re - start) * (1 / step);
     sample g{0, 0};
     if (entries != 0 && !(place >= -2147483648.F && place < 2147483648.F)) {

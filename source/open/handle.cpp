@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <functional>
 #include <mutex>
+#include <utility>
 
 #include "platform/fork.hpp"
 
@@ -53,10 +54,7 @@ class cell_table {
   void add_slab() {
     auto *const added = new slab;
     added->older = newest_.load(std::memory_order_relaxed);
-    for (auto c = added->cells.rbegin(); c != added->cells.rend(); ++c) {
-      c->object = free_;
-      free_ = &*c;
-    }
+    for (cell &c : added->cells) c.object = std::exchange(free_, &c);
     newest_.store(added, std::memory_order_release);
   }
 

@@ -101,12 +101,11 @@ descriptor_watch::descriptor_watch() noexcept {
 descriptor_watch::~descriptor_watch() {
   making = nullptr;
   if (refused()) mkl_thread_free_buffers();  // the thread's, not lost
-  while (made_.next != &made_) {
-    block *const made = made_.next;
-    if (refused())
-      hooks::free(made + 1);
-    else
-      unlink(*made);
+  for (block *made = made_.next; made != &made_;) {
+    block &each = *made;
+    made = each.next;
+    each.next = each.previous = nullptr;
+    if (refused()) hooks::free(&each + 1);
   }
 }
 
