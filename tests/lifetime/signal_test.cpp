@@ -20,10 +20,13 @@ TEST(SignalsConcurrency, DisturbNoCallAndNoWait) {
   ASSERT_EQ(0, setitimer(ITIMER_REAL, &every_millisecond, nullptr));
   lifetime::shared_objects shared;
   lifetime::caller calling(shared, 1);
-  const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(500);
-  while (std::chrono::steady_clock::now() < end) ASSERT_TRUE(calling.call_all());
+  // A busy machine takes longer to deliver that many.
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+  while (signals < 300 && std::chrono::steady_clock::now() < end) ASSERT_TRUE(calling.call_all());
+  ASSERT_GE(signals, 300);
 
   // A wait for bytes takes its tenth of a second, one for an entry of the log ends with the session.
+  const std::sig_atomic_t before_waits = signals;
   char data[8];
   const auto wait_begin = std::chrono::steady_clock::now();
   EXPECT_EQ(-1, qsLTEHS_DataFIFO(shared.fifo, LUMRA_FIFO_WRITE, data, nullptr, 0, 2000));
@@ -35,7 +38,7 @@ TEST(SignalsConcurrency, DisturbNoCallAndNoWait) {
   EXPECT_EQ(LUMRA_INTERNAL_ERROR, qsLumraAlgo_ReadLog(shared.session, 0, data, sizeof data));
   (void)setitimer(ITIMER_REAL, &never, nullptr);
   (void)sigaction(SIGALRM, &before, nullptr);
-  EXPECT_GT(signals, 300);
+  EXPECT_GT(signals, before_waits);
 }
 
 }  // namespace
