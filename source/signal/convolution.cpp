@@ -101,7 +101,8 @@ void convolve(std::span<const Sample> x, std::span<const Sample> y, const convol
   if (method == convolution_method::direct || y.size() > longest_in_blocks) return convolve_directly(x, y, part, out);
   const std::size_t block = best_block<Sample>(y.size()), step = block - y.size() + 1;
   // Beside the blocks there are the taps to transform; in one piece, three transforms instead of a block's two.
-  const double blocks = block_cost<Sample>(block) * static_cast<double>(1 + (part.count + step - 1) / step);
+  const std::size_t transforms = 1 + (part.count + step - 1) / step;
+  const double blocks = block_cost<Sample>(block) * static_cast<double>(transforms);
   const std::size_t whole = x.size() <= most_fft_points / 4 ? whole_length(x.size(), y.size(), part) : 0;
   const double one = whole == 0 ? blocks : 1.5 * block_cost<Sample>(whole);
   if (method == convolution_method::automatic && direct <= std::min(blocks, one))

@@ -30,7 +30,7 @@ void apply_taps(const Sample *x, const Tap *taps, std::size_t count, Sample *out
   const auto *samples = reinterpret_cast<const real *>(x);
   const auto *values = reinterpret_cast<const real *>(taps);
   auto *sums = reinterpret_cast<real *>(out);
-  constexpr std::size_t width = sizeof(Sample) / sizeof(real);
+  constexpr std::size_t width = is_complex<Sample> ? 2 : 1;
   constexpr bool is_single = sizeof(real) == sizeof(float);
   if constexpr (is_complex<Tap> && is_single)
     kernels.complex_fir(samples, values, count, sums, n);
