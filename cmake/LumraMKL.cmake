@@ -45,11 +45,13 @@ else()
   endif()
 endif()
 target_link_libraries(lumra_mkl INTERFACE Threads::Threads ${CMAKE_DL_LIBS} m)
-# libmkl_rt chooses its layers while the process runs.
+# libmkl_rt chooses its layers while the process runs. Only the sources that set MKL up are told, so that another choice
+# compiles those alone anew.
+set(LUMRA_MKL_DEFINITIONS "")
 if(LUMRA_MKL_LINK STREQUAL "rt")
   string(TOUPPER "${MKL_THREADING}" layer)
   string(REGEX REPLACE "_THREAD$" "" layer "MKL_THREADING_${layer}")
-  target_compile_definitions(lumra_mkl INTERFACE LUMRA_MKL_RT LUMRA_MKL_RT_LAYER=${layer})
+  set(LUMRA_MKL_DEFINITIONS LUMRA_MKL_RT LUMRA_MKL_RT_LAYER=${layer})
 endif()
 
 # The version that lumra/version.h names.
