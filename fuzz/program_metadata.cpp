@@ -5,30 +5,32 @@
 #include <nlohmann/json.hpp>
 #include <vector>
 
-#include "failure.hpp"
-#include "metadata_file.hpp"
 #include "program_scratch.hpp"
-#include "recording.hpp"
-#include "resampled_metadata.hpp"
-#include "sample_reader.hpp"
-#include "sigmf_writer.hpp"
+#include "recording/failure.hpp"
+#include "recording/metadata_file.hpp"
+#include "recording/open.hpp"
+#include "recording/resampled_metadata.hpp"
+#include "recording/sample_reader.hpp"
+#include "recording/sigmf_writer.hpp"
+#include "terminal/printable.hpp"
+#include "terminal/results.hpp"
 
 namespace {
 
 constexpr std::size_t data_bytes = 3000;
 constexpr double ratio = 2.5;
 
-void require_in_file(const tool::recording &source, std::uint64_t size) {
+void require_in_file(const recording::source &source, std::uint64_t size) {
   std::uint64_t end = 0;
-  for (const tool::extent &e : source.extents) {
+  for (const recording::extent &e : source.extents) {
     fuzz::require(e.offset >= end && e.offset <= size, "extents follow each other");
     fuzz::require(e.samples <= (size - e.offset) / source.format.bytes(), "extents end in the file");
     end = e.offset + e.samples * source.format.bytes();
   }
 }
 
-void read_all(const tool::recording &source) {
-  tool::sample_reader reader(source);
+void read_all(const recording::source &source) {
+  recording::sample_reader reader(source);
   std::vector<std::complex<float>> piece(97);
   for (std::uint64_t left = source.samples(); left > 0; left -= piece.size()) {
     piece.resize(std::min<std::uint64_t>(piece.size(), left));
@@ -44,21 +46,22 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t *data, std::size_t size
   fuzz::require(prepared, "a data file");
   folder.write("x.sigmf-meta", {reinterpret_cast<const char *>(data), size});
   try {
-    const tool::recording source = tool::open_recording(folder.path() / "x", {});
+    const recording::source source = recording::open(folder.path() / "x", {});
     require_in_file(source, std::filesystem::file_size(source.data));
     if (source.samples() == 0) return 0;
     // Zeros are samples of every type; the metadata may name themselves as data.
     if (source.data.filename() == "x.sigmf-data") read_all(source);
     const auto samples = static_cast<std::uint64_t>(static_cast<double>(source.samples()) / ratio) + 1;
     tool::results given(source.files);
-    tool::sigmf_writer writer(given, folder.path() / "y");
-    writer.write(tool::resampled_metadata(source, ratio, source.rate / ratio, samples, "resampled"));
+    const recording::sigmf_files files = recording::sigmf_files_of(folder.path() / "y");
+    recording::sigmf_writer writer(given.add_file(files.data), given.add_file(files.metadata));
+    writer.write(recording::resampled_metadata(source, ratio, source.rate / ratio, samples, "resampled"));
     given.deliver();
-  } catch (const tool::failure &failure) {
+  } catch (const recording::failure &failure) {
     fuzz::require_one_line(tool::printable(failure.what()));
     return 0;
   }
-  const auto written = tool::read_metadata(folder.path() / "y.sigmf-meta");
+  const auto written = recording::read_metadata(folder.path() / "y.sigmf-meta");
   fuzz::require(written.at("global").is_object(), "what is written is metadata");
   fuzz::require(std::filesystem::file_size(folder.path() / "y.sigmf-meta") <= 16 * size + 4096,
                 "the size is in proportion");

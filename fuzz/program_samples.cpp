@@ -5,10 +5,10 @@
 #include <cstdint>
 #include <vector>
 
-#include "failure.hpp"
 #include "program_scratch.hpp"
-#include "recording.hpp"
-#include "sample_reader.hpp"
+#include "recording/failure.hpp"
+#include "recording/open.hpp"
+#include "recording/sample_reader.hpp"
 
 namespace {
 
@@ -53,12 +53,12 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t *data, std::size_t size
 
   std::uint64_t read = 0;
   try {
-    tool::recording_options options;
+    recording::options options;
     options.rate = 1;
     options.format = std::string(type.name) + (big_endian ? "_be" : "_le");
-    const tool::recording source = tool::open_recording(folder.path() / "x.bin", options);
+    const recording::source source = recording::open(folder.path() / "x.bin", options);
     fuzz::require(2 * source.samples() == expected.size() && size % (2 * type.bytes) == 0, "all samples are there");
-    tool::sample_reader reader(source);
+    recording::sample_reader reader(source);
     std::vector<std::complex<float>> piece;
     while (read < source.samples()) {
       pieces = 1664525 * pieces + 1013904223;
@@ -73,7 +73,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t *data, std::size_t size
       read += piece.size();
     }
     fuzz::require(bad == expected.end(), "what is not finite is refused");
-  } catch (const tool::failure &failure) {
+  } catch (const recording::failure &failure) {
     const std::string text = failure.what();
     fuzz::require_one_line(text);
     const std::string reason = size % (2 * type.bytes) != 0 ? std::string("no whole number")

@@ -128,6 +128,8 @@ TEST_F(Program, RefusesBadInputInOneLine) {
       {1, "sampled at 1 kHz, rate2000.sigmf-data at 2 kHz", "evm rate1000 rate2000"},
       {1, "no capture 3", "evm rate1000 rate1000 --capture 3"},
       {1, "no capture 3", "evm rate1000 rate1000 --reference-capture 3"},
+      {1, "choose one with --reference-capture", "evm retuned rate1000"},
+      {1, "choose one with --capture", "evm rate1000 retuned"},
       {1, "all samples are zero", "evm zero.cf32 x.cf32 --rate 1 --plot x.png --csv x.csv"},
       {1, "leave out --align", "evm x.cf32 zero.cf32 --rate 1 --align"},
       {1, "too large", "evm x.cf32 large.cf32 --rate 1"},

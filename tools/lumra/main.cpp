@@ -2,9 +2,9 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include "failure_report.hpp"
-#include "interruption.hpp"
 #include "program.hpp"
+#include "terminal/failure_report.hpp"
+#include "terminal/interruption.hpp"
 
 namespace {
 

@@ -4,8 +4,8 @@
 #include <lumra/lumra.hpp>
 #include <sstream>
 
-#include "commands.hpp"
-#include "failure_report.hpp"
+#include "commands/commands.hpp"
+#include "terminal/failure_report.hpp"
 
 namespace tool {
 namespace {

@@ -1,0 +1,51 @@
+// How a measured recording differs from a reference, for recordings of any length in constant memory.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <complex>
+#include <cstdint>
+#include <functional>
+#include <span>
+
+#include "recording/source.hpp"
+
+namespace tool {
+
+struct evm_settings {
+  bool align = false;
+  std::uint64_t samples = 0;                     // from the start, not more than either recording has
+  std::uint64_t block = std::uint64_t{1} << 16;  // samples to read at a time; the result does not depend on it
+};
+
+/// Statistics of one kind of error.
+struct deviation {
+  double rms = 0, mean = 0;
+  double peak = 0;            // the largest in magnitude, with its sign
+  std::uint64_t peak_at = 0;  // index of its sample
+};
+
+/// Error and magnitude error are relative to the RMS of the reference, the phase error is in radians.
+struct evm_result {
+  double reference_rms = 0;
+  std::complex<double> gain{1, 0};  // by which the measured samples were divided
+  deviation error, magnitude, phase;
+  std::uint64_t without_phase = 0;  // samples that are zero in one of the recordings: no part of the phase error
+};
+
+/// A block of samples after the alignment, and its errors.
+struct evm_block {
+  std::uint64_t first;  // index of the first sample
+  double unit;          // RMS of the reference in which samples, errors and magnitude errors are to be expressed
+  std::span<const std::complex<float>> reference, measured;
+  std::span<const float> error, magnitude, phase;
+};
+
+/// A sample that is zero has no phase.
+[[nodiscard]] bool has_phase(std::complex<float> reference, std::complex<float> measured) noexcept;
+
+/// Reads the recordings twice: for the level of the reference, and the gain where that is asked for; then for the
+/// errors, which `see` is shown block by block. Throws failure, or lumra::error when the library refuses.
+evm_result measure_evm(const recording::source &reference, const recording::source &measured,
+                       const evm_settings &settings, const std::function<void(const evm_block &)> &see);
+
+}  // namespace tool

@@ -1,0 +1,20 @@
+// The subcommands: each adds itself with its options to the command line, and sets the work when it was called.
+// SPDX-License-Identifier: MIT
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <functional>
+
+#include "terminal/results.hpp"
+
+namespace tool {
+
+/// Its results are delivered when all else is released, so that nothing can fail behind that.
+using work_to_do = std::function<results()>;
+
+void add_evm(CLI::App &program, work_to_do &work);
+void add_info(CLI::App &program, work_to_do &work);
+void add_resample(CLI::App &program, work_to_do &work);
+void add_spectrum(CLI::App &program, work_to_do &work);
+
+}  // namespace tool

@@ -1,0 +1,112 @@
+// lumra resample: a recording at a new rate, as SigMF. SPDX-License-Identifier: MIT
+#include <fmt/format.h>
+
+#include <cmath>
+#include <lumra/lumra.hpp>
+#include <memory>
+#include <nlohmann/json.hpp>
+
+#include "analysis/resampling.hpp"
+#include "commands/arguments.hpp"
+#include "commands/commands.hpp"
+#include "recording/open.hpp"
+#include "recording/resampled_metadata.hpp"
+#include "recording/sigmf_writer.hpp"
+#include "terminal/failure.hpp"
+#include "terminal/results.hpp"
+#include "terminal/units.hpp"
+
+namespace tool {
+namespace {
+
+namespace fs = std::filesystem;
+
+struct resample_command {
+  std::string path, output;
+  recording::options options;
+  double rate = 0;
+  std::uint64_t block = std::uint64_t{1} << 16;
+};
+
+/// The common name of the files to write.
+fs::path output_base(const resample_command &command, const recording::source &source) {
+  fs::path base = command.output;
+  if (base.empty())
+    return source.files.front().parent_path() /
+           fmt::format("{}-{:.12g}Hz", source.files.front().stem().string(), command.rate);
+  if (base.extension() == ".sigmf-data" || base.extension() == ".sigmf-meta") base.replace_extension();
+  if (!base.has_filename()) throw failure("{}: is a folder; give the result a name in it", base.string());
+  return base;
+}
+
+std::string length_text(std::uint64_t samples, double rate) {
+  return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, short_text(rate));
+}
+
+void summarise(results &shown, const resample_command &command, const recording::source &source, const resampling &work,
+               const recording::sigmf_files &files) {
+  const resampling_filter &filter = work.filter();
+  const double lower = std::min(source.rate, work.rate());
+  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  shown.add_line("Input samples", length_text(source.samples(), source.rate));
+  shown.add_line("Output samples", length_text(work.samples(), work.rate()));
+  shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
+  shown.add_line("Ratio", fmt::format("{:.17g} input samples per output sample", work.ratio()));
+  if (work.rate() != command.rate)
+    shown.add_line("Note", fmt::format("the ratio is rounded to single precision: the new rate, as in the metadata, is "
+                                       "{:.17g} Hz ({:+.2g} ppm)",
+                                       work.rate(), 1e6 * (work.rate() / command.rate - 1)));
+  shown.add_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
+                                          filter.coefficients.size(), filter.phases));
+  shown.add_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
+                                          short_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
+  shown.add_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
+                                          short_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
+  shown.add_line("Data", files.data.string());
+  shown.add_line("Metadata", files.metadata.string());
+}
+
+results run(const resample_command &command) {
+  const recording::source source = recording::open(command.path, command.options);
+  if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
+  const resampling work(source, command.rate);
+  const recording::sigmf_files files = recording::sigmf_files_of(output_base(command, source));
+  results given(source.files);
+  output_file &data = given.add_file(files.data);
+  recording::sigmf_writer output(data, given.add_file(files.metadata));
+  const nlohmann::json metadata =
+      recording::resampled_metadata(source, work.ratio(), work.rate(), work.samples(),
+                                    fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate),
+                                                short_text(work.rate()), lumra::library().version_text));
+  work.run(command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
+  output.write(metadata);
+  summarise(given, command, source, work, files);
+  return given;
+}
+
+}  // namespace
+
+void add_resample(CLI::App &program, work_to_do &work) {
+  auto command = std::make_shared<resample_command>();
+  CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
+  app->footer(
+      "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass\n"
+      "band is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower\n"
+      "rate is rejected. Samples are written as cf32_le. Metadata are carried over where they are still true.");
+  app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
+      ->required();
+  app->add_option("--rate", command->rate, "The new sample rate")
+      ->option_text("HZ")
+      ->required()
+      ->check(positive_number());
+  command->options.names.rate = "--input-rate";
+  add_recording_options(*app, command->options);
+  app->add_option("--output", command->output,
+                  "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
+      ->option_text("BASE");
+  // For tests: how much is read at a time must not change the result.
+  app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
+  app->callback([command, &work] { work = [command] { return run(*command); }; });
+}
+
+}  // namespace tool

@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: MIT
+#include "terminal/results.hpp"
+
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <iterator>
+
+#include "terminal/failure.hpp"
+#include "terminal/interruption.hpp"
+#include "terminal/printable.hpp"
+
+namespace tool {
+
+void print(std::string_view text) {
+  if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() || std::fflush(stdout) != 0)
+    throw failure("cannot write to the standard output: {}", system_reason(errno));
+}
+
+results::results(std::vector<std::filesystem::path> inputs) : inputs_(std::move(inputs)) {}
+
+output_file &results::add_file(const std::filesystem::path &target) {
+  return *files_.emplace_back(std::make_unique<output_file>(target, inputs_));
+}
+
+void results::add_line(const char *label, std::string_view text) {
+  const bool styled = ::isatty(STDOUT_FILENO) == 1;
+  fmt::format_to(std::back_inserter(summary_), "{}{:<22}{}{}\n", styled ? "\033[1m" : "", label,
+                 styled ? "\033[0m" : "", printable(text));
+}
+
+void results::deliver() {
+  for (const auto &file : files_) file->finish();
+  print(summary_);
+  const output_file *refused = nullptr;
+  int code = 0;
+  {
+    const held_signals until_all_are_there;
+    for (const auto &file : files_) {
+      code = file->appear(files_.size() > 1);
+      if (code == 0) continue;
+      refused = file.get();
+      for (const auto &other : files_) other->disappear();
+      break;
+    }
+    if (!refused)
+      for (const auto &file : files_) file->stay();
+  }
+  if (refused) refused->fail(code);
+}
+
+}  // namespace tool
