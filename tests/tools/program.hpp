@@ -1,7 +1,6 @@
 // Runs the program lumra in a folder of its own, as a user would. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <spawn.h>
 #include <sys/wait.h>
@@ -15,7 +14,6 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <numbers>
 #include <random>
 #include <sstream>
@@ -55,29 +53,30 @@ inline std::string metadata(const std::string &global = "", const std::string &c
          captures + R"(], "annotations": [)" + annotations + "]}";
 }
 
+/// All numbers in a text, whatever stands between them.
+inline std::vector<double> numbers_in(const std::string &text) {
+  std::vector<double> found;
+  for (const char *at = text.c_str(); *at;) {
+    char *end = nullptr;
+    const double value = std::strtod(at, &end);
+    if (end != at) found.push_back(value);
+    at = end == at ? at + 1 : end;
+  }
+  return found;
+}
+
 struct outcome {
   int exit_code = -1;  // -1: ended by a signal
   int signal = 0;
   std::string out, err;
-};
 
-/// The numbers behind a label of the summary.
-inline std::vector<double> numbers(const outcome &result, const std::string &label) {
-  std::vector<double> found;
-  std::istringstream lines(result.out);
-  for (std::string line; std::getline(lines, line);)
-    if (line.starts_with(label))
-      for (const char *at = line.c_str() + label.size(); *at;) {
-        char *end = nullptr;
-        const double value = std::strtod(at, &end);
-        if (end != at) found.push_back(value);
-        at = end == at ? at + 1 : end;
-      }
-  return found;
-}
-
-struct csv_row {
-  double frequency, level;
+  /// The numbers behind a label of the summary.
+  [[nodiscard]] std::vector<double> numbers(const std::string &label) const {
+    std::istringstream lines(out);
+    for (std::string line; std::getline(lines, line);)
+      if (line.starts_with(label)) return numbers_in(line.substr(label.size()));
+    return {};
+  }
 };
 
 class ProgramTest : public testing::Test {
@@ -89,50 +88,30 @@ class ProgramTest : public testing::Test {
   }
   void TearDown() override { std::filesystem::remove_all(folder_); }
 
-  /// Starts the program; paths are relative to the folder. More may be put in front of the environment.
-  [[nodiscard]] pid_t start(const std::vector<std::string> &arguments, std::vector<std::string> settings = {}) const {
-    std::vector<std::string> all{LUMRA_PROGRAM};
-    all.insert(all.end(), arguments.begin(), arguments.end());
-    std::vector<char *> argv;
-    argv.reserve(all.size() + 1);
-    for (std::string &argument : all) argv.push_back(argument.data());
-    argv.push_back(nullptr);
-    std::vector<char *> environment;
-    for (std::string &setting : settings) environment.push_back(setting.data());
-    for (char **inherited = environ; *inherited; ++inherited) environment.push_back(*inherited);
-    environment.push_back(nullptr);
-    const std::string out = logs_ + "out", err = logs_ + "err";
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_addchdir_np(&actions, folder_.c_str());
-    posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-    posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+  /// Starts the program in the folder. The shell reads the line, and what stands in front of the program: settings, and
+  /// "exec" at the end.
+  [[nodiscard]] pid_t start(const std::string &line, const std::string &front = "exec") const {
+    std::string command = "cd " + folder_.string() + "; " + front + " " + LUMRA_PROGRAM + " >.out 2>.err " + line;
+    std::string shell = "/bin/sh", option = "-c";
+    char *arguments[] = {shell.data(), option.data(), command.data(), nullptr};
     pid_t child = -1;
-    EXPECT_EQ(0, ::posix_spawn(&child, LUMRA_PROGRAM, &actions, nullptr, argv.data(), environment.data()));
-    posix_spawn_file_actions_destroy(&actions);
+    EXPECT_EQ(0, ::posix_spawn(&child, shell.c_str(), nullptr, nullptr, arguments, environ));
     return child;
   }
 
   [[nodiscard]] outcome finish(pid_t child) const {
     int status = 0;
     EXPECT_EQ(child, ::waitpid(child, &status, 0));
-    outcome result;
+    outcome result{-1, 0, read(".out"), read(".err")};
     if (WIFEXITED(status)) result.exit_code = WEXITSTATUS(status);
     if (WIFSIGNALED(status)) result.signal = WTERMSIG(status);
-    result.out = read(logs_ + "out");
-    result.err = read(logs_ + "err");
-    (void)std::filesystem::remove(folder_ / (logs_ + "out"));
-    (void)std::filesystem::remove(folder_ / (logs_ + "err"));
+    for (const char *name : {".out", ".err"}) std::filesystem::remove(folder_ / name);
     return result;
   }
 
-  static std::vector<std::string> words(const std::string &line) {
-    std::istringstream text(line);
-    return {std::istream_iterator<std::string>(text), {}};
+  [[nodiscard]] outcome run(const std::string &line, const std::string &front = "exec") const {
+    return finish(start(line, front));
   }
-
-  /// The arguments, separated by blanks.
-  [[nodiscard]] outcome run(const std::string &line) const { return finish(start(words(line))); }
 
   /// The same; must succeed.
   outcome succeed(const std::string &line) const {
@@ -142,9 +121,22 @@ class ProgramTest : public testing::Test {
     return result;
   }
 
+  /// Must fail in one line that says this, and change nothing in the folder.
+  void refuse(int code, const std::string &says, const std::string &line, const std::string &front = "exec") const {
+    const auto before = files();
+    const outcome result = run(line, front);
+    SCOPED_TRACE(front + " " + line + ": " + result.err);
+    EXPECT_EQ(code, result.exit_code);
+    EXPECT_NE(std::string::npos, result.err.find(says)) << says;
+    EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n'));
+    EXPECT_TRUE(result.err.starts_with("lumra: ") && result.err.ends_with('\n'));
+    EXPECT_EQ("", result.out);
+    EXPECT_EQ(before, files());
+  }
+
   /// Starts the program and waits until so many of its outputs are begun.
   [[nodiscard]] pid_t start_outputs(const std::string &line, std::ptrdiff_t outputs) const {
-    const pid_t child = start(words(line));
+    const pid_t child = start(line);
     const auto begun = [&] {
       const auto names = files();
       return std::count_if(names.begin(), names.end(), [](const auto &name) { return name.ends_with(".part"); });
@@ -156,24 +148,33 @@ class ProgramTest : public testing::Test {
     return child;
   }
 
-  /// Runs `spectrum`, which must succeed, and gives its CSV.
-  [[nodiscard]] std::vector<csv_row> spectrum(const std::string &options) const {
-    succeed("spectrum --csv result.csv " + options);
+  /// Runs a command that takes --csv and gives the rows of that file.
+  [[nodiscard]] std::vector<std::vector<double>> rows(const std::string &line, const std::string &header) const {
+    succeed(line + " --csv result.csv");
     std::istringstream text(read("result.csv"));
-    std::string line;
-    EXPECT_TRUE(std::getline(text, line) && line == "frequency_hz,level_dbfs") << line;
-    std::vector<csv_row> rows;
-    char comma = 0;
-    for (csv_row row{}; text >> row.frequency >> comma >> row.level;) rows.push_back(row);
-    return rows;
+    std::string row;
+    EXPECT_TRUE(std::getline(text, row) && row == header) << row;
+    std::vector<std::vector<double>> found;
+    while (std::getline(text, row)) found.push_back(numbers_in(row));
+    return found;
+  }
+
+  /// Draws a picture of each kind, which must be whole, and gives the SVG.
+  [[nodiscard]] std::string drawn(const std::string &line) const {
+    for (const std::string file : {"x.png", "x.svg"})
+      EXPECT_NE(std::string::npos, succeed(line + " --plot " + file).out.find(file));
+    const std::string png = read("x.png"), svg = read("x.svg");
+    EXPECT_TRUE(png.starts_with("\x89PNG\r\n\x1A\n") && png.ends_with("IEND\xAE\x42\x60\x82"));
+    EXPECT_TRUE(svg.starts_with("<?xml") && svg.find("</svg>") != std::string::npos);
+    return svg;
   }
 
   void write(const std::string &name, const std::string &content) const {
     std::ofstream(folder_ / name, std::ios::binary) << content;
   }
-  /// A file of zeros that takes no room.
-  void write_hole(const std::string &name, int bits) const {
-    write(name, "");
+  /// A file of zeros behind what it begins with, which takes no room.
+  void write_hole(const std::string &name, int bits, const std::string &begin = "") const {
+    write(name, begin);
     std::filesystem::resize_file(folder_ / name, std::uintmax_t{1} << bits);
   }
   [[nodiscard]] std::string read(const std::string &name) const {
@@ -191,9 +192,6 @@ class ProgramTest : public testing::Test {
   }
 
   std::filesystem::path folder_;
-
- private:
-  std::string logs_ = ".std";
 };
 
 }  // namespace tests
