@@ -11,7 +11,7 @@ namespace {
 
 using nlohmann::json;
 
-/// Of the file that was read, its samples or its place among others; the indices here start at 0.
+/// These fields speak of the file that was read, its samples or its place among others; the new indices start at 0.
 constexpr const char *no_longer_true[] = {
     "core:sha512",        "core:dataset",        "core:data_doi", "core:meta_doi",
     "core:metadata_only", "core:trailing_bytes", "core:offset",   "core:collection",

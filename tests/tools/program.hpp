@@ -85,6 +85,7 @@ class ProgramTest : public testing::Test {
     std::string name = testing::TempDir() + "lumra-XXXXXX";
     ASSERT_NE(nullptr, ::mkdtemp(name.data()));
     folder_ = name;
+    (void)std::signal(SIGINT, SIG_DFL);  // a shell ignores it for jobs in the background, and then so does the program
   }
   void TearDown() override { std::filesystem::remove_all(folder_); }
 

@@ -8,7 +8,7 @@
 
 namespace {
 
-/// Before the constructors of other files, which allocate.
+/// This runs before the constructors of other files, which allocate.
 [[gnu::constructor(101)]] void begin() {
   tool::install_failure_report();
 }

@@ -24,7 +24,7 @@ struct relation {
   std::complex<double> product;                    // sum of conj(reference) * measured
 };
 
-/// Without alignment the measured samples are not needed.
+/// Sums over both recordings; the measured samples are read for an alignment only.
 relation relate(const recording::source &reference, const recording::source &measured, const evm_settings &settings) {
   recording::sample_reader from(reference), to(measured);
   progress bar(settings.align ? "Aligning" : "Levelling");
@@ -62,7 +62,7 @@ std::complex<double> fitted_gain(const relation &sums, const recording::source &
   return sums.product / sums.reference_power;
 }
 
-/// In double precision, so that a power of two changes no digit.
+/// The products are in double precision, so that a power of two changes no digit.
 void multiply(std::span<sample> samples, std::complex<double> factor) noexcept {
   const double c = factor.real(), d = factor.imag();
   for (sample &x : samples) {
@@ -83,7 +83,7 @@ class statistics {
     result_.peak_at = index;
   }
 
-  /// In multiples of unit.
+  /// Gives the figures in multiples of unit.
   [[nodiscard]] deviation in(double unit) const noexcept {
     const auto count = static_cast<double>(std::max<std::uint64_t>(count_, 1));
     return {std::sqrt(squares_ / count) / unit, sum_ / count / unit, result_.peak / unit, result_.peak_at};
@@ -110,7 +110,7 @@ evm_result measure_evm(const recording::source &reference, const recording::sour
   evm_result result;
   result.reference_rms = std::sqrt(sums.reference_power / static_cast<double>(settings.samples));
   if (settings.align) result.gain = fitted_gain(sums, measured);
-  // Near one no product leaves the range of single precision.
+  // Near one, no product leaves the range of single precision.
   const double scale = std::scalbn(1.0, -std::ilogb(result.reference_rms));
   const double unit = result.reference_rms * scale;
 

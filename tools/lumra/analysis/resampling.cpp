@@ -16,7 +16,7 @@ namespace {
 
 using sample = std::complex<float>;
 
-/// So many that the images of the linear interpolation lie below the stop band of the design.
+/// There are so many phases that the images of the linear interpolation lie below the stop band of the design.
 constexpr std::int32_t phases = 128;
 constexpr double pass_edge = 0.45, stop_edge = 0.5, attenuation = 90;
 /// Points of the measured response: some sixteen to a side lobe.

@@ -169,7 +169,7 @@ void add_evm(CLI::App &program, work_to_do &work) {
   add_recording_options(*app, command->measured_options);
   command->reference_options.names.capture = "--reference-capture";
   add_capture_option(*app, command->reference_options, "The same of REFERENCE; --capture is for MEASURED");
-  // For tests: how much is read at a time must not change the result.
+  // Tests alone use this option: how much is read at a time must not change the result.
   app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
   app->callback([command, &work] { work = [command] { return run(*command); }; });
 }

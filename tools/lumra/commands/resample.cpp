@@ -104,7 +104,7 @@ void add_resample(CLI::App &program, work_to_do &work) {
   app->add_option("--output", command->output,
                   "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
       ->option_text("BASE");
-  // For tests: how much is read at a time must not change the result.
+  // Tests alone use this option: how much is read at a time must not change the result.
   app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
   app->callback([command, &work] { work = [command] { return run(*command); }; });
 }

@@ -128,7 +128,7 @@ void add_spectrum(CLI::App &program, work_to_do &work) {
   app->add_option("--csv", command->csv, "Write frequency and level of every bin")->option_text("FILE");
   app->add_option("--plot", command->plot, "Draw the spectrum")->option_text("FILE.png|.svg");
   add_recording_options(*app, command->options);
-  // For tests: how much is read at a time must not change the result.
+  // Tests alone use this option: how much is read at a time must not change the result.
   app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
   app->callback([command, &work] { work = [command] { return run(*command); }; });
 }

@@ -15,7 +15,7 @@ struct picture_size {
   int width, height;  // pixels
 };
 
-/// By the suffix, .png or .svg; throws failure for another one, and when gnuplot is not there.
+/// The suffix, .png or .svg, decides; throws failure for another one, and when gnuplot is not there.
 picture_type picture_type_of(const std::filesystem::path &file);
 
 /// The beginning of a script: terminal, fonts, encoding.

@@ -9,7 +9,8 @@
 
 namespace tool {
 
-/// To be called once, at the start. A file that grows beyond the limit for its size fails then, which is no signal.
+/// The program calls this once, at the start. A file that grows beyond the limit for its size then fails, which is no
+/// signal.
 void install_interruption();
 
 /// Removes unfinished files and ends the line of a progress bar; for an end at once, in handlers too.

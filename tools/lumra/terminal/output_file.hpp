@@ -35,7 +35,7 @@ class output_file final : public recording::byte_sink {
   /// Closes the file; throws failure when not all could be written. Nothing is written afterwards.
   void finish();
 
-  // Once it is finished; none of these allocates, and signals are held from appear on.
+  // These are for a finished file; none of them allocates, and signals are held from appear on.
 
   /// Takes the target's place; what stood there is kept aside if that is asked for. Gives 0, or the errno with which it
   /// changed nothing.
