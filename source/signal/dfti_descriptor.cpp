@@ -57,4 +57,17 @@ dfti_descriptor::dfti_descriptor(const dfti_descriptor &other) {
   handle_ = std::move(made);
 }
 
+std::array<MKL_LONG, 2> dfti_descriptor::lengths() const {
+  std::array<MKL_LONG, 2> lengths{};
+  check(DftiGetValue(handle_.get(), DFTI_LENGTHS, lengths.data()), dfti_step::lengths);
+  return lengths;
+}
+
+bool dfti_descriptor::free() noexcept {
+  const qsrfhs::mkl_section section;
+  DFTI_DESCRIPTOR_HANDLE held = handle_.release();
+  if (!held) return true;
+  return DftiErrorClass(DftiFreeDescriptor(&held), DFTI_NO_ERROR) != 0;
+}
+
 }  // namespace dsp

@@ -3,6 +3,7 @@
 
 #include <mkl_dfti.h>
 
+#include <array>
 #include <cstdint>
 #include <memory>
 
@@ -16,7 +17,7 @@ namespace dsp {
 inline constexpr std::uint64_t most_fft_points = std::uint64_t{1} << 27;
 
 /// What a transform was being asked when it failed.
-enum class dfti_step { create, copy, placement, storage, scale, commit, forward, backward };
+enum class dfti_step { create, copy, placement, storage, scale, commit, lengths, forward, backward };
 
 class dfti_failure : public transform_failure {
  public:
@@ -35,6 +36,8 @@ struct dfti_settings {
   MKL_LONG lengths[2] = {1, 0};             // points and 0 for one dimension, or rows and columns
   bool in_place = false;
   double forward_scale = 1, backward_scale = 1;
+
+  friend bool operator==(const dfti_settings &, const dfti_settings &) = default;
 };
 
 /// A committed descriptor, or none. All throw dfti_failure.
@@ -48,6 +51,11 @@ class dfti_descriptor {
   dfti_descriptor &operator=(dfti_descriptor &&) = default;
 
   explicit operator bool() const noexcept { return static_cast<bool>(handle_); }
+
+  /// As MKL has them, in the form of the settings.
+  [[nodiscard]] std::array<MKL_LONG, 2> lengths() const;
+  /// False when MKL reports an error; the descriptor is gone nevertheless.
+  bool free() noexcept;
 
   // In place, and from one memory to another, as the settings say.
   void forward(void *data) const {
