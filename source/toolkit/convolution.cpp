@@ -25,7 +25,7 @@ section kept(mode mode, std::int64_t nx, std::int64_t ny) noexcept {
 
 template <class E>
 void convolve(input<E> x, input<E> y, output<E> &out, std::int32_t mode_number, std::int32_t method_number,
-              std::int32_t block, scratch<E> full, scratch<E> room, transform_slot slot) {
+              std::int32_t block, scratch<E> full, scratch<E> room, transform_slot &slot) {
   require(x.count() >= 1 && y.count() >= 1, empty_input);
   const method how = checked_method(method_number);
   require(mode_number >= 0 && mode_number <= 2, bad_option);
@@ -39,13 +39,15 @@ void convolve(input<E> x, input<E> y, output<E> &out, std::int32_t mode_number, 
   refuse_sharing(full, x, y, out, room);
   refuse_sharing(room, x, y, out);
   const bool with_itself = same_array(x, y);
-  x.keep_apart_from(out);
-  y.keep_apart_from(out);
+  x.copy_if_same(out);
+  y.copy_if_same(out);
 
   const auto wanted = out.resize(part.count);
   const auto result = mode == mode::full ? wanted : full.resize(length);
   if (plan) {
-    fourier_convolve(*plan, x.values(), order::forward, y.values(), with_itself, room, slot, result);
+    const padded_vector<value_of<E>> first{x.values()}, second{y.values()};
+    const value_of<E> *found = with_itself ? plan->run(room, slot, first) : plan->run(room, slot, first, second);
+    std::copy_n(found, result.size(), result.begin());
   } else {
     std::fill(result.begin(), result.end(), value_of<E>{});
     add_convolution(x.values(), y.values(), block, result.data());
@@ -58,13 +60,15 @@ void convolve(input<E> x, input<E> y, output<E> &out, std::int32_t mode_number, 
 
 using namespace toolkit;
 
-#define CONVOLUTION(E)                                                                                                \
-  int32_t qsRFPELTA_##E##1DConvolutionH(handle<E> x, handle<E> y, handle<E> out, int32_t mode, int32_t method,        \
-                                        int32_t blockSize, handle<E> scratch, handle<E> transformScratch,             \
-                                        void **slot) {                                                                \
-    output<E> result(out);                                                                                            \
-    return toolkit_call([&] { convolve<E>(x, y, result, mode, method, blockSize, scratch, transformScratch, slot); }, \
-                        result);                                                                                      \
+#define CONVOLUTION(E)                                                                                         \
+  int32_t qsRFPELTA_##E##1DConvolutionH(handle<E> x, handle<E> y, handle<E> out, int32_t mode, int32_t method, \
+                                        int32_t blockSize, handle<E> scratch, handle<E> transformScratch,      \
+                                        void **slot) {                                                         \
+    return toolkit_call(                                                                                       \
+        [&](output<E> &result, transform_slot &kept) {                                                         \
+          convolve<E>(x, y, result, mode, method, blockSize, scratch, transformScratch, kept);                 \
+        },                                                                                                     \
+        output<E>(out), transform_slot(slot));                                                                 \
   }
 CONVOLUTION(s)
 CONVOLUTION(d)

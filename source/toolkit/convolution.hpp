@@ -65,6 +65,18 @@ void add_convolution(std::span<const T> a, std::span<const T> b, std::int32_t bl
   }
 }
 
+/// Fills a zero-padded record of one row.
+template <class U>
+struct padded_vector {
+  std::span<const U> from;
+  order in = order::forward;
+
+  template <class T>
+  void operator()(T *to, std::int64_t columns) const noexcept {
+    std::fill(copy_record(from.data(), static_cast<std::int64_t>(from.size()), in, to), to + columns, T{});
+  }
+};
+
 /// The zero-padded record, both spectra, and the result of a Fourier convolution, all in the caller's scratch. Matrices
 /// have rows, vectors one row.
 template <class E>
@@ -75,34 +87,37 @@ class fourier_convolution {
 
   /// Throws no_transform when there are more points than a transform may have. Sizes nothing.
   explicit fourier_convolution(std::int64_t length)
-      : rows_(1), columns_(checked(length)), kind_(vector_transform<E>(columns_, scaling::backward)) {}
+      : rows_(1), columns_(checked(length)), settings_(transform_settings<E>(columns_, 0, scaling::backward)) {}
   fourier_convolution(std::int64_t rows, std::int64_t columns)
-      : rows_(checked(rows)), columns_(checked(columns)), kind_(matrix_transform<E>(rows_, columns_)) {
+      : rows_(checked(rows)),
+        columns_(checked(columns)),
+        settings_(transform_settings<E>(rows_, columns_, scaling::backward)) {
     check_transform_size(rows_ * columns_);
   }
 
   /// load_x and load_y fill a zero-padded record: load(first element, elements per row). Without load_y, x is
   /// convolved with itself. Returns the first element of the result, which has as many columns as the padded record.
-  template <class LoadX, class LoadY>
-  const value *run(scratch<E> &room, transform_slot &slot, LoadX load_x, LoadY load_y, bool with_itself) const {
+  template <class LoadX, class... LoadY>
+  const value *run(scratch<E> &room, transform_slot &slot, LoadX load_x, LoadY... load_y) const {
+    static_assert(sizeof...(LoadY) <= 1);
     const std::int64_t record_size = padded(rows_ * columns_);
     const std::int64_t spectrum_size =
         is_complex<E> ? record_size : padded(rows_ == 1 ? columns_ + 2 : 2 * record_size);
-    const auto memory = room.resize(record_size + (with_itself ? 1 : 2) * spectrum_size);
-    value *const record = memory.data();
-    bin *const first = reinterpret_cast<bin *>(record + record_size);
-    bin *const second = with_itself ? first : reinterpret_cast<bin *>(record + record_size + spectrum_size);
+    const std::int64_t behind_first = record_size + std::int64_t{sizeof...(LoadY)} * spectrum_size;
+    value *const record = room.resize(behind_first + spectrum_size).data();
+    bin *const of_x = reinterpret_cast<bin *>(record + record_size);
+    bin *const of_y = reinterpret_cast<bin *>(record + behind_first);
 
-    const transform &fourier = slot.get(kind_);
-    load_x(record, columns_);
-    fourier.forward(record, first);
-    if (!with_itself) {
-      load_y(record, columns_);
-      fourier.forward(record, second);
-    }
+    const dsp::dfti_descriptor &fourier = slot.get(settings_);
+    const auto transform = [&](auto &load, bin *spectrum) {
+      load(record, columns_);
+      fourier.forward(record, spectrum);
+    };
+    transform(load_x, of_x);
+    (transform(load_y, of_y), ...);
     const std::int64_t used = is_complex<E> ? columns_ : columns_ / 2 + 1;
-    for (std::int64_t r = 0; r < rows_; ++r) multiply(first + r * columns_, second + r * columns_, used);
-    fourier.backward(first, record);
+    for (std::int64_t r = 0; r < rows_; ++r) multiply(of_x + r * columns_, of_y + r * columns_, used);
+    fourier.backward(of_x, record);
     return record;
   }
   [[nodiscard]] std::int64_t rows() const noexcept { return rows_; }
@@ -119,21 +134,7 @@ class fourier_convolution {
   static std::int64_t padded(std::int64_t n) noexcept { return (n + 15) / 16 * 16; }
 
   std::int64_t rows_, columns_;
-  transform_kind kind_;
+  dsp::dfti_settings settings_;
 };
-
-/// Full convolution of two vectors through transforms, x in the given order, to `out`.
-template <class E, class U, class V>
-void fourier_convolve(const fourier_convolution<E> &plan, std::span<const U> x, order order_of_x, std::span<const V> y,
-                      bool with_itself, scratch<E> &room, transform_slot &slot, std::span<value_of<E>> out) {
-  const auto load = [](const auto &from, order order) {
-    return [from, order](value_of<E> *to, std::int64_t columns) {
-      value_of<E> *rest = copy_record(from.data(), static_cast<std::int64_t>(from.size()), order, to);
-      std::fill(rest, to + columns, value_of<E>{});
-    };
-  };
-  const value_of<E> *result = plan.run(room, slot, load(x, order_of_x), load(y, order::forward), with_itself);
-  std::copy_n(result, out.size(), out.begin());
-}
 
 }  // namespace toolkit

@@ -54,7 +54,7 @@ void correlate_directly(std::span<const U> x, std::span<const V> y, std::int32_t
 template <class E, class F>
 void correlate(input<E> x, input<F> y, output<common_of<E, F>> &out, std::int32_t method_number,
                std::int32_t normalisation_number, std::int32_t block, scratch<common_of<E, F>> reversed,
-               scratch<common_of<E, F>> room, transform_slot slot) {
+               scratch<common_of<E, F>> room, transform_slot &slot) {
   require(x.count() >= 1 && y.count() >= 1, empty_input);
   const method how = checked_method(method_number);
   require(normalisation_number >= 0 && normalisation_number <= 2, bad_option);
@@ -64,12 +64,14 @@ void correlate(input<E> x, input<F> y, output<common_of<E, F>> &out, std::int32_
   if (how == method::fourier) plan.emplace(length);
   refuse_sharing(reversed, x, y, out, room);
   refuse_sharing(room, x, y, out);
-  x.keep_apart_from(out);
-  y.keep_apart_from(out);
+  x.copy_if_same(out);
+  y.copy_if_same(out);
 
   const auto lags = out.resize(length);
   if (plan) {
-    fourier_convolve(*plan, x.values(), order::reversed, y.values(), false, room, slot, lags);
+    const padded_vector<value_of<E>> first{x.values(), order::reversed};
+    const padded_vector<value_of<F>> second{y.values()};
+    std::copy_n(plan->run(room, slot, first, second), lags.size(), lags.begin());
   } else {
     correlate_directly(x.values(), y.values(), block, reversed, lags);
   }
@@ -87,21 +89,23 @@ void correlate_directly(matrix_view<const T> reversed, matrix_view<const T> y, m
       add_convolution(row(reversed, i), row(y, j), default_block, out.row(i + j));
 }
 
-/// Copies a matrix into the upper left corner of a zero-padded one.
+/// Fills a zero-padded matrix from its upper left corner on.
 template <class T>
-auto load_matrix(matrix_view<const T> from, order order, std::int64_t padded_rows) {
-  return [=](T *to, std::int64_t columns) {
-    std::fill_n(to, padded_rows * columns, T{});
-    for (std::int32_t r = 0; r < from.rows; ++r) {
-      const std::int32_t source = order == order::reversed ? from.rows - 1 - r : r;
-      copy_record(from.row(source), from.columns, order, to + r * columns);
-    }
-  };
-}
+struct padded_matrix {
+  matrix_view<const T> from;
+  order in;
+  std::int64_t rows;
+
+  void operator()(T *to, std::int64_t columns) const noexcept {
+    std::fill_n(to, rows * columns, T{});
+    for (std::int32_t r = 0; r < from.rows; ++r)
+      copy_record(from.row(in == order::reversed ? from.rows - 1 - r : r), from.columns, in, to + r * columns);
+  }
+};
 
 template <class E>
 void correlate_matrices(input_matrix<E> x, input_matrix<E> y, output_matrix<E> &out, std::int32_t method_number,
-                        scratch<E> reversed, scratch<E> room, transform_slot slot) {
+                        scratch<E> reversed, scratch<E> room, transform_slot &slot) {
   const auto is_empty = [](const auto &m) { return m.rows < 1 || m.columns < 1; };
   require(!is_empty(x.view()) && !is_empty(y.view()), empty_input);
   const method how = checked_method(method_number);
@@ -113,14 +117,15 @@ void correlate_matrices(input_matrix<E> x, input_matrix<E> y, output_matrix<E> &
   if (how == method::fourier) plan.emplace(rows, columns);
   refuse_sharing(reversed, x, y, out, room);
   refuse_sharing(room, x, y, out);
-  x.keep_apart_from(out);
-  y.keep_apart_from(out);
+  x.copy_if_same(out);
+  y.copy_if_same(out);
 
   using value = value_of<E>;
   const matrix_view<value> lags = out.resize(rows, columns);
   if (plan) {
-    const value *result = plan->run(room, slot, load_matrix(x.view(), order::reversed, plan->rows()),
-                                    load_matrix(y.view(), order::forward, plan->rows()), false);
+    const padded_matrix<value> first{x.view(), order::reversed, plan->rows()};
+    const padded_matrix<value> second{y.view(), order::forward, plan->rows()};
+    const value *const result = plan->run(room, slot, first, second);
     for (std::int32_t r = 0; r < lags.rows; ++r) std::copy_n(result + r * plan->columns(), lags.columns, lags.row(r));
   } else {
     const auto turned = static_cast<std::int64_t>(x.view().size());
@@ -139,10 +144,11 @@ using namespace toolkit;
   int32_t qsRFPELTA_##NAME##1DCorrelationH(handle<E> x, handle<F> y, handle<common_of<E, F>> out, int32_t method,     \
                                            int32_t normalisation, int32_t blockSize, handle<common_of<E, F>> scratch, \
                                            handle<common_of<E, F>> transformScratch, void **slot) {                   \
-    output<common_of<E, F>> lags(out);                                                                                \
     return toolkit_call(                                                                                              \
-        [&] { correlate<E, F>(x, y, lags, method, normalisation, blockSize, scratch, transformScratch, slot); },      \
-        lags);                                                                                                        \
+        [&](output<common_of<E, F>> &lags, transform_slot &kept) {                                                    \
+          correlate<E, F>(x, y, lags, method, normalisation, blockSize, scratch, transformScratch, kept);             \
+        },                                                                                                            \
+        output<common_of<E, F>>(out), transform_slot(slot));                                                          \
   }
 CORRELATION(s, s, s)
 CORRELATION(d, d, d)
@@ -157,8 +163,11 @@ CORRELATION(zd, z, d)
 #define MATRIX_CORRELATION(E)                                                                                         \
   int32_t qsRFPELTA_##E##2DCorrelationH(matrix_handle<E> x, matrix_handle<E> y, matrix_handle<E> out, int32_t method, \
                                         handle<E> scratch, handle<E> transformScratch, void **slot) {                 \
-    output_matrix<E> lags(out);                                                                                       \
-    return toolkit_call([&] { correlate_matrices<E>(x, y, lags, method, scratch, transformScratch, slot); }, lags);   \
+    return toolkit_call(                                                                                              \
+        [&](output_matrix<E> &lags, transform_slot &kept) {                                                           \
+          correlate_matrices<E>(x, y, lags, method, scratch, transformScratch, kept);                                 \
+        },                                                                                                            \
+        output_matrix<E>(out), transform_slot(slot));                                                                 \
   }
 MATRIX_CORRELATION(s)
 MATRIX_CORRELATION(d)

@@ -10,7 +10,7 @@ template <class E>
 void decimate_record(input<E> x, output<E> &out, std::int32_t factor, decimation how) {
   require(x.count() >= 1, empty_input);
   require(factor >= 1 && factor <= x.count(), bad_factor);
-  x.keep_apart_from(out);
+  x.copy_if_same(out);
   decimate<value_of<E>>(x.values(), out.resize(x.count() / factor), factor, how);
 }
 
@@ -19,11 +19,10 @@ void decimate_record(input<E> x, output<E> &out, std::int32_t factor, decimation
 
 using namespace toolkit;
 
-#define DECIMATE(E)                                                                                \
-  int32_t qsRFPELTA_##E##DecimateH(handle<E> in, handle<E> out, int32_t factor, int32_t average) { \
-    output<E> kept(out);                                                                           \
-    const decimation how = average != 0 ? decimation::average : decimation::pick;                  \
-    return toolkit_call([&] { decimate_record<E>(in, kept, factor, how); }, kept);                 \
+#define DECIMATE(E)                                                                                           \
+  int32_t qsRFPELTA_##E##DecimateH(handle<E> in, handle<E> out, int32_t factor, int32_t average) {            \
+    const decimation how = average != 0 ? decimation::average : decimation::pick;                             \
+    return toolkit_call([&](output<E> &kept) { decimate_record<E>(in, kept, factor, how); }, output<E>(out)); \
   }
 DECIMATE(s)
 DECIMATE(d)

@@ -11,6 +11,13 @@
 namespace toolkit {
 namespace {
 
+/// Which bin of a spectrum comes first: that of frequency 0, or that of the most negative one.
+enum class bin_order { natural, centred };
+
+bin_order order_of(std::int32_t shift) noexcept {
+  return shift != 0 ? bin_order::centred : bin_order::natural;
+}
+
 /// Writes the upper half of a real record's spectrum, the mirrored conjugate of the lower one.
 template <class Complex>
 void complete_spectrum(Complex *bins, std::int64_t n) noexcept {
@@ -19,13 +26,13 @@ void complete_spectrum(Complex *bins, std::int64_t n) noexcept {
 }
 
 template <class E>
-void forward_fft(input<E> x, output<complex_of<E>> &y, std::int32_t size, bool centred, scratch<E> pad,
-                 transform_slot slot) {
+void forward_fft(input<E> x, output<complex_of<E>> &y, std::int32_t size, bin_order order, scratch<E> pad,
+                 transform_slot &slot) {
   require(x.count() >= 1, empty_input);
   const std::int32_t n = size < 1 ? x.count() : size;
   check_transform_size(n);
   refuse_sharing(pad, x, y);
-  x.keep_apart_from(y);
+  x.copy_if_same(y);
   const auto bins = y.resize(n);
 
   auto record = x.values();
@@ -34,9 +41,9 @@ void forward_fft(input<E> x, output<complex_of<E>> &y, std::int32_t size, bool c
     std::fill(std::copy(record.begin(), record.end(), padded.begin()), padded.end(), value_of<E>{});
     record = padded;
   }
-  slot.get(vector_transform<E>(n, scaling::none)).forward(record.data(), bins.data());
+  slot.get(transform_settings<E>(n, 0, scaling::none)).forward(record.data(), bins.data());
   if constexpr (!is_complex<E>) complete_spectrum(bins.data(), n);
-  if (centred) std::rotate(bins.begin(), bins.end() - n / 2, bins.end());
+  if (order == bin_order::centred) std::rotate(bins.begin(), bins.end() - n / 2, bins.end());
 }
 
 /// Bins of a spectrum in the order in which the transform takes them: 0 to n / 2 for a real record, else all.
@@ -58,18 +65,18 @@ std::span<const value_of<complex_of<E>>> natural_order(std::span<const value_of<
 }
 
 template <class E>
-void inverse_fft(input<complex_of<E>> x, output<E> &y, bool centred, scratch<complex_of<E>> gathered,
-                 transform_slot slot) {
+void inverse_fft(input<complex_of<E>> x, output<E> &y, bin_order order, scratch<complex_of<E>> gathered,
+                 transform_slot &slot) {
   const std::int32_t n = x.count();
   require(n >= 1, empty_input);
   check_transform_size(n);
   refuse_sharing(gathered, x, y);
-  x.keep_apart_from(y);
+  x.copy_if_same(y);
   const auto record = y.resize(n);
 
   auto bins = x.values();
-  if (centred) bins = natural_order<E>(bins, gathered);
-  slot.get(vector_transform<E>(n, scaling::backward)).backward(bins.data(), record.data());
+  if (order == bin_order::centred) bins = natural_order<E>(bins, gathered);
+  slot.get(transform_settings<E>(n, 0, scaling::backward)).backward(bins.data(), record.data());
 }
 
 }  // namespace
@@ -77,16 +84,18 @@ void inverse_fft(input<complex_of<E>> x, output<E> &y, bool centred, scratch<com
 
 using namespace toolkit;
 
-#define FFT(E)                                                                                        \
-  int32_t qsRFPELTA_##E##1DFFTH(handle<E> in, handle<complex_of<E>> out, int32_t size, int32_t shift, \
-                                handle<E> workspace, void **slot) {                                   \
-    output<complex_of<E>> y(out);                                                                     \
-    return toolkit_call([&] { forward_fft<E>(in, y, size, shift != 0, workspace, slot); }, y);        \
-  }                                                                                                   \
-  int32_t qsRFPELTA_##E##1DInvFFTH(handle<complex_of<E>> spectrum, handle<E> out, int32_t shift,      \
-                                   handle<complex_of<E>> workspace, void **slot) {                    \
-    output<E> y(out);                                                                                 \
-    return toolkit_call([&] { inverse_fft<E>(spectrum, y, shift != 0, workspace, slot); }, y);        \
+#define FFT(E)                                                                                                        \
+  int32_t qsRFPELTA_##E##1DFFTH(handle<E> in, handle<complex_of<E>> out, int32_t size, int32_t shift,                 \
+                                handle<E> workspace, void **slot) {                                                   \
+    return toolkit_call([&](output<complex_of<E>> &y,                                                                 \
+                            transform_slot &kept) { forward_fft<E>(in, y, size, order_of(shift), workspace, kept); }, \
+                        output<complex_of<E>>(out), transform_slot(slot));                                            \
+  }                                                                                                                   \
+  int32_t qsRFPELTA_##E##1DInvFFTH(handle<complex_of<E>> spectrum, handle<E> out, int32_t shift,                      \
+                                   handle<complex_of<E>> workspace, void **slot) {                                    \
+    return toolkit_call(                                                                                              \
+        [&](output<E> &y, transform_slot &kept) { inverse_fft<E>(spectrum, y, order_of(shift), workspace, kept); },   \
+        output<E>(out), transform_slot(slot));                                                                        \
   }
 FFT(s)
 FFT(d)

@@ -67,9 +67,16 @@ std::span<value_of<E>> values(handle<E> array) noexcept {
   return {reinterpret_cast<value_of<E> *>(elements.data()), elements.size()};
 }
 
+/// Elements of a matrix by its sizes; -1 when one of them is negative.
 template <class Block>
 std::int64_t product(const Block &matrix) noexcept {
   return matrix.rows < 0 || matrix.columns < 0 ? -1 : std::int64_t{matrix.rows} * matrix.columns;
+}
+
+template <class E>
+std::span<value_of<E>> values(matrix_handle<E> array) noexcept {
+  if (!host::has_block(array) || product(**array) < 0) return {};
+  return {reinterpret_cast<value_of<E> *>((*array)->elements), static_cast<std::size_t>(product(**array))};
 }
 
 /// Empties an array; its sizes become 0 even when the resize is refused.
@@ -125,56 +132,56 @@ struct matrix_view {
   [[nodiscard]] T *row(std::int32_t r) const noexcept { return data + std::int64_t{r} * columns; }
 };
 
-/// A vector that is only read. A null handle and a null block are empty.
+/// Elements that are only read, of the array that they are in or, once that is about to be overwritten, of a copy.
 template <class E>
-class input {
+class read_only {
  public:
-  input(handle<E> array) noexcept : array_(array), values_(detail::values<E>(array)) {}
-
   [[nodiscard]] std::span<const value_of<E>> values() const noexcept { return values_; }
-  [[nodiscard]] std::int32_t count() const noexcept { return static_cast<std::int32_t>(values_.size()); }
-  [[nodiscard]] identity which() const noexcept { return identity(array_); }
+  [[nodiscard]] identity which() const noexcept { return which_; }
 
   /// Reads a copy from here on if `written`, which is about to be sized, is the same array.
   template <class Array>
-  void keep_apart_from(const Array &written) {
+  void copy_if_same(const Array &written) {
     if (!same_array(*this, written)) return;
     copy_ = qsrfhs::aligned_buffer<value_of<E>>(values_.size());
     std::copy(values_.begin(), values_.end(), copy_.data());
     values_ = copy_.elements();
   }
 
+ protected:
+  read_only(identity which, std::span<const value_of<E>> values) noexcept : which_(which), values_(values) {}
+
  private:
-  handle<E> array_;
-  std::span<value_of<E>> values_;
+  identity which_;
+  std::span<const value_of<E>> values_;
   qsrfhs::aligned_buffer<value_of<E>> copy_;
 };
 
-/// A matrix that is only read. A null handle, a null block and a negative size are empty.
+/// A vector that is only read. A null handle and a null block are empty.
 template <class E>
-class input_matrix {
+class input : public read_only<E> {
  public:
-  input_matrix(matrix_handle<E> array) noexcept : array_(array) {
+  input(handle<E> array) noexcept : read_only<E>(identity(array), detail::values<E>(array)) {}
+
+  [[nodiscard]] std::int32_t count() const noexcept { return static_cast<std::int32_t>(this->values().size()); }
+};
+
+/// A matrix that is only read. A null handle and a null block are empty; negative sizes have no elements.
+template <class E>
+class input_matrix : public read_only<E> {
+ public:
+  input_matrix(matrix_handle<E> array) noexcept : read_only<E>(identity(array), detail::values<E>(array)) {
     if (!host::has_block(array)) return;
-    view_ = {reinterpret_cast<const value_of<E> *>((*array)->elements), (*array)->rows, (*array)->columns};
+    rows_ = (*array)->rows;
+    columns_ = (*array)->columns;
   }
 
-  [[nodiscard]] const matrix_view<const value_of<E>> &view() const noexcept { return view_; }
-  [[nodiscard]] identity which() const noexcept { return identity(array_); }
-
-  /// Reads a copy from here on if `written`, which is about to be sized, is the same array. Sizes above 0 only.
-  template <class Array>
-  void keep_apart_from(const Array &written) {
-    if (!same_array(*this, written)) return;
-    copy_ = qsrfhs::aligned_buffer<value_of<E>>(view_.size());
-    std::copy(view_.data, view_.data + view_.size(), copy_.data());
-    view_.data = copy_.data();
+  [[nodiscard]] matrix_view<const value_of<E>> view() const noexcept {
+    return {this->values().data(), rows_, columns_};
   }
 
  private:
-  matrix_handle<E> array_;
-  matrix_view<const value_of<E>> view_;
-  qsrfhs::aligned_buffer<value_of<E>> copy_;
+  std::int32_t rows_ = 0, columns_ = 0;
 };
 
 /// A vector that the call sizes and writes: a result, a state, or data changed in place. A failure empties it.
@@ -244,15 +251,18 @@ class output_matrix {
   matrix_handle<E> array_;
 };
 
-/// A scalar result. A failure makes it NaN. A null address is allowed.
-template <class T>
+/// What a failure makes of a scalar result.
+enum class failed_result { not_a_number, zero };
+
+/// A scalar result. A null address is allowed.
+template <class T, failed_result failed = failed_result::not_a_number>
 class result {
  public:
   explicit result(T *address) noexcept : address_(address) {}
   void set(T value) noexcept {
     if (address_) *address_ = value;
   }
-  void clear() noexcept { set(std::numeric_limits<T>::quiet_NaN()); }
+  void clear() noexcept { set(failed == failed_result::zero ? T{} : std::numeric_limits<T>::quiet_NaN()); }
 
  private:
   T *address_;
@@ -279,14 +289,15 @@ class scratch {
   output<E> array_;
 };
 
-/// Runs an operation: its failure, or whatever else it throws, becomes the status, and the outputs are emptied.
+/// Runs an operation on its outputs: its failure, or whatever else it throws, becomes the status, and all outputs are
+/// emptied.
 template <class Work, class... Outputs>
-std::int32_t toolkit_call(Work &&work, Outputs &...outputs) noexcept {
+std::int32_t toolkit_call(Work work, Outputs... outputs) noexcept {
   std::int32_t code = success;
   const qsrfhs::mkl_memory::watch watched;  // BLAS has no status, and LAPACK's may say success or bad arguments
+  const qsrfhs::mkl_runtime::use computing;
   try {
-    const qsrfhs::mkl_runtime::use computing;
-    std::forward<Work>(work)();
+    work(outputs...);
   } catch (...) {
     code = status_of_current_exception();
   }

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <optional>
 #include <span>
 #include <type_traits>
 #include <utility>
@@ -112,87 +113,144 @@ void recurse(std::span<Real> data, std::span<const Real> a, std::span<const Real
   recurse_any<parts>(data.data(), n, a, gain, state.data());
 }
 
-/// A copy of coefficients in workspace that has `size` elements, zeros behind them.
-template <class Real>
-std::span<const Real> copy_into(std::span<Real> room, std::span<const Real> from) {
-  std::fill(std::copy(from.begin(), from.end(), room.begin()), room.end(), Real{});
-  return room.first(from.size());
+/// What the states hold when a call begins.
+enum class history { kept, silence };
+
+history history_by(std::int32_t reset) noexcept {
+  return reset != 0 ? history::silence : history::kept;
 }
 
+/// The data, which become the result, and the newest samples in front of both sums, newest first.
 template <class E>
 struct filter_arrays {
   output<E> data, forward_state, reverse_state;
+
+  void clear() noexcept {
+    data.clear();
+    forward_state.clear();
+    reverse_state.clear();
+  }
 };
 
-/// Workspace for both sets of coefficients: two arrays, or one for all.
+/// The denominator a, which may be empty, and the numerator b.
 template <class F>
-struct coefficient_room {
-  scratch<F> &forward, &reverse;
+struct filter_coefficients {
+  input<F> a, b;
 };
 
-/// E: letter of the data, F: of the coefficients.
+/// Workspace: coefficients of both kinds, in two arrays or (without `reverse`) in one, and the data's newest samples.
 template <class E, class F>
-void filter(filter_arrays<E> &arrays, input<F> a, input<F> b, bool reset, const coefficient_room<F> &room,
-            scratch<E> &saved_inputs) {
-  using real = real_of<E>;
-  constexpr int parts = is_complex<E> ? 2 : 1;
-  auto &[record, forward_state, reverse_state] = arrays;
-  const std::int32_t n = static_cast<std::int32_t>(record.values().size()), na = a.count(), nb = b.count();
-  if (n < 1 || (nb < 1 && na < 1)) return;
-  require(nb >= 1, empty_result);
-  refuse_sharing(forward_state, record, reverse_state, a, b);
-  refuse_sharing(reverse_state, record, a, b);
-  const bool one_room = &room.forward == &room.reverse;
-  refuse_sharing(room.forward, record, a, b, forward_state, reverse_state, saved_inputs);
-  if (!one_room) refuse_sharing(room.reverse, record, a, b, forward_state, reverse_state, saved_inputs, room.forward);
-  refuse_sharing(saved_inputs, record, a, b, forward_state, reverse_state);
+struct filter_workspace {
+  scratch<F> forward;
+  std::optional<scratch<F>> reverse;
+  scratch<E> saved_inputs;
+};
 
+template <class E, class F>
+void refuse_sharing_of_any(const filter_arrays<E> &arrays, const filter_coefficients<F> &of,
+                           const filter_workspace<E, F> &room) {
+  const auto &[data, forward_state, reverse_state] = arrays;
+  refuse_sharing(forward_state, data, reverse_state, of.a, of.b);
+  refuse_sharing(reverse_state, data, of.a, of.b);
+  refuse_sharing(room.forward, data, of.a, of.b, forward_state, reverse_state, room.saved_inputs);
+  if (room.reverse)
+    refuse_sharing(*room.reverse, data, of.a, of.b, forward_state, reverse_state, room.saved_inputs, room.forward);
+  refuse_sharing(room.saved_inputs, data, of.a, of.b, forward_state, reverse_state);
+}
+
+/// Gives the states the sizes that the filter's orders ask for; where one had another size both begin with silence.
+template <class E>
+void size_states(filter_arrays<E> &arrays, std::int32_t na, std::int32_t nb, history before) {
+  auto &[data, forward_state, reverse_state] = arrays;
   const auto differs = [](const output<E> &state, std::int32_t count) {
     return !state.which().has_block() || static_cast<std::int32_t>(state.values().size()) != count;
   };
-  const bool fresh = reset || differs(forward_state, nb - 1) || (na >= 1 && differs(reverse_state, na - 1));
+  const bool fresh =
+      before == history::silence || differs(forward_state, nb - 1) || (na >= 1 && differs(reverse_state, na - 1));
   forward_state.resize(nb - 1);
   if (na >= 1) reverse_state.resize(na - 1);
-  if (fresh) {
-    for (const auto &state : {forward_state.values(), reverse_state.values()})
-      std::fill(state.begin(), state.end(), value_of<E>{});
+  if (!fresh) return;
+  for (const auto &state : {forward_state.values(), reverse_state.values()})
+    std::fill(state.begin(), state.end(), value_of<E>{});
+}
+
+/// Copies of the coefficients: the data, which may be the same array, change meanwhile. A single coefficient takes no
+/// workspace.
+template <class E, class F>
+class copied_coefficients {
+ public:
+  using real = real_of<F>;
+
+  copied_coefficients(const filter_coefficients<F> &of, filter_workspace<E, F> &room)
+      : first_a_(of.a.count() >= 1 ? of.a.values()[0] : real{1}), first_b_(of.b.values()[0]) {
+    // Whole groups of four, for the denominator behind a[0].
+    const std::int64_t na = of.a.count(), nb = of.b.count();
+    const std::int64_t of_b = nb > 1 ? (nb + 3) / 4 * 4 : 0, of_a = na > 1 ? 4 * ((na + 2) / 4) + 1 : 0;
+    std::span<real> memory_b, memory_a;
+    if (room.reverse) {
+      if (of_b > 0) memory_b = room.forward.resize(of_b);
+      if (of_a > 0) memory_a = room.reverse->resize(of_a);
+    } else if (of_b + of_a > 0) {
+      memory_b = room.forward.resize(of_b + of_a);
+      memory_a = memory_b.subspan(static_cast<std::size_t>(of_b));
+    }
+    if (of_b > 0) b_ = copy_into(memory_b, of.b.values());
+    if (of_a > 0) a_ = copy_into(memory_a, of.a.values());
   }
 
-  // Coefficients are copied before the data change, which may be the same array. Whole groups of four, and a[0].
-  const std::int64_t forward_size = nb > 1 ? (std::int64_t{nb} + 3) / 4 * 4 : 0;
-  const std::int64_t reverse_size = na > 1 ? 4 * ((std::int64_t{na} + 2) / 4) + 1 : 0;
-  std::span<real> forward_room, reverse_room;
-  if (one_room) {
-    if (forward_size + reverse_size > 0) forward_room = room.forward.resize(forward_size + reverse_size);
-    reverse_room = forward_room.subspan(static_cast<std::size_t>(forward_size));
-    forward_room = forward_room.first(static_cast<std::size_t>(forward_size));
-  } else {
-    if (forward_size > 0) forward_room = room.forward.resize(forward_size);
-    if (reverse_size > 0) reverse_room = room.reverse.resize(reverse_size);
-  }
-  const real only_forward = b.values()[0], only_reverse = na >= 1 ? a.values()[0] : real{1};
-  if (nb > 1) copy_into(forward_room, b.values());
-  if (na > 1) copy_into(reverse_room, a.values());
+  /// Empty where there is one coefficient, or none.
+  [[nodiscard]] std::span<const real> a() const noexcept { return a_; }
+  [[nodiscard]] std::span<const real> b() const noexcept { return b_; }
+  /// 1 where there is none.
+  [[nodiscard]] real first_a() const noexcept { return first_a_; }
+  [[nodiscard]] real first_b() const noexcept { return first_b_; }
 
-  const auto data = record.values();
-  const auto reals = [](std::span<value_of<E>> v) {
-    return std::span<real>(reinterpret_cast<real *>(v.data()), v.size() * parts);
-  };
+ private:
+  static std::span<const real> copy_into(std::span<real> memory, std::span<const real> from) noexcept {
+    std::copy(from.begin(), from.end(), memory.begin());
+    return memory.first(from.size());
+  }
+
+  std::span<const real> a_, b_;
+  real first_a_, first_b_;
+};
+
+/// The values of samples, one by one.
+template <class E>
+std::span<real_of<E>> reals(std::span<value_of<E>> samples) noexcept {
+  constexpr std::size_t parts = is_complex<E> ? 2 : 1;
+  return {reinterpret_cast<real_of<E> *>(samples.data()), samples.size() * parts};
+}
+
+/// E: letter of the data, F: of the coefficients.
+template <class E, class F>
+void filter(filter_arrays<E> &arrays, const filter_coefficients<F> &given, history before,
+            filter_workspace<E, F> room) {
+  constexpr int parts = is_complex<E> ? 2 : 1;
+  const std::span<value_of<E>> data = arrays.data.values();
+  const auto n = static_cast<std::int32_t>(data.size());
+  const std::int32_t na = given.a.count(), nb = given.b.count();
+  if (n < 1 || (nb < 1 && na < 1)) return;
+  require(nb >= 1, empty_result);
+  refuse_sharing_of_any(arrays, given, room);
+  size_states(arrays, na, nb, before);
+  const copied_coefficients<E, F> coefficients(given, room);
+
   if (nb == 1) {
-    scale(n, only_forward, data.data());
+    scale(n, coefficients.first_b(), data.data());
   } else {
-    const auto saved = saved_inputs.resize(std::min(nb - 1, n));
-    std::copy(data.end() - static_cast<std::ptrdiff_t>(saved.size()), data.end(), saved.begin());
-    const auto state = forward_state.values();
-    convolve_in_place<parts, real>(reals(data).data(), n, forward_room.first(static_cast<std::size_t>(nb)),
-                                   reals(state).data());
+    const auto state = arrays.forward_state.values();
+    const auto newest = data.last(static_cast<std::size_t>(std::min(nb - 1, n)));
+    const auto saved = room.saved_inputs.resize(static_cast<std::int64_t>(newest.size()));
+    std::copy(newest.begin(), newest.end(), saved.begin());
+    convolve_in_place<parts>(reals<E>(data).data(), n, coefficients.b(), reals<E>(state).data());
     push_front<value_of<E>>(state, saved);
   }
   if (na == 1) {
-    scale(n, 1 / only_reverse, data.data());
+    scale(n, 1 / coefficients.first_a(), data.data());
   } else if (na > 1) {
-    const auto state = reverse_state.values();
-    recurse<parts, real>(reals(data), reverse_room.first(static_cast<std::size_t>(na)), reals(state));
+    const auto state = arrays.reverse_state.values();
+    recurse<parts, real_of<E>>(reals<E>(data), coefficients.a(), reals<E>(state));
     push_front<value_of<E>>(state, data);
   }
 }
@@ -202,16 +260,15 @@ void filter(filter_arrays<E> &arrays, input<F> a, input<F> b, bool reset, const 
 
 using namespace toolkit;
 
-#define IIR(NAME, E, F)                                                                                        \
-  int32_t qsRFPELTA_##NAME##IIRDirectFilterH(                                                                  \
-      handle<E> data, handle<F> reverse, handle<F> forward, handle<E> forwardState, handle<E> reverseState,    \
-      int32_t reset, handle<F> forwardScratch, handle<F> reverseScratch, handle<E> inputScratch) {             \
-    filter_arrays<E> arrays{output<E>(data), output<E>(forwardState), output<E>(reverseState)};                \
-    scratch<F> forward_room(forwardScratch), reverse_room(reverseScratch);                                     \
-    scratch<E> saved(inputScratch);                                                                            \
-    const coefficient_room<F> room{forward_room, reverse_room};                                                \
-    return toolkit_call([&] { filter<E, F>(arrays, reverse, forward, reset != 0, room, saved); }, arrays.data, \
-                        arrays.forward_state, arrays.reverse_state);                                           \
+#define IIR(NAME, E, F)                                                                                                \
+  int32_t qsRFPELTA_##NAME##IIRDirectFilterH(                                                                          \
+      handle<E> data, handle<F> reverse, handle<F> forward, handle<E> forwardState, handle<E> reverseState,            \
+      int32_t reset, handle<F> forwardScratch, handle<F> reverseScratch, handle<E> inputScratch) {                     \
+    return toolkit_call(                                                                                               \
+        [&](filter_arrays<E> &arrays) {                                                                                \
+          filter<E, F>(arrays, {reverse, forward}, history_by(reset), {forwardScratch, reverseScratch, inputScratch}); \
+        },                                                                                                             \
+        filter_arrays<E>{output<E>(data), output<E>(forwardState), output<E>(reverseState)});                          \
   }
 IIR(ss, s, s)
 IIR(dd, d, d)
@@ -221,10 +278,9 @@ IIR(cs, c, s)
 int32_t qsRFPELTA_zdIIRDirectFilterH(handle<z> data, handle<d> reverse, handle<d> forward, handle<z> forwardState,
                                      handle<z> reverseState, int32_t reset, handle<d> coefficientScratch,
                                      handle<z> inputScratch) {
-  filter_arrays<z> arrays{output<z>(data), output<z>(forwardState), output<z>(reverseState)};
-  scratch<d> both(coefficientScratch);
-  scratch<z> saved(inputScratch);
-  const coefficient_room<d> room{both, both};
-  return toolkit_call([&] { filter<z, d>(arrays, reverse, forward, reset != 0, room, saved); }, arrays.data,
-                      arrays.forward_state, arrays.reverse_state);
+  return toolkit_call(
+      [&](filter_arrays<z> &arrays) {
+        filter<z, d>(arrays, {reverse, forward}, history_by(reset), {coefficientScratch, std::nullopt, inputScratch});
+      },
+      filter_arrays<z>{output<z>(data), output<z>(forwardState), output<z>(reverseState)});
 }

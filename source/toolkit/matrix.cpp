@@ -29,8 +29,8 @@ void multiply_matrices(input_matrix<E> a, input_matrix<E> b, output_matrix<E> &c
     return size == 0 ? 0 : std::bit_width(static_cast<std::uint32_t>(size - 1));
   };
   require(bits(m) + bits(n) < 31, no_memory);
-  a.keep_apart_from(c);
-  b.keep_apart_from(c);
+  a.copy_if_same(c);
+  b.copy_if_same(c);
   const auto product = c.resize(m, n);
   if (m == 0 || n == 0) return;
   if (k == 0) {
@@ -50,8 +50,8 @@ void multiply_vector(input_matrix<E> a, handle<E> vector, output<E> &y) {
   const std::int32_t m = a.view().rows, k = a.view().columns;
   check_sizes({m, k, (*vector)->count});
   require(k == x.count(), inner_dimensions_differ);
-  a.keep_apart_from(y);
-  x.keep_apart_from(y);
+  a.copy_if_same(y);
+  x.copy_if_same(y);
   const auto product = y.resize(k == 0 ? 0 : m);
   if (!product.empty()) multiply(m, k, a.view().data, x.values().data(), product.data());
 }
@@ -162,8 +162,8 @@ void least_squares(input_matrix<E> a, input<E> b, float tolerance, output<E> &x,
   const auto usable = [](value_of<E> v) { return finite(v); };
   require(std::all_of(data, data + a.view().size(), usable), not_finite);
   require(std::all_of(b.values().begin(), b.values().end(), usable), not_finite);
-  a.keep_apart_from(x);
-  b.keep_apart_from(x);
+  a.copy_if_same(x);
+  b.copy_if_same(x);
 
   const equation<E> eq{a.view(), b.values(), x.resize(n)};
   const auto by_columns = matrix.resize(std::int64_t{m} * n);
@@ -184,18 +184,19 @@ using namespace toolkit;
 
 #define MATRIX(E)                                                                                                      \
   int32_t qsRFPELTA_##E##MtrxMulH(matrix_handle<E> a, matrix_handle<E> b, matrix_handle<E> out) {                      \
-    output_matrix<E> product(out);                                                                                     \
-    return toolkit_call([&] { multiply_matrices<E>(a, b, product); }, product);                                        \
+    return toolkit_call([&](output_matrix<E> &product) { multiply_matrices<E>(a, b, product); },                       \
+                        output_matrix<E>(out));                                                                        \
   }                                                                                                                    \
   int32_t qsRFPELTA_##E##MtrxVecMulH(matrix_handle<E> a, handle<E> x, handle<E> y) {                                   \
-    output<E> product(y);                                                                                              \
-    return toolkit_call([&] { multiply_vector<E>(a, x, product); }, product);                                          \
+    return toolkit_call([&](output<E> &product) { multiply_vector<E>(a, x, product); }, output<E>(y));                 \
   }                                                                                                                    \
   int32_t qsRFPELTA_##E##LSEqH(matrix_handle<E> a, handle<E> b, float tolerance, handle<E> x, handle<E> matrixScratch, \
                                handle<E> rhsScratch, handle<E> workScratch) {                                          \
-    output<E> solution(x);                                                                                             \
-    return toolkit_call([&] { least_squares<E>(a, b, tolerance, solution, matrixScratch, rhsScratch, workScratch); },  \
-                        solution);                                                                                     \
+    return toolkit_call(                                                                                               \
+        [&](output<E> &solution) {                                                                                     \
+          least_squares<E>(a, b, tolerance, solution, matrixScratch, rhsScratch, workScratch);                         \
+        },                                                                                                             \
+        output<E>(x));                                                                                                 \
   }
 MATRIX(s)
 MATRIX(c)

@@ -11,15 +11,15 @@ namespace toolkit {
 namespace {
 
 template <class E>
-void power_spectrum(input<E> x, output<magnitude_of<E>> &out, scratch<E> room, transform_slot slot) {
+void power_spectrum(input<E> x, output<magnitude_of<E>> &out, scratch<E> room, transform_slot &slot) {
   const std::int64_t n = x.count();
   require(n >= 1, empty_input);
   check_transform_size(n);
   refuse_sharing(room, x, out);
-  x.keep_apart_from(out);
+  x.copy_if_same(out);
   real_of<E> *const p = out.resize(n).data();
   auto *const bins = reinterpret_cast<value_of<complex_of<E>> *>(room.resize(n + 2).data());
-  slot.get(vector_transform<E>(n, scaling::none)).forward(x.values().data(), bins);
+  slot.get(transform_settings<E>(n, 0, scaling::none)).forward(x.values().data(), bins);
 
   const double scale = 1.0 / (static_cast<double>(n) * static_cast<double>(n));
   if constexpr (is_complex<E>) {
@@ -44,8 +44,9 @@ using namespace toolkit;
 
 #define POWER_SPECTRUM(E)                                                                                            \
   int32_t qsRFPELTA_##E##PowerSpectrumH(handle<E> in, handle<magnitude_of<E>> out, handle<E> scratch, void **slot) { \
-    output<magnitude_of<E>> power(out);                                                                              \
-    return toolkit_call([&] { power_spectrum<E>(in, power, scratch, slot); }, power);                                \
+    return toolkit_call(                                                                                             \
+        [&](output<magnitude_of<E>> &power, transform_slot &kept) { power_spectrum<E>(in, power, scratch, kept); },  \
+        output<magnitude_of<E>>(out), transform_slot(slot));                                                         \
   }
 POWER_SPECTRUM(s)
 POWER_SPECTRUM(d)

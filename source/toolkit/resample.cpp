@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <cstring>
 #include <limits>
+
 #include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
 #include "toolkit/position.hpp"
@@ -57,19 +58,6 @@ class kept_state {
   void *memory_;
 };
 
-/// A result that a failure makes 0. A null address is allowed.
-class first_time {
- public:
-  explicit first_time(float *address) noexcept : address_(address) {}
-  void set(double time) noexcept {
-    if (address_) *address_ = static_cast<float>(time);
-  }
-  void clear() noexcept { set(0); }
-
- private:
-  float *address_;
-};
-
 /// The number of outputs whose samples are all there: the smallest n >= 0 with p + n ratio + reach >= available.
 std::int64_t output_count(position p, position ratio, position reach, std::int64_t available) noexcept {
   const wide_integer room = position::of_whole(available).units - p.units - reach.units;
@@ -90,18 +78,18 @@ stream_state checked_reset(const lumra_resampler_parameters &given) {
   return state;
 }
 
-void check_kept(const stream_state &state) {
+stream_state checked_kept(const stream_state &state) {
   require(state.ratio > 0 && state.ratio <= largest_ratio, bad_ratio);
   const auto is_fraction = [](double f) { return f >= 0 && f < 1; };
   require(state.delay_whole >= 0 && is_fraction(state.delay_fraction), negative_delay);
   require(is_fraction(state.fraction) && state.fraction == state.at().fraction(), negative_delay);
   require(state.consumed >= 0 && std::isfinite(state.consumed) && state.carried <= state.consumed, negative_delay);
+  return state;
 }
 
 /// One row of elements or several, under one interface.
 template <class E>
 struct single_channel {
-  static constexpr bool several = false;
   using in = input<E>;
   using out = output<E>;
   static matrix_view<const value_of<E>> view(const in &x) noexcept { return {x.values().data(), 1, x.count()}; }
@@ -125,11 +113,61 @@ struct several_channels {
   }
 };
 
+/// Whether a call begins a stream or continues the one in the state, and whether the filter is made wider where
+/// outputs are further apart than samples.
+enum class stream { begun, continued };
+enum class bandwidth { of_input, of_output };
+
 struct resampling_options {
   std::int32_t phases;
   const lumra_resampler_parameters *parameters;
-  bool reset, stretched;
+  stream which;
+  bandwidth kept;
 };
+
+template <class E, class Shape>
+struct resampling_inputs {
+  typename Shape::in x;
+  input<magnitude_of<E>> coefficients;
+};
+
+template <class E, class Shape>
+struct resampling_outputs {
+  typename Shape::out out, sample_history;
+  output<magnitude_of<E>> tap_history;
+  result<float, failed_result::zero> time;
+  kept_state state;
+
+  void clear() noexcept {
+    out.clear();
+    sample_history.clear();
+    tap_history.clear();
+    time.clear();
+    state.clear();
+  }
+};
+
+template <class E, class Shape>
+void check_arguments(const resampling_inputs<E, Shape> &in, const resampling_options &options,
+                     const resampling_outputs<E, Shape> &to) {
+  const auto &[x, coefficients] = in;
+  require(Shape::view(x).rows >= 1 && Shape::view(x).columns >= 1 && coefficients.count() >= 1, empty_input);
+  require(options.phases >= 1 && to.state.present() && (options.parameters || options.which == stream::continued),
+          bad_option);
+  refuse_sharing(to.sample_history, x, coefficients, to.out, to.tap_history);
+  refuse_sharing(to.tap_history, x, coefficients, to.out);
+}
+
+/// Both histories, sized for the widest filter, in silence. Returns the position of the first output.
+template <class E, class Shape>
+position begin_stream(const stream_state &state, double widest_reach, std::int32_t channels,
+                      resampling_outputs<E, Shape> &to) {
+  const std::int64_t length = 2 * static_cast<std::int64_t>(widest_reach) + 2;
+  const auto history = Shape::resize(to.sample_history, channels, length);
+  std::fill_n(history.data, history.size(), value_of<E>{});
+  to.tap_history.resize(length);
+  return position::of(state.delay_fraction) + position::of_whole(state.delay_whole);
+}
 
 /// Keeps the newest samples of every channel.
 template <class T>
@@ -143,60 +181,44 @@ void remember(const matrix_view<T> &history, const matrix_view<const T> &block) 
 }
 
 template <class E, class Shape>
-void resample(typename Shape::in x, input<magnitude_of<E>> coefficients, const resampling_options &options,
-              typename Shape::out &out, first_time &time, typename Shape::out &sample_history,
-              output<magnitude_of<E>> &tap_history, kept_state &kept) {
+void resample(resampling_inputs<E, Shape> in, const resampling_options &options, resampling_outputs<E, Shape> &to) {
   using real = real_of<E>;
   using value = value_of<E>;
-  require(Shape::view(x).rows >= 1 && Shape::view(x).columns >= 1 && coefficients.count() >= 1, empty_input);
-  require(options.phases >= 1 && kept.present() && (options.parameters || !options.reset), bad_option);
-  refuse_sharing(sample_history, x, coefficients, out, tap_history);
-  refuse_sharing(tap_history, x, coefficients, out);
-  coefficients.keep_apart_from(out);
-  x.keep_apart_from(out);
-  const std::int32_t rows = Shape::view(x).rows, n = Shape::view(x).columns;
+  check_arguments(in, options, to);
+  in.coefficients.copy_if_same(to.out);
+  in.x.copy_if_same(to.out);
+  const matrix_view<const value> block = Shape::view(in.x);
 
-  stream_state state = options.reset ? checked_reset(*options.parameters) : kept.load();
-  if (!options.reset) check_kept(state);
+  stream_state state =
+      options.which == stream::begun ? checked_reset(*options.parameters) : checked_kept(to.state.load());
   const auto phases = static_cast<double>(options.phases);
-  const prototype<real> widest{coefficients.values(), phases / std::max(state.ratio, 1.0)};
+  const prototype<real> widest{in.coefficients.values(), phases / std::max(state.ratio, 1.0)};
   require(widest.reach() < 0x1p30, no_memory);
-  const prototype<real> filter{widest.h, options.stretched ? widest.step : phases};
+  const prototype<real> filter{widest.h, options.kept == bandwidth::of_output ? widest.step : phases};
 
-  position p = state.at();
-  if (options.reset) {
-    const std::int64_t length = 2 * static_cast<std::int64_t>(widest.reach()) + 2;
-    const auto history = Shape::resize(sample_history, rows, length);
-    std::fill_n(history.data, history.size(), value{});
-    tap_history.resize(length);
-    p = position::of(state.delay_fraction) + position::of_whole(state.delay_whole);
-  }
-  const auto history = Shape::view(sample_history);
-  const auto most_taps = static_cast<std::int64_t>(tap_history.values().size());
-  resampler<E> engine(filter, state.interpolation == 1);
-  const position ratio = position::of(state.ratio);
-  const std::int64_t available = std::int64_t{state.carried} + n;
+  position p = options.which == stream::begun ? begin_stream(state, widest.reach(), block.rows, to) : state.at();
+  const matrix_view<value> history = Shape::view(to.sample_history);
+  const auto most_taps = static_cast<std::int64_t>(to.tap_history.values().size());
+  resampler<E> engine(filter, state.interpolation == 1 ? interpolation::nearest : interpolation::linear, most_taps);
   // No sample in front of the history may be asked for.
+  const std::int64_t oldest = std::int64_t{state.carried} - std::max(history.columns, 0);
   const filter_window nearest = engine.around(p);
-  require(nearest.count <= most_taps, history_too_short);
-  require(history.rows == rows && nearest.first - state.carried >= -std::int64_t{std::max(history.columns, 0)},
-          negative_delay);
+  require(history.rows == block.rows && nearest.first >= oldest, negative_delay);
 
+  const position ratio = position::of(state.ratio);
+  const std::int64_t available = std::int64_t{state.carried} + block.columns;
   const std::int64_t count = output_count(p, ratio, engine.reach(), available);
-  time.set(static_cast<double>(p.whole()) + p.fraction() - state.carried + state.consumed);
-  const auto result = Shape::resize(out, rows, count);
-  const auto block = Shape::view(x);
-  const auto channel_of = [&](std::int32_t r) {
-    return channel<value>{block.row(r), history.row(r) + history.columns, n};
-  };
-  engine.run(p, ratio, state.carried, count, most_taps, rows, channel_of, result.data);
+  const double time = static_cast<double>(p.whole()) + p.fraction() - state.carried + state.consumed;
+  to.time.set(static_cast<float>(time));
+  const matrix_view<value> result = Shape::resize(to.out, block.rows, count);
+  engine.run(p, ratio, {block, {history.data, history.rows, history.columns}, state.carried}, result);
   scale(static_cast<std::int32_t>(result.size()), static_cast<real>(filter.step), result.data);
 
-  remember<value>(history, block);
+  remember(history, block);
   state.carried = static_cast<std::int32_t>(available - p.whole());
   state.set(p);
-  state.consumed += n;
-  kept.store(state);
+  state.consumed += block.columns;
+  to.state.store(state);
 }
 
 }  // namespace
@@ -209,13 +231,15 @@ using namespace toolkit;
                                            const lumra_resampler_parameters *parameters, int32_t reset,                \
                                            int32_t bandwidthScaling, HANDLE<E> out, float *firstOutputTime,            \
                                            HANDLE<E> sampleHistory, handle<magnitude_of<E>> tapHistory, void *state) { \
-    SHAPE<E>::out result(out), samples(sampleHistory);                                                                 \
-    output<magnitude_of<E>> taps(tapHistory);                                                                          \
-    first_time time(firstOutputTime);                                                                                  \
-    kept_state kept(state);                                                                                            \
-    const resampling_options options{phases, parameters, reset != 0, bandwidthScaling != 0};                           \
-    return toolkit_call([&] { resample<E, SHAPE<E>>(in, coefficients, options, result, time, samples, taps, kept); },  \
-                        result, samples, taps, time, kept);                                                            \
+    using outputs = resampling_outputs<E, SHAPE<E>>;                                                                   \
+    const resampling_options options{phases, parameters, reset != 0 ? stream::begun : stream::continued,               \
+                                     bandwidthScaling != 0 ? bandwidth::of_output : bandwidth::of_input};              \
+    return toolkit_call(                                                                                               \
+        [&](outputs &to) {                                                                                             \
+          resample<E, SHAPE<E>>({in, coefficients}, options, to);                                                      \
+        },                                                                                                             \
+        outputs{SHAPE<E>::out(out), SHAPE<E>::out(sampleHistory), output<magnitude_of<E>>(tapHistory),                 \
+                result<float, failed_result::zero>(firstOutputTime), kept_state(state)});                              \
   }
 #define RESAMPLE_BOTH(E)                   \
   RESAMPLE(C2C, E, single_channel, handle) \

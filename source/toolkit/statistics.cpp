@@ -51,18 +51,7 @@ void root_mean_square(input<E> x, result<real_of<E>> &rms) {
   rms.set(static_cast<real_of<E>>(root / std::sqrt(static_cast<double>(n))));
 }
 
-/// A result that a failure makes 0. A null address is allowed.
-class iteration_count {
- public:
-  explicit iteration_count(std::int32_t *address) noexcept : address_(address) {}
-  void set(std::int32_t count) noexcept {
-    if (address_) *address_ = count;
-  }
-  void clear() noexcept { set(0); }
-
- private:
-  std::int32_t *address_;
-};
+using iteration_count = result<std::int32_t, failed_result::zero>;
 
 enum class fit_method : std::int32_t { least_squares = 0, least_absolute = 1, bisquare = 2 };
 
@@ -219,6 +208,13 @@ template <class E>
 struct fit_results {
   result<real_of<E>> slope, intercept, residue;
   iteration_count iterations;
+
+  void clear() noexcept {
+    slope.clear();
+    intercept.clear();
+    residue.clear();
+    iterations.clear();
+  }
 };
 
 template <class E>
@@ -278,10 +274,9 @@ void linear_fit(output<E> &record, const input<E> &x, const input<E> &w, const f
 
 using namespace toolkit;
 
-#define RMS(E)                                                         \
-  int32_t qsRFPELTA_##E##RMSH(handle<E> data, E::real *result) {       \
-    toolkit::result<E::real> rms(result);                              \
-    return toolkit_call([&] { root_mean_square<E>(data, rms); }, rms); \
+#define RMS(E)                                                                                                  \
+  int32_t qsRFPELTA_##E##RMSH(handle<E> data, E::real *value) {                                                 \
+    return toolkit_call([&](result<E::real> &rms) { root_mean_square<E>(data, rms); }, result<E::real>(value)); \
   }
 RMS(s)
 RMS(d)
@@ -289,16 +284,16 @@ RMS(c)
 RMS(z)
 #undef RMS
 
-#define LINEAR_FIT(E)                                                                                                \
-  int32_t qsRFPELTA_##E##LinearFitH(handle<E> y, handle<E> x, handle<E> weights, E::real *slope, E::real *intercept, \
-                                    E::real *residue, int32_t method, float tuning1, float tuning2,                  \
-                                    int32_t *iterations, handle<E> scratch) {                                        \
-    output<E> record(y);                                                                                             \
-    fit_results<E> out{result<E::real>(slope), result<E::real>(intercept), result<E::real>(residue),                 \
-                       iteration_count(iterations)};                                                                 \
-    const fit_options options{method, tuning1, tuning2};                                                             \
-    return toolkit_call([&] { linear_fit<E>(record, x, weights, options, out, scratch); }, record, out.slope,        \
-                        out.intercept, out.residue, out.iterations);                                                 \
+#define LINEAR_FIT(E)                                                                                                 \
+  int32_t qsRFPELTA_##E##LinearFitH(handle<E> y, handle<E> x, handle<E> weights, E::real *slope, E::real *intercept,  \
+                                    E::real *residue, int32_t method, float tuning1, float tuning2,                   \
+                                    int32_t *iterations, handle<E> scratch) {                                         \
+    const fit_options options{method, tuning1, tuning2};                                                              \
+    return toolkit_call([&](output<E> &record,                                                                        \
+                            fit_results<E> &fitted) { linear_fit<E>(record, x, weights, options, fitted, scratch); }, \
+                        output<E>(y),                                                                                 \
+                        fit_results<E>{result<E::real>(slope), result<E::real>(intercept), result<E::real>(residue),  \
+                                       iteration_count(iterations)});                                                 \
   }
 LINEAR_FIT(s)
 LINEAR_FIT(d)
