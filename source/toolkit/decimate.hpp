@@ -1,11 +1,15 @@
 // Decimation on plain memory. SPDX-License-Identifier: MIT
 #pragma once
 
+#include <array>
+#include <bit>
+#include <complex>
 #include <cstdint>
 #include <span>
 #include <type_traits>
 
 #include "toolkit/frame.hpp"
+#include "toolkit/lanes.hpp"
 
 namespace toolkit {
 
@@ -16,15 +20,15 @@ namespace detail {
 /// Sum of `factor` samples, over several lanes where that pays.
 template <class T>
 T block_sum(const T *x, std::int64_t factor) noexcept {
-  constexpr std::int64_t lanes = 32 / sizeof(T);
-  T sum[lanes] = {};
+  using real = decltype(std::real(T{}));
+  constexpr std::int64_t width = 32 / sizeof(T);
+  using parts = lanes<real, 32 / sizeof(real)>;
+  parts whole;
   std::int64_t i = 0;
-  for (; i + lanes <= factor; i += lanes)
-    for (std::int64_t l = 0; l < lanes; ++l) sum[l] += x[i + l];
-  for (std::int64_t half = lanes / 2; half > 0; half /= 2)
-    for (std::int64_t l = 0; l < half; ++l) sum[l] += sum[l + half];
-  for (; i < factor; ++i) sum[0] += x[i];
-  return sum[0];
+  for (; i + width <= factor; i += width) whole += parts::load(reinterpret_cast<const real *>(x + i));
+  T sum = folded(std::bit_cast<std::array<T, width>>(whole));
+  for (; i < factor; ++i) sum += x[i];
+  return sum;
 }
 
 /// Means of groups that are too short for lanes: four groups side by side hide the latency of the additions.

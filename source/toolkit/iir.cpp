@@ -2,8 +2,8 @@
 #include <lumra/toolkit.h>
 
 #include <algorithm>
+#include <array>
 #include <cstdint>
-#include <cstring>
 #include <optional>
 #include <span>
 #include <type_traits>
@@ -11,6 +11,7 @@
 
 #include "toolkit/arithmetic.hpp"
 #include "toolkit/frame.hpp"
+#include "toolkit/lanes.hpp"
 #include "toolkit/recursion.hpp"
 
 namespace toolkit {
@@ -23,27 +24,16 @@ namespace {
 /// result must not be written while a later one needs its sample. `before` holds earlier samples, newest first.
 template <int parts, class Real>
 void convolve_in_place(Real *x, std::int64_t n, std::span<const Real> b, const Real *before) noexcept {
-  // Results side by side in four registers of 16 bytes; a plain loop over them ends up vectorised over j.
-  using lane [[gnu::vector_size(16)]] = Real;
-  constexpr std::int64_t width = sizeof(lane) / sizeof(Real), lanes = 4 * width;
-  const auto load = [](const Real *from) {
-    lane v;
-    std::memcpy(&v, from, sizeof v);
-    return v;
-  };
+  constexpr std::int64_t width = 64 / sizeof(Real);
+  using results = lanes<Real, width>;  // a plain loop over them ends up vectorised over j
   const auto nb = static_cast<std::int64_t>(b.size());
   const std::int64_t first = std::min((nb - 1) * parts, n * parts);  // values from here on need no earlier samples
   std::int64_t i = n * parts;
-  for (; i - lanes >= first; i -= lanes) {
-    Real *const y = x + i - lanes;
-    lane sum[4];
-    for (int l = 0; l < 4; ++l) sum[l] = b[0] * load(y + l * width);
-    for (std::int64_t j = 1; j < nb; ++j) {
-      const Real coefficient = b[static_cast<std::size_t>(j)];
-      const Real *const past = y - j * parts;
-      for (int l = 0; l < 4; ++l) sum[l] += coefficient * load(past + l * width);
-    }
-    std::memcpy(y, sum, sizeof sum);
+  for (; i - width >= first; i -= width) {
+    Real *const y = x + i - width;
+    results sum = results::load(y) * b[0];
+    for (std::int64_t j = 1; j < nb; ++j) sum += results::load(y - j * parts) * b[static_cast<std::size_t>(j)];
+    sum.store(y);
   }
   while (--i >= 0) {
     Real sum = b[0] * x[i];
@@ -69,19 +59,21 @@ void recurse_any(Real *data, std::int64_t n, std::span<const Real> a, Real gain,
       const auto y = [&](std::int64_t j) {
         return j <= i ? data[(i - j) * parts + part] : state[(j - i - 1) * parts + part];
       };
-      Real sum[4] = {};
+      std::array<Real, 4> sum{};
       std::int64_t j = 2;
       if (i >= order) {
         const Real *past = data + i * parts + part;
         for (; j + 3 <= order; j += 4)
-          for (std::int64_t l = 0; l < 4; ++l) sum[l] += a[static_cast<std::size_t>(j + l)] * past[-(j + l) * parts];
+          for (std::int64_t l = 0; l < 4; ++l)
+            sum[static_cast<std::size_t>(l)] += a[static_cast<std::size_t>(j + l)] * past[-(j + l) * parts];
       } else {
         for (; j + 3 <= order; j += 4)
-          for (std::int64_t l = 0; l < 4; ++l) sum[l] += a[static_cast<std::size_t>(j + l)] * y(j + l);
+          for (std::int64_t l = 0; l < 4; ++l)
+            sum[static_cast<std::size_t>(l)] += a[static_cast<std::size_t>(j + l)] * y(j + l);
       }
-      for (std::int64_t l = 0; j <= order; ++j, ++l) sum[l] += a[static_cast<std::size_t>(j)] * y(j);
+      for (std::size_t l = 0; j <= order; ++j, ++l) sum[l] += a[static_cast<std::size_t>(j)] * y(j);
       Real &w = data[i * parts + part];
-      w = gain * ((w - ((sum[0] + sum[2]) + (sum[1] + sum[3]))) - a[1] * y(1));
+      w = gain * ((w - folded(sum)) - a[1] * y(1));
     }
   }
 }

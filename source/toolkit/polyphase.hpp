@@ -22,6 +22,7 @@ template <class Real>
 using tap_rows = qsrfhs::kernels::tap_rows<Real>;
 using tap_offsets = qsrfhs::kernels::tap_offsets;
 
+// An array and not lanes, which are slower here: most filters end in the middle of a group.
 template <class Real, class T>
 void polyphase(const tap_place<Real> *places, std::int64_t outputs, const tap_rows<Real> &rows, const T *x,
                T *out) noexcept {

@@ -15,10 +15,10 @@ namespace toolkit {
 /// Values that run side by side: one, or the two parts of a complex one, with the doubles and the integers that stand
 /// for them. The language's operators work on both. Masks are below 0 where they hold.
 template <int parts, class Real>
-struct lanes;
+struct sample;
 
 template <class Real>
-struct lanes<1, Real> {
+struct sample<1, Real> {
   using reals = Real;
   using doubles = double;
   using integers = std::conditional_t<sizeof(Real) == 4, std::int32_t, std::int64_t>;
@@ -41,8 +41,8 @@ struct lanes<1, Real> {
 };
 
 template <class Real>
-struct lanes<2, Real> {
-  using integer = typename lanes<1, Real>::integers;
+struct sample<2, Real> {
+  using integer = typename sample<1, Real>::integers;
   using reals [[gnu::vector_size(2 * sizeof(Real))]] = Real;
   using doubles [[gnu::vector_size(2 * sizeof(double))]] = double;
   using integers [[gnu::vector_size(2 * sizeof(Real))]] = integer;
@@ -68,12 +68,12 @@ struct lanes<2, Real> {
 /// the smallest number; double precision holds them and their products without coming near its own limits.
 template <int parts, class Real>
 struct subnormal {
-  using lane = lanes<parts, Real>;
+  using lane = sample<parts, Real>;
   using reals = typename lane::reals;
   using doubles = typename lane::doubles;
   using integers = typename lane::integers;
   using long_integers = typename lane::long_integers;
-  using integer = typename lanes<1, Real>::integers;
+  using integer = typename sample<1, Real>::integers;
 
   static constexpr integer magnitude = std::numeric_limits<integer>::max(), sign = std::numeric_limits<integer>::min();
   static constexpr int exponent = sizeof(Real) == 4 ? -149 : -1074;
@@ -140,7 +140,7 @@ class recursion {
     while (data < end) {
       const auto quiet = std::count(quiet_.begin(), quiet_.end(), order);
       if (quiet == 0) {
-        data = gain_ == 1 ? run_loud<true>(data, end) : run_loud<false>(data, end);
+        data = gain_ == 1 ? run_loud<gain_kind::one>(data, end) : run_loud<gain_kind::any>(data, end);
       } else {
         if (quiet == parts) data = run_quiet(data, end);
         if (data < end) data = step_apart(data);
@@ -149,7 +149,9 @@ class recursion {
   }
 
  private:
-  using lane = lanes<parts, Real>;
+  enum class gain_kind { one, any };  // a gain of 1 takes no multiplication
+
+  using lane = sample<parts, Real>;
   using reals = typename lane::reals;
   using doubles = typename lane::doubles;
   using one = subnormal<1, Real>;
@@ -166,10 +168,10 @@ class recursion {
     for (std::size_t j = order - 1; j > 0; --j) y[j] = y[j - 1];
     y[0] = newest;
   }
-  template <bool unit_gain, class T>
+  template <gain_kind gain, class T>
   [[nodiscard]] T next(T w, const std::array<T, order> &y) const noexcept {
     for (std::size_t j = order; j-- > 0;) w -= a_[j] * y[j];
-    return unit_gain ? w : gain_ * w;
+    return gain == gain_kind::one ? w : gain_ * w;
   }
   /// In steps of the smallest number: the output, not rounded, but for the newest output's share.
   template <class T>
@@ -184,12 +186,12 @@ class recursion {
   }
 
   /// Until a part is quiet.
-  template <bool unit_gain>
+  template <gain_kind gain>
   Real *run_loud(Real *data, Real *end) noexcept {
     auto y = y_;  // in registers
     auto quiet = quiet_;
     for (bool loud = true; data < end && loud; data += parts) {
-      const reals newest = next<unit_gain>(read(data), y);
+      const reals newest = next<gain>(read(data), y);
       shift(y, newest);
       std::memcpy(data, &newest, sizeof newest);
       if (!lane::any(all::is(newest))) {
@@ -242,7 +244,7 @@ class recursion {
           quiet_[part] = 0;
         }
       } else {
-        *data = gain_ == 1 ? next<true>(*data, y) : next<false>(*data, y);
+        *data = gain_ == 1 ? next<gain_kind::one>(*data, y) : next<gain_kind::any>(*data, y);
         quiet_[part] = is_small(*data) ? std::min(quiet_[part] + 1, order) : 0;
       }
       shift(y, *data);

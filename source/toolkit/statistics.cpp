@@ -9,18 +9,19 @@
 #include <span>
 
 #include "toolkit/frame.hpp"
+#include "toolkit/lanes.hpp"
 
 namespace toolkit {
 namespace {
 
-/// Sum of squares of real samples in four lanes of the type, folded as (0 + 2) + (1 + 3), the rest in order.
+/// Sum of squares of real samples in four lanes of the type, the rest in order.
 template <class Real>
 Real sum_of_squares(const Real *x, std::int64_t n) noexcept {
-  Real sum[4] = {};
+  using four = lanes<Real, 4>;
+  four sum;
   std::int64_t i = 0;
-  for (; i + 4 <= n; i += 4)
-    for (std::int64_t l = 0; l < 4; ++l) sum[l] += x[i + l] * x[i + l];
-  Real total = (sum[0] + sum[2]) + (sum[1] + sum[3]);
+  for (; i + 4 <= n; i += 4) sum += four::load(x + i) * four::load(x + i);
+  Real total = sum.folded();
   for (; i < n; ++i) total += x[i] * x[i];
   return total;
 }
@@ -28,16 +29,17 @@ Real sum_of_squares(const Real *x, std::int64_t n) noexcept {
 /// The same of real and imaginary parts, without an order to keep: blocks in the type, their sums in double.
 template <class Real>
 double sum_of_squares(const std::complex<Real> *x, std::int64_t n) noexcept {
-  constexpr std::int64_t lanes = 64 / sizeof(Real), block = 4096;
+  constexpr std::int64_t width = 64 / sizeof(Real), block = 4096;
+  using register_block = lanes<Real, width>;
   const auto *parts = reinterpret_cast<const Real *>(x);
   double total = 0;
   for (std::int64_t first = 0; first < 2 * n; first += block) {
     const std::int64_t end = std::min(first + block, 2 * n);
-    Real sum[lanes] = {};
+    register_block whole;
     std::int64_t i = first;
-    for (; i + lanes <= end; i += lanes)
-      for (std::int64_t l = 0; l < lanes; ++l) sum[l] += parts[i + l] * parts[i + l];
-    for (std::int64_t l = 0; i < end; ++i, ++l) sum[l] += parts[i] * parts[i];
+    for (; i + width <= end; i += width) whole += register_block::load(parts + i) * register_block::load(parts + i);
+    auto sum = whole.values();
+    for (std::size_t l = 0; i < end; ++i, ++l) sum[l] += parts[i] * parts[i];
     for (const Real lane : sum) total += static_cast<double>(lane);
   }
   return total;
