@@ -4,7 +4,7 @@
 #include <numbers>
 
 #include "host_arrays.hpp"
-#include "toolkit/families.hpp"
+#include "support/letters.hpp"
 
 namespace fuzz {
 namespace {

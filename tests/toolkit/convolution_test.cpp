@@ -3,7 +3,6 @@
 
 #include <algorithm>
 
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace {
@@ -78,33 +77,6 @@ TYPED_TEST(Convolution, AgreesWithTheDefinition) {
   }
 }
 
-TYPED_TEST(Convolution, ARecordWithItself) {
-  using E = TypeParam;
-  const auto x = noise<E>(100);
-  for (const int method : {0, 1}) {
-    array_of<E> ax = filled<E>(x), out, room;
-    ASSERT_EQ(0, family<E>::convolution(ax, ax, out, 0, method, 0, nullptr, room, &this->slot));
-    EXPECT_LT(error_in_epsilons<E>(values<E>(out), convolve(wide(x), wide(x))), bound(method, 100, 100));
-  }
-}
-
-TYPED_TEST(Convolution, TheOutputMayBeAnInput) {
-  using E = TypeParam;
-  const auto x = noise<E>(50, 1), y = noise<E>(30, 2);
-  for (const int method : {0, 1}) {
-    for (const int mode : {0, 1}) {
-      for (const bool second : {false, true}) {
-        array_of<E> ax = filled<E>(x), ay = filled<E>(y), scratch, room;
-        array_of<E> &out = second ? ay : ax;
-        ASSERT_EQ(0, family<E>::convolution(ax, ay, out, mode, method, 0, scratch, room, &this->slot));
-        const reference full = convolve(wide(x), wide(y));
-        const reference want = mode == 0 ? full : reference(full.begin() + 15, full.begin() + 65);
-        EXPECT_LT(error_in_epsilons<E>(values<E>(out), want), bound(method, 50, 30));
-      }
-    }
-  }
-}
-
 template <class Pair>
 class Correlation : public Convolution<typename Pair::lags> {};
 using pairs = testing::Types<correlation_pair<toolkit::s, toolkit::s>, correlation_pair<toolkit::d, toolkit::d>,
@@ -170,16 +142,6 @@ TYPED_TEST(Convolution, OfMatricesAgreesWithTheDefinition) {
       EXPECT_TRUE(scratch.elements().empty() && room.elements().empty());
     }
   }
-}
-
-TYPED_TEST(Convolution, OfMatricesRefusesWhatDoesNotFit) {
-  using E = TypeParam;
-  matrix_of<E> x(1 << 16, 1), y(1, 1 << 15), out(2, 3);
-  array_of<E> scratch, room;
-  // (2^16 - 1) rows and (2^15 - 1) columns take 16 and 15 bits: one too many, although the product fits.
-  EXPECT_EQ(-20001, family<E>::matrix_correlation(x, y, out, 0, scratch, room, &this->slot));
-  EXPECT_EQ(0, out.block()->rows);
-  EXPECT_EQ(0, out.block()->columns);
 }
 
 }  // namespace

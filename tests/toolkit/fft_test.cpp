@@ -2,7 +2,6 @@
 #include <algorithm>
 #include <numeric>
 
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace {

@@ -1,9 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include <algorithm>
 #include <array>
-#include <cstring>
 
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace {
@@ -84,14 +82,14 @@ TYPED_TEST(Matrix, ProductsAgreeWithTheDefinition) {
     ASSERT_EQ(0, partial_family<E>::multiply_vector(a, x, y));
     EXPECT_LT(error_in_epsilons<E>(values<E>(y), product(wide(left), wide(column), m, k, 1)), sum_bound(k));
     ASSERT_EQ(0, partial_family<E>::multiply(a, b, b));  // onto an input
-    EXPECT_EQ(0, std::memcmp(b.elements().data(), c.elements().data(), c.elements().size_bytes()));
+    EXPECT_TRUE(same_bytes(b.elements(), c.elements()));
   }
 }
 
-TYPED_TEST(Matrix, EmptyAndWrongSizes) {
+TYPED_TEST(Matrix, ProductsOfNothing) {
   using E = TypeParam;
   using P = partial_family<E>;
-  matrix_of<E> tall(2, 0), flat(0, 3), square(2, 2), other(3, 2), c(1, 1), null;
+  matrix_of<E> tall(2, 0), flat(0, 3), other(3, 2), c(1, 1);
   ASSERT_EQ(0, P::multiply(tall, flat, c));
   EXPECT_EQ(2, c.block()->rows);
   EXPECT_EQ(3, c.block()->columns);
@@ -100,30 +98,9 @@ TYPED_TEST(Matrix, EmptyAndWrongSizes) {
   ASSERT_EQ(0, P::multiply(flat, other, c));
   EXPECT_EQ(0, c.block()->rows);
   EXPECT_EQ(2, c.block()->columns);
-
-  matrix_of<E> negative(3, 2), long_column(1, 1), long_row(1, 1);  // refused before an element is read
-  negative.block()->rows = -3;
-  long_column.block()->rows = long_row.block()->columns = 1 << 16;
-  const auto expect_refusal = [](std::int32_t code, matrix_of<E> &a, matrix_of<E> &b) {
-    matrix_of<E> out(2, 2);
-    EXPECT_EQ(code, P::multiply(a, b, out));
-    EXPECT_EQ(0, out.block()->rows);
-    EXPECT_EQ(0, out.block()->columns);
-  };
-  expect_refusal(-20039, other, other);
-  expect_refusal(-20003, null, other);
-  expect_refusal(-20004, square, negative);
-  expect_refusal(-20001, long_column, long_row);
-  negative.block()->rows = 3;
-
-  array_of<E> none(0), two(2), y(7), null_vector;
+  array_of<E> none(0), y(7);
   EXPECT_EQ(0, P::multiply_vector(tall, none, y));
   EXPECT_EQ(0, y.block()->count);
-  EXPECT_EQ(-20039, P::multiply_vector(other, none, y));
-  EXPECT_EQ(-20003, P::multiply_vector(other, null_vector, y));
-  EXPECT_EQ(-20001, P::multiply_vector(other, two, nullptr));
-  two.block()->count = -2;
-  EXPECT_EQ(-20004, P::multiply_vector(other, two, y));
 }
 
 TYPED_TEST(Matrix, LeastSquaresAgreesWithNormalEquationsInDoublePrecision) {
@@ -170,33 +147,9 @@ TYPED_TEST(Matrix, LeastSquaresAgreesWithNormalEquationsInDoublePrecision) {
       ASSERT_EQ(0, this->solve(left, b, tolerance, x));
       EXPECT_LT(error_in_epsilons<E>(values<E>(x), want), p.bound);
       ASSERT_EQ(0, this->solve(left, b, tolerance, b));  // onto the right-hand side
-      EXPECT_EQ(0, std::memcmp(b.elements().data(), x.elements().data(), x.elements().size_bytes()));
+      EXPECT_TRUE(same_bytes(b.elements(), x.elements()));
     }
   }
-}
-
-TYPED_TEST(Matrix, LeastSquaresRefuses) {
-  using E = TypeParam;
-  constexpr float nan = std::numeric_limits<float>::quiet_NaN();
-  matrix_of<E> a = filled<E>(3, 2, noise<E>(6)), no_rows(0, 2), no_columns(2, 0), null;
-  array_of<E> b = filled<E>(noise<E>(3)), short_b(2), null_vector, x(1);
-  EXPECT_EQ(-20003, this->solve(no_rows, b, 0, x));
-  EXPECT_EQ(0, x.block()->count);
-  EXPECT_EQ(-20003, this->solve(no_columns, b, 0, x));
-  EXPECT_EQ(-20003, this->solve(null, b, 0, x));
-  EXPECT_EQ(-20003, this->solve(a, null_vector, 0, x));
-  EXPECT_EQ(-20002, this->solve(a, short_b, 0, x));
-  EXPECT_EQ(-20061, this->solve(a, b, nan, x));
-  EXPECT_EQ(-20061, partial_family<E>::least_squares(a, b, 0, x, this->first, this->first, this->third));
-  for (int missing = 0; missing < 3; ++missing) {
-    for (const float tolerance : {0.F, 1e-6F}) {
-      const auto scratch = [&](int i, array_of<E> &array) { return missing == i ? nullptr : array.handle(); };
-      EXPECT_EQ(-20999, partial_family<E>::least_squares(a, b, tolerance, x, scratch(0, this->first),
-                                                         scratch(1, this->second), scratch(2, this->third)));
-    }
-  }
-  values<E>(b)[1] = nan;
-  EXPECT_EQ(-20068, this->solve(a, b, 0, x));
 }
 
 }  // namespace

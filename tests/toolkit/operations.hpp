@@ -6,7 +6,6 @@
 #include <cstring>
 #include <tuple>
 
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace tests {
@@ -160,18 +159,12 @@ const std::vector<operation<E>> &operations() {
          &bytes_of<E, &A::matrix_out, &A::matrix_history, &A::tap_history, &A::time, &A::state>},
         {"recursive filter",
          [](A &a) {
-           const auto run = [&](bool reset, auto &...coefficient_scratch) {
-             return P::filter(a.x, a.poles, a.numbers, a.history, a.output_history, reset, coefficient_scratch...,
-                              a.scratch);
+           const auto run = [&](bool reset) {
+             return filter<E>(a.x, a.poles, a.numbers, a.history, a.output_history, reset, a.numbers_scratch,
+                              a.more_numbers, a.scratch);
            };
-           const auto run_letter = [&](bool reset) {
-             if constexpr (std::is_same_v<E, toolkit::z>)
-               return run(reset, a.numbers_scratch);
-             else
-               return run(reset, a.numbers_scratch, a.more_numbers);
-           };
-           const std::int32_t first = run_letter(true);
-           return first < 0 || a.once ? first : run_letter(false);
+           const std::int32_t first = run(true);
+           return first < 0 || a.once ? first : run(false);
          },
          &bytes_of<E, &A::x, &A::history, &A::output_history>},
     };

@@ -1,7 +1,4 @@
 // SPDX-License-Identifier: MIT
-#include <bit>
-
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace {
@@ -9,7 +6,7 @@ namespace {
 using namespace tests;
 
 template <class E>
-class Rms : public testing::Test {};
+using Rms = toolkit_test<E>;
 TYPED_TEST_SUITE(Rms, all_letters);
 
 TYPED_TEST(Rms, AgreesWithTheDefinition) {
@@ -28,27 +25,6 @@ TYPED_TEST(Rms, AgreesWithTheDefinition) {
     EXPECT_NEAR(1, static_cast<double>(got) / want, bound * static_cast<double>(std::numeric_limits<real>::epsilon()));
     EXPECT_EQ(0, family<E>::rms(in, nullptr));
   }
-  real result = 1;
-  array_of<E> none(std::size_t{0});
-  EXPECT_EQ(-20003, family<E>::rms(none, &result));
-  EXPECT_TRUE(std::isnan(result));
-}
-
-TEST(RmsOrder, FourLanesFoldedCrosswise) {
-  // Every other order of these gives other last bits.
-  std::vector<float> x(11);
-  for (std::size_t i = 0; i < x.size(); ++i) x[i] = 1.F / static_cast<float>(i + 3);
-  float lane[4] = {};
-  for (std::size_t i = 0; i < 8; ++i) lane[i % 4] += x[i] * x[i];
-  float sum = (lane[0] + lane[2]) + (lane[1] + lane[3]);
-  for (std::size_t i = 8; i < 11; ++i) sum += x[i] * x[i];
-  f32_array in{std::span<const float>(x)};
-  float got = 0;
-  ASSERT_EQ(0, qsRFPELTA_sRMSH(in, &got));
-  EXPECT_EQ(static_cast<float>(static_cast<double>(std::sqrt(sum)) / std::sqrt(11.0)), got);
-  f32_array none(std::size_t{0});
-  ASSERT_EQ(-20003, qsRFPELTA_sRMSH(none, &got));
-  EXPECT_EQ(0x7FC00000U, std::bit_cast<std::uint32_t>(got));
 }
 
 template <class E>
@@ -154,50 +130,6 @@ TYPED_TEST(LinearFit, RobustMethodsIgnoreGrossOutliers) {
       }
     }
   }
-}
-
-TYPED_TEST(LinearFit, RefusesInTheOrderOfTheChecks) {
-  using real = toolkit::real_of<TypeParam>;
-  constexpr real inf = std::numeric_limits<real>::infinity(), nan = std::numeric_limits<real>::quiet_NaN();
-  constexpr real most = std::numeric_limits<real>::max();
-  struct refusal {
-    const char *why;
-    std::int32_t code;
-    std::vector<real> x, y, w;
-    int method = 0;
-    bool scratch = true;
-  };
-  const refusal refusals[] = {
-      {"method 3", -20061, {}, {1}, {}, 3},
-      {"method -1", -20061, {}, {1}, {}, -1},
-      {"counts", -20002, {1, 2, 3}, {1, 2}, {}},
-      {"weights", -20002, {1}, {1}, {1, 2}},
-      {"no points", -20006, {}, {}, {}},
-      {"one point", -20006, {1}, {inf}, {}, 1},
-      {"x infinite", -20068, {1, inf}, {1, 2}, {-1, 0}},
-      {"y not a number", -20068, {1, 2}, {1, nan}, {}, 2},
-      {"largest", -20068, {1, 2}, {1, -most}, {}},
-      {"negative weight", -20061, {1, 2}, {1, 2}, {-1, nan}},
-      {"weight not finite", -20068, {1, 2}, {1, 2}, {inf, -1}},
-      {"weights zero", -20061, {1, 2}, {1, 2}, {0, 0}},
-      {"no scratch", -20999, {1, 2}, {1, 2}, {1, 2}, 0, false},
-      {"no scratch, method 1", -20999, {1, 2}, {1, 2}, {}, 1, false},
-      {"one x", -20006, {2, 2, 2}, {1, 2, 3}, {}},
-      {"one x that counts", -20006, {2, 2, 3}, {1, 2, 3}, {1, 2, 0}, 1},
-  };
-  for (const refusal &r : refusals) {
-    SCOPED_TRACE(r.why);
-    fitted_line<TypeParam> fit(r.x, r.y, r.w);
-    EXPECT_EQ(r.code, fit.run(r.method, 0, 0, r.scratch));
-    EXPECT_TRUE(fit.y.elements().empty());
-    EXPECT_TRUE(std::isnan(fit.slope) && std::isnan(fit.intercept) && std::isnan(fit.residue));
-    EXPECT_EQ(0, fit.iterations);
-  }
-  // Scratch that the method does not need would still be emptied.
-  auto x = filled<TypeParam>({1, 2}), y = filled<TypeParam>({3, 4});
-  EXPECT_EQ(-20061,
-            partial_family<TypeParam>::linear_fit(y, x, nullptr, nullptr, nullptr, nullptr, 0, 0, 0, nullptr, x));
-  EXPECT_TRUE(y.elements().empty());
 }
 
 }  // namespace

@@ -1,20 +1,17 @@
 // What the tests of the typed families share: one test body for all type letters. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <lumra/toolkit.h>
-
 #include <gtest/gtest.h>
 
-#include <cmath>
-#include <complex>
+#include <algorithm>
+#include <cstring>
 #include <limits>
-#include <numbers>
 #include <span>
-#include <type_traits>
 #include <vector>
 
+#include "support/letters.hpp"
+#include "support/reference.hpp"
 #include "support/test_array.hpp"
-#include "toolkit/element.hpp"
 
 namespace tests {
 
@@ -22,7 +19,6 @@ template <class E>
 using array_of = test_array<typename E::block>;
 template <class E>
 using matrix_of = test_array<typename E::matrix_block>;
-using reference = std::vector<std::complex<double>>;
 
 using all_letters = testing::Types<toolkit::s, toolkit::d, toolkit::c, toolkit::z>;
 
@@ -42,23 +38,9 @@ std::span<toolkit::value_of<E>> values(Array &array) {
   return {reinterpret_cast<toolkit::value_of<E> *>(elements.data()), elements.size()};
 }
 
-/// Reproducible values between -1 and 1, exact in single precision.
 template <class E>
 std::vector<toolkit::value_of<E>> noise(std::size_t n, std::uint32_t seed = 1) {
-  const auto next = [&seed] {
-    seed = seed * 1664525U + 1013904223U;
-    return static_cast<toolkit::real_of<E>>(static_cast<float>(seed >> 8) / 8388608.F - 1.F);
-  };
-  std::vector<toolkit::value_of<E>> out(n);
-  for (auto &v : out) {
-    if constexpr (toolkit::is_complex<E>) {
-      const auto re = next();
-      v = {re, next()};
-    } else {
-      v = next();
-    }
-  }
-  return out;
+  return noise_of<toolkit::value_of<E>>(n, seed);
 }
 
 template <class E>
@@ -75,41 +57,18 @@ matrix_of<E> filled(std::int32_t rows, std::int32_t columns, const std::vector<t
   return matrix_of<E>(rows, columns, elements_of<E>(from));
 }
 
-template <class Values>
-reference wide(const Values &from) {
-  return reference(from.begin(), from.end());
-}
-
-/// Relative error in the least-squares sense, in units of the type's epsilon.
+/// Relative error in units of the type's epsilon.
 template <class E, class Values>
 double error_in_epsilons(const Values &got, const reference &want) {
   EXPECT_EQ(want.size(), got.size());
-  double difference = 0, norm = 0;
-  for (std::size_t i = 0; i < want.size() && i < got.size(); ++i) {
-    difference += std::norm(std::complex<double>(got[i]) - want[i]);
-    norm += std::norm(want[i]);
-  }
-  if (!(difference > 0)) return difference;  // exact, or not a number
-  return std::sqrt(difference / norm) / static_cast<double>(std::numeric_limits<toolkit::real_of<E>>::epsilon());
+  if (want.size() != got.size() || want.empty() || wide(got) == want) return 0;
+  return relative_error(wide(got), want) / static_cast<double>(std::numeric_limits<toolkit::real_of<E>>::epsilon());
 }
 
-/// Growth of rounding errors: of transforms of n points, and of sums of n terms; a small constant for all types.
-inline double transform_bound(std::size_t n) {
-  return 2.0 * (1.0 + std::log2(static_cast<double>(n)));
-}
-inline double sum_bound(std::size_t n) {
-  return 1.0 + static_cast<double>(n);
-}
-
-/// The discrete Fourier transform by its definition.
-inline reference dft(const reference &x, int sign = -1) {
-  const std::size_t n = x.size();
-  reference roots(n), out(n);
-  for (std::size_t k = 0; k < n; ++k)
-    roots[k] = std::polar(1.0, sign * 2.0 * std::numbers::pi * static_cast<double>(k) / static_cast<double>(n));
-  for (std::size_t k = 0; k < n; ++k)
-    for (std::size_t i = 0; i < n; ++i) out[k] += x[i] * roots[k * i % n];
-  return out;
+/// Bit for bit.
+template <class Values, class Others>
+bool same_bytes(const Values &got, const Others &want) {
+  return got.size() == want.size() && (got.empty() || std::memcmp(got.data(), want.data(), got.size_bytes()) == 0);
 }
 
 }  // namespace tests

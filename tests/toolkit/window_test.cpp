@@ -1,5 +1,4 @@
 // SPDX-License-Identifier: MIT
-#include "toolkit/families.hpp"
 #include "toolkit/toolkit_test.hpp"
 
 namespace {

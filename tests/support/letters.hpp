@@ -53,6 +53,18 @@ PARTIAL_FAMILY(z, zd)
 #undef SINGLE_FAMILY
 #undef REAL_FAMILY
 
+/// A recursive filter; for z one array is the workspace of all coefficients, and more_numbers is not looked at.
+template <class E, class F = toolkit::magnitude_of<E>, class More>
+std::int32_t filter(toolkit::handle<E> data, toolkit::handle<F> reverse, toolkit::handle<F> forward,
+                    toolkit::handle<E> forward_state, toolkit::handle<E> reverse_state, std::int32_t reset,
+                    toolkit::handle<F> numbers, More &&more_numbers, toolkit::handle<E> inputs) {
+  constexpr auto run = partial_family<E>::filter;
+  if constexpr (std::is_same_v<E, toolkit::z>)
+    return run(data, reverse, forward, forward_state, reverse_state, reset, numbers, inputs);
+  else
+    return run(data, reverse, forward, forward_state, reverse_state, reset, numbers, more_numbers, inputs);
+}
+
 /// The two records of a correlation, and its export.
 template <class First, class Second>
 struct correlation_pair;
