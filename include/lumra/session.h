@@ -29,7 +29,7 @@ enum lumra_window {
 /* A complex baseband record. */
 typedef struct lumra_waveform {
   double t0;          /* start time in seconds; not used */
-  double dt;          /* sample interval in seconds */
+  double dt;          /* sample interval in seconds; not checked: 0 makes f0 and df infinite */
   lumra_cf32_array y; /* samples; the count is read as unsigned */
 } lumra_waveform;
 

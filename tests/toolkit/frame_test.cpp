@@ -394,24 +394,19 @@ TEST(TransformSlot, TellsScalingDomainAndPrecisionAtOneLength) {
   const auto run = [&]<class E>(E, bool inverse) {
     array_of<E> x = filled<E>(noise<E>(n)), back;
     array_of<toolkit::complex_of<E>> bins;
-    if (!inverse) {
-      ASSERT_EQ(0, family<E>::fft(x, bins, 0, 0, nullptr, &slot));
-      EXPECT_LT(error_in_epsilons<E>(values<toolkit::complex_of<E>>(bins), dft(wide(noise<E>(n)))), transform_bound(n));
-      return;
-    }
     void *other = nullptr;
-    ASSERT_EQ(0, family<E>::fft(x, bins, 0, 0, nullptr, &other));
+    ASSERT_EQ(0, family<E>::fft(x, bins, 0, 0, nullptr, inverse ? &other : &slot));
     qsHost_ReleaseTransform(&other);
+    EXPECT_LT(error_in_epsilons<E>(values<toolkit::complex_of<E>>(bins), dft(wide(noise<E>(n)))), transform_bound(n));
+    if (!inverse) return;
     ASSERT_EQ(0, family<E>::inverse_fft(bins, back, 0, nullptr, &slot));
     EXPECT_LT(error_in_epsilons<E>(values<E>(back), wide(noise<E>(n))), 2 * transform_bound(n));
   };
-  for (int round = 0; round < 2; ++round) {
-    for (const bool inverse : {false, true, false}) {
-      run(toolkit::s{}, inverse);
-      run(toolkit::c{}, inverse);
-      run(toolkit::z{}, !inverse);
-      run(toolkit::d{}, inverse);
-    }
+  for (const bool inverse : {false, true, false}) {
+    run(toolkit::s{}, inverse);
+    run(toolkit::c{}, inverse);
+    run(toolkit::z{}, inverse);
+    run(toolkit::d{}, inverse);
   }
   EXPECT_EQ(0, qsHost_ReleaseTransform(&slot));
   EXPECT_EQ(nullptr, slot);

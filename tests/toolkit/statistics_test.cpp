@@ -89,14 +89,6 @@ TYPED_TEST(LinearFit, LeastSquaresWeightedAndNot) {
   }
 }
 
-TYPED_TEST(LinearFit, TwoPointsGiveTheirLine) {
-  fitted_line<TypeParam> fit({1, 3}, {5, -1});
-  ASSERT_EQ(0, fit.run(0));
-  EXPECT_EQ(-3, fit.slope);
-  EXPECT_EQ(8, fit.intercept);
-  EXPECT_EQ(0, fit.residue);
-}
-
 TYPED_TEST(LinearFit, RobustMethodsIgnoreGrossOutliers) {
   using real = toolkit::real_of<TypeParam>;
   for (const int method : {1, 2}) {
