@@ -2,8 +2,6 @@
 #include "platform/process.hpp"
 
 #include <dlfcn.h>
-#include <sys/syscall.h>
-#include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
@@ -18,11 +16,6 @@ void pin_library(void *address) noexcept {
   Dl_info info{};
   if (dladdr(address, &info) != 0 && info.dli_fname)
     (void)dlopen(info.dli_fname, RTLD_LAZY | RTLD_NOLOAD | RTLD_NODELETE);
-}
-
-std::uint32_t thread_id() noexcept {
-  // Asked each time: a thread that remembered its number would take it into the child of a fork.
-  return static_cast<std::uint32_t>(syscall(SYS_gettid));
 }
 
 bool is_readable(const void *begin, std::size_t bytes) noexcept {

@@ -1,4 +1,4 @@
-// The process we are loaded into: symbols, threads, memory, environment. SPDX-License-Identifier: MIT
+// The process we are loaded into: symbols, memory, environment. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstddef>
@@ -11,8 +11,6 @@ void *find_symbol(const char *name) noexcept;
 
 /// Keeps the library that holds `address` mapped until the process ends.
 void pin_library(void *address) noexcept;
-
-std::uint32_t thread_id() noexcept;
 
 /// True when every byte of the range is mapped and readable. Slow: it reads the process's memory map.
 bool is_readable(const void *begin, std::size_t bytes) noexcept;

@@ -3,6 +3,8 @@
 
 #include <utility>
 
+#include "qsrfhs/math/mkl_status.hpp"
+
 namespace dsp {
 namespace {
 
@@ -18,30 +20,42 @@ dfti_failure::dfti_failure(dfti_step step, MKL_LONG status) noexcept
       step_(step),
       status_(status) {}
 
+std::optional<dfti_failure> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
+                                            const qsrfhs::mkl_memory::watch &watched) noexcept {
+  std::optional<dfti_failure> failure;
+  const auto passes = [&failure](dfti_step step, MKL_LONG status) {
+    if (qsrfhs::failed(status)) failure.emplace(step, status);
+    return !failure;
+  };
+  const auto create = [&] {
+    auto lengths = settings.lengths;
+    if (lengths[1] == 0) return DftiCreateDescriptor(&made, settings.precision, settings.domain, 1, lengths[0]);
+    return DftiCreateDescriptor(&made, settings.precision, settings.domain, 2, lengths);
+  };
+  const auto scaled = [&](DFTI_CONFIG_PARAM direction, double scale) {
+    return scale == 1 || passes(dfti_step::scale, DftiSetValue(made, direction, scale));
+  };
+  (void)(passes(dfti_step::create, watched.status(create())) &&
+         passes(dfti_step::placement,
+                DftiSetValue(made, DFTI_PLACEMENT, settings.in_place ? DFTI_INPLACE : DFTI_NOT_INPLACE)) &&
+         (settings.domain != DFTI_REAL ||
+          passes(dfti_step::storage, DftiSetValue(made, DFTI_CONJUGATE_EVEN_STORAGE, DFTI_COMPLEX_COMPLEX))) &&
+         scaled(DFTI_FORWARD_SCALE, settings.forward_scale) && scaled(DFTI_BACKWARD_SCALE, settings.backward_scale) &&
+         passes(dfti_step::commit, watched.status(DftiCommitDescriptor(made))));
+  return failure;
+}
+
 void dfti_descriptor::fail_unless_no_error(MKL_LONG status, dfti_step step) {
-  if (!DftiErrorClass(status, DFTI_NO_ERROR)) throw dfti_failure(step, status);
+  if (qsrfhs::failed(status)) throw dfti_failure(step, status);
 }
 
 dfti_descriptor::dfti_descriptor(const dfti_settings &settings) {
   const qsrfhs::mkl_section section;
   const qsrfhs::mkl_memory::descriptor_watch watched;
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
-  auto lengths = settings.lengths;
-  const MKL_LONG created =
-      settings.lengths[1] == 0
-          ? DftiCreateDescriptor(&handle, settings.precision, settings.domain, 1, settings.lengths[0])
-          : DftiCreateDescriptor(&handle, settings.precision, settings.domain, 2, lengths);
+  const auto failure = make_descriptor(handle, settings, watched);
   owned made(handle);
-  check(watched.status(created), dfti_step::create);
-  check(DftiSetValue(handle, DFTI_PLACEMENT, settings.in_place ? DFTI_INPLACE : DFTI_NOT_INPLACE),
-        dfti_step::placement);
-  if (settings.domain == DFTI_REAL)
-    check(DftiSetValue(handle, DFTI_CONJUGATE_EVEN_STORAGE, DFTI_COMPLEX_COMPLEX), dfti_step::storage);
-  if (settings.forward_scale != 1)
-    check(DftiSetValue(handle, DFTI_FORWARD_SCALE, settings.forward_scale), dfti_step::scale);
-  if (settings.backward_scale != 1)
-    check(DftiSetValue(handle, DFTI_BACKWARD_SCALE, settings.backward_scale), dfti_step::scale);
-  check(watched.status(DftiCommitDescriptor(handle)), dfti_step::commit);
+  if (failure) throw dfti_failure(*failure);
   handle_ = std::move(made);
 }
 

@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdint>
 #include <memory>
+#include <optional>
 
 #include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_section.hpp"
@@ -40,6 +41,11 @@ struct dfti_settings {
   friend bool operator==(const dfti_settings &, const dfti_settings &) = default;
 };
 
+/// Creates, sets up and commits a descriptor, inside of an mkl_section. The step that failed, if any: what was created
+/// so far is the caller's to free while `watched` lasts.
+std::optional<dfti_failure> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
+                                            const qsrfhs::mkl_memory::watch &watched) noexcept;
+
 /// A committed descriptor, or none. All throw dfti_failure.
 class dfti_descriptor {
  public:
@@ -60,6 +66,11 @@ class dfti_descriptor {
   // In place, and from one memory to another, as the settings say.
   void forward(void *data) const {
     compute([&] { return DftiComputeForward(handle_.get(), data); }, dfti_step::forward);
+  }
+  /// For callers with a section around many transforms: entering another one takes as long as some of the shortest.
+  void forward(void *data, const qsrfhs::mkl_section & /*around*/) const {
+    check(qsrfhs::mkl_memory::watched_status([&] { return DftiComputeForward(handle_.get(), data); }),
+          dfti_step::forward);
   }
   void backward(void *data) const {
     compute([&] { return DftiComputeBackward(handle_.get(), data); }, dfti_step::backward);

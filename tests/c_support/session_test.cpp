@@ -37,7 +37,7 @@ TEST(Sessions, HandlesAreNeverReused) {
 TEST(Log, KeepsTheNewest10001Entries) {
   const open_session session;
   auto &log = SessionManager::instance().get(session)->log;
-  for (int i = 1; i <= 10005; ++i) log.add({i, "file", "text", 5, 0});
+  for (int i = 1; i <= 10005; ++i) log.add({i, "file", "text"});
   EXPECT_EQ("file:5 text", session.read_log());
 }
 
@@ -46,7 +46,7 @@ TEST(Log, ReadsIntoAnyBuffer) {
   auto &log = SessionManager::instance().get(session)->log;
   const std::string whole = "file:-12 a message";
   for (std::uint64_t size = 0; size <= whole.size() + 2; ++size) {
-    log.add({-12, "file", "a message", 4, 0});
+    log.add({-12, "file", "a message"});
     char buffer[64];
     std::fill(std::begin(buffer), std::end(buffer), '~');
     ASSERT_EQ(0, qsLumraAlgo_ReadLog(session, -0.0, buffer, size));
@@ -58,7 +58,7 @@ TEST(Log, ReadsIntoAnyBuffer) {
 TEST(Log, RefusesInOrderAndLeavesTheQueue) {
   const open_session session;
   char buffer[64];
-  SessionManager::instance().get(session)->log.add({1, "f", "m", 5, 0});
+  SessionManager::instance().get(session)->log.add({1, "f", "m"});
   EXPECT_EQ(-380123, qsLumraAlgo_ReadLog(0, 0.5, nullptr, 1));
   EXPECT_EQ(-380121, qsLumraAlgo_ReadLog(0, 0.5, buffer, 1));
   for (const double timeout : {0.5, -1.0, std::numeric_limits<double>::quiet_NaN()})

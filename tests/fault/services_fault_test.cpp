@@ -18,7 +18,7 @@ using codes = std::vector<std::int32_t>;
 
 TEST(ServicesFaults, TransformsThatCannotBeSetUpAreNamed) {
   const nothing_left in_the_end(transforms);
-  const codes expected[] = {{-50397485, -50397506, -50397513}, {-50397485, -50397494, -50397499, -50397513}};
+  const codes expected[] = {{-50397485, -50397506, -50397513}, {-50397485, -50397499, -50397494, -50397513}};
   for (const std::uint32_t inverse : {0U, 1U}) {
     lumra_resampler_descriptor *out = nullptr;
     for (std::size_t n = 0; n < expected[inverse].size(); ++n) {
@@ -38,11 +38,11 @@ TEST(ServicesFaults, TransformsThatCannotBeSetUpAreNamed) {
   const std::int32_t again[] = {-50397466, -50397473, -50397485};
   for (int n = 1; n <= 3; ++n) {
     lumra_resampler_descriptor descriptor{};
-    ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, false));
+    ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, qsrfhs::direction::forward));
     const recorded list;
     {
       const fail_at armed(transforms, n);
-      EXPECT_EQ(again[n - 1], qsrfhs::prepare(descriptor, 48, false));
+      EXPECT_EQ(again[n - 1], qsrfhs::prepare(descriptor, 48, qsrfhs::direction::forward));
     }
     EXPECT_EQ(nullptr, descriptor.transform);
     EXPECT_EQ(again[n - 1], list.codes().front());
@@ -60,8 +60,8 @@ TEST(ServicesFaults, ABlockGoesOnWithoutItsTransforms) {
   const std::int32_t expected[4][2] = {{-50397466, -50397767}, {-50397767, 0}, {-50397466, -50397840}, {-50397840, 0}};
   for (int n = 1; n <= 4; ++n) {
     // A transform that could not even be asked for its length is gone: whole again first.
-    ASSERT_EQ(0, qsrfhs::prepare(*forward, 32, false));
-    ASSERT_EQ(0, qsrfhs::prepare(*inverse, 16, true));
+    ASSERT_EQ(0, qsrfhs::prepare(*forward, 32, qsrfhs::direction::forward));
+    ASSERT_EQ(0, qsrfhs::prepare(*inverse, 16, qsrfhs::direction::inverse));
     qsrfhs::resampler_channel channel{16, 16, w.data(), out, 0, 0, 0, 0};
     const recorded list;
     {

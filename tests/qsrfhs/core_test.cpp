@@ -1,4 +1,4 @@
-// Transform pool, filter, worker pool. SPDX-License-Identifier: MIT
+// Transform pool, worker pool. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -6,15 +6,13 @@
 #include <filesystem>
 #include <latch>
 #include <memory>
-#include <numeric>
 #include <string_view>
 #include <thread>
 #include <vector>
 
 #include "platform/process.hpp"
+#include "qsrfhs/math/exceptions.hpp"
 #include "qsrfhs/math/fft.hpp"
-#include "qsrfhs/math/filter.hpp"
-#include "qsrfhs/math/mkl_status.hpp"
 #include "qsrfhs/util/thread_pool.hpp"
 
 namespace {
@@ -49,54 +47,7 @@ TEST(FftPool, KeepsWhatItHasASlotFor) {
     EXPECT_EQ(0, pool.idle_count());
   }
   EXPECT_EQ(0, pool.idle_count());
-}
-
-TEST(FftPool, ARefusedLengthLeavesNothingBehind) {
-  qsrfhs::fft_pool pool;
-  pool.set_reserve_slots(1);
-  for (int i = 0; i < 3; ++i) {
-    EXPECT_THROW(pool.prefill(qsrfhs::max_fft_length + 1), qsrfhs::invalid_argument);
-    EXPECT_THROW((void)pool.acquire(qsrfhs::max_fft_length + 1), qsrfhs::invalid_argument);
-  }
-  EXPECT_EQ(0, pool.idle_count());
-}
-
-TEST(FftPoolConcurrency, LendsATransformToOneThreadAtATime) {
-  qsrfhs::fft_pool pool;
-  pool.set_reserve_slots(1);
-  std::vector<std::jthread> threads;
-  for (int t = 0; t < 4; ++t)
-    threads.emplace_back([&] {
-      for (int i = 0; i < 200; ++i) {
-        const auto lease = pool.acquire(16);
-        std::vector<std::complex<float>> data(16, 1.F);
-        const qsrfhs::mkl_section section;
-        lease->forward(data.data());
-        EXPECT_EQ(16.F, data[0].real());
-        if (i % 50 == 0) pool.clear();
-      }
-    });
-}
-
-TEST(MklStatus, OnlyFailuresThrow) {
-  EXPECT_NO_THROW(qsrfhs::throw_if_failed(0, {"f", 1}));
-  try {
-    qsrfhs::throw_if_failed(DFTI_MEMORY_ERROR, {"f", 1});
-    FAIL();
-  } catch (const qsrfhs::mkl_error &e) {
-    EXPECT_STREQ(DftiErrorMessage(DFTI_MEMORY_ERROR), e.what());
-    EXPECT_EQ(DFTI_MEMORY_ERROR, e.status);
-    EXPECT_EQ(-312499, e.code);
-  }
-}
-
-TEST(Filter, CapacityIsWholeLanesOnAlignedStorage) {
-  for (const std::uint64_t n : {0U, 1U, 5U, 8U, 9U}) {
-    const qsrfhs::Filter filter(n);
-    EXPECT_EQ(n, filter.length());
-    EXPECT_EQ((n + 7) / 8 * 8, filter.capacity());
-    EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(filter.coefficients().data()) % 32);
-  }
+  EXPECT_THROW((void)pool.acquire(qsrfhs::max_fft_length + 1), qsrfhs::invalid_argument);
 }
 
 TEST(ThreadPoolConcurrency, RunsWhatIsQueuedBeforeItEnds) {

@@ -19,6 +19,7 @@
 
 namespace {
 
+using qsrfhs::direction;
 using std::numbers::pi;
 using sample = std::complex<float>;
 using exact = std::complex<double>;
@@ -231,9 +232,9 @@ TEST(ResamplerDescriptors, TheOneLentLastIsLentFirst) {
 
 TEST(ResamplerDescriptors, PrepareKeepsATransformOfTheLength) {
   lumra_resampler_descriptor descriptor{};
-  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, true));
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, direction::inverse));
   const void *const inverse = descriptor.transform;
-  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, false));
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, direction::forward));
   EXPECT_EQ(inverse, descriptor.transform);
   MKL_LONG placement = 0;
   float scale = 0;
@@ -242,11 +243,11 @@ TEST(ResamplerDescriptors, PrepareKeepsATransformOfTheLength) {
   EXPECT_EQ(0, DftiGetValue(transform(), DFTI_BACKWARD_SCALE, &scale));
   EXPECT_EQ(DFTI_INPLACE, placement);
   EXPECT_EQ(1.F / 64, scale);
-  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, false));
+  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, direction::forward));
   EXPECT_EQ(0, DftiGetValue(transform(), DFTI_PLACEMENT, &placement));
   EXPECT_EQ(DFTI_NOT_INPLACE, placement);
   const tests::recorded list;
-  EXPECT_EQ(-50397485, qsrfhs::prepare(descriptor, 0, false));
+  EXPECT_EQ(-50397485, qsrfhs::prepare(descriptor, 0, direction::forward));
   EXPECT_EQ(nullptr, descriptor.transform);
   qsrfhs::release(descriptor);
   EXPECT_EQ(-50397566, descriptor.status);

@@ -67,11 +67,11 @@ void LumraAlgoSession::after_fork_in_child() noexcept {
   window_mutex_.unlock();
 }
 
-LumraAlgoSession::window LumraAlgoSession::find_window(window_key key, bool *known) const {
+std::optional<LumraAlgoSession::window> LumraAlgoSession::find_window(window_key key) const {
   const std::lock_guard lock(window_mutex_);
   const auto found = windows_.find(key);
-  if (known) *known = found != windows_.end();
-  return found == windows_.end() ? nullptr : found->second;
+  if (found == windows_.end()) return std::nullopt;
+  return found->second;
 }
 
 void LumraAlgoSession::set_window(window_key key, window coefficients) {

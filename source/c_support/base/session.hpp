@@ -7,6 +7,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <utility>
 
 #include "c_support/base/boundary.hpp"
@@ -28,8 +29,8 @@ class LumraAlgoSession {
   LumraAlgoSession &operator=(const LumraAlgoSession &) = delete;
   ~LumraAlgoSession();
 
-  /// The cached window, or null for none; `known` tells a cached null from a missing entry.
-  [[nodiscard]] window find_window(window_key key, bool *known = nullptr) const;
+  /// What is cached, if anything.
+  [[nodiscard]] std::optional<window> find_window(window_key key) const;
   /// Caches a window; null stands for a type without coefficients. Replaces what another thread cached meanwhile.
   void set_window(window_key key, window coefficients);
   void clear_windows();

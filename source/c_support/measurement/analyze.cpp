@@ -25,7 +25,6 @@ constexpr catch_positions windowed_fft_positions{{analyze_source, 236}, {analyze
 constexpr qsrfhs::source_position window_length_position{analyze_source, 96};
 
 constexpr std::int32_t min_fft_size = 16;
-constexpr std::int32_t fft_size_unsupported = -312432;
 
 using sample = std::complex<float>;
 
@@ -35,9 +34,9 @@ LumraAlgoSession::window make_window(std::uint32_t type, std::int32_t size) {
   if (type != LUMRA_WINDOW_NONE && type != LUMRA_WINDOW_FLAT_TOP) return nullptr;
   const auto n = static_cast<std::uint64_t>(size);
   // No transform of such a length could use it.
-  if (n > qsrfhs::max_fft_length) throw qsrfhs::invalid_argument(window_length_position, fft_size_unsupported);
-  const auto window =
-      type == LUMRA_WINDOW_FLAT_TOP ? std::make_shared<qsrfhs::Filter>(n) : std::make_shared<qsrfhs::Filter>(n, 1.0F);
+  if (n > qsrfhs::max_fft_length) throw qsrfhs::invalid_argument(window_length_position);
+  const auto window = std::make_shared<qsrfhs::Filter>(type == LUMRA_WINDOW_FLAT_TOP ? qsrfhs::Filter::flat_top(n)
+                                                                                     : qsrfhs::Filter(n, 1.0F));
   const std::span<float> coefficients = window->coefficients();
   for (std::size_t k = 1; k < coefficients.size(); k += 2) coefficients[k] = -coefficients[k];
   return window;
@@ -54,7 +53,7 @@ std::span<const sample> samples_of(const lumra_waveform &record) noexcept {
   return {first, count};
 }
 
-/// Sum over all whole segments of the power of their transforms; the number of segments.
+/// Sums over all whole segments the power of their transforms, and returns the number of segments.
 std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, const qsrfhs::Filter *window,
                            qsrfhs::fft_transform &transform, std::span<sample> work, float *power) {
   const auto &kernels = qsrfhs::kernels::active();
@@ -64,14 +63,14 @@ std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, cons
   const auto *x = reinterpret_cast<const float *>(input.data());
   auto *buffer = reinterpret_cast<float *>(work.data());
 
-  // One for all segments: entering it for each would take as long as the shortest transforms.
+  // The section spans all segments: entering it for each would take as long as the shortest transforms.
   qsrfhs::mkl_section section;
   if (w)
     kernels.apply_window(x, w, buffer, n);
   else
     kernels.copy(x, buffer, n);
   for (std::uint64_t segment = 1; segment < segments; ++segment) {
-    transform.forward(work.data());
+    transform.forward(work.data(), section);
     section.let_forks_pass();
     const float *next = x + 2 * segment * step;
     if (w) {
@@ -83,7 +82,7 @@ std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, cons
       kernels.copy(next, buffer, n);
     }
   }
-  transform.forward(work.data());
+  transform.forward(work.data(), section);
   kernels.accumulate_power(buffer, power, n);
   kernels.order_power(power, n);
   return segments;
@@ -105,7 +104,7 @@ std::int32_t windowed_fft(LumraAlgoSession &session, std::int32_t window_type, s
   const qsrfhs::aligned_buffer<float> power(n);
   std::fill_n(power.data(), n, 0.0F);
   const qsrfhs::fft_lease transform = session.context.transforms.acquire(n);
-  const LumraAlgoSession::window window = session.find_window({fft_size, window_type});
+  const LumraAlgoSession::window window = session.find_window({fft_size, window_type}).value_or(nullptr);
 
   const std::uint64_t segments = sum_segments(input, step, window.get(), *transform, work.elements(), power.data());
   if (segments > 1)
@@ -133,9 +132,7 @@ int32_t qsLumraAlgo_InitializeWindow(uint64_t session, uint32_t windowType, int3
   if (fftSize < min_fft_size) return LUMRA_FFT_SIZE_TOO_SMALL;
   return with_session(session, initialize_window_positions, [&](LumraAlgoSession &found) {
     const LumraAlgoSession::window_key key{fftSize, static_cast<std::int32_t>(windowType)};
-    bool known = false;
-    (void)found.find_window(key, &known);
-    if (!known) found.set_window(key, make_window(windowType, fftSize));
+    if (!found.find_window(key)) found.set_window(key, make_window(windowType, fftSize));
     return LUMRA_SUCCESS;
   });
 }

@@ -16,12 +16,10 @@ struct source_position {
 
 class error : public std::exception {
  public:
-  error(source_position at, std::int32_t status_code) noexcept : line(at.line), file(at.file), code(status_code) {}
+  explicit error(source_position at) noexcept : position(at) {}
   [[nodiscard]] const char *what() const noexcept override { return "Unknown exception"; }
 
-  std::int32_t line;
-  const char *file;
-  std::int32_t code;  // session-interface code that describes the failure
+  source_position position;
 };
 
 /// An argument that the core cannot serve.
@@ -33,12 +31,10 @@ class invalid_argument : public error {
 /// An MKL call failed.
 class mkl_error : public error {
  public:
-  mkl_error(source_position at, std::int32_t status_code, std::int32_t mkl_status, std::string mkl_message)
-      : error(at, status_code), status(mkl_status), message(std::move(mkl_message)) {}
+  mkl_error(source_position at, std::string mkl_message) : error(at), message(std::move(mkl_message)) {}
   [[nodiscard]] const char *what() const noexcept override { return message.c_str(); }
 
-  std::int32_t status;
-  std::string message;  // MKL's own text for the status
+  std::string message;  // MKL's own text for its status
 };
 
 }  // namespace qsrfhs

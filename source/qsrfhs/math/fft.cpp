@@ -3,54 +3,49 @@
 
 #include <algorithm>
 
-#include "qsrfhs/math/mkl_memory.hpp"
-#include "qsrfhs/math/mkl_status.hpp"
+#include "qsrfhs/math/exceptions.hpp"
 
 namespace qsrfhs {
 namespace {
 
 constexpr const char *fft_source = R"(.\source\qsrfhs\math\fft)";
 
-// What the log says of a failure here; data of the interface.
-constexpr source_position copy_position{fft_source, 31};
-constexpr source_position commit_copy_position{fft_source, 32};
-constexpr source_position length_position{fft_source, 36};
-constexpr source_position create_position{fft_source, 37};
-constexpr source_position placement_position{fft_source, 38};
-constexpr source_position commit_position{fft_source, 40};
-constexpr source_position forward_position{fft_source, 52};
+// Lines that the log names for a failure here; data of the interface.
+constexpr std::int32_t length_line = 36, forward_line = 52;
 
-constexpr std::int32_t fft_size_unsupported = -312432;
+std::int32_t making_line(dsp::dfti_step failed) noexcept {
+  return failed == dsp::dfti_step::create ? 37 : failed == dsp::dfti_step::placement ? 38 : 40;
+}
+std::int32_t copying_line(dsp::dfti_step failed) noexcept {
+  return failed == dsp::dfti_step::copy ? 31 : 32;
+}
+
+/// Calls MKL; what fails becomes an mkl_error with the line that belongs to the step.
+template <class Line, class Call>
+auto at_line(Line line_of, Call call) try {
+  return call();
+} catch (const dsp::dfti_failure &failure) {
+  const char *const text = DftiErrorMessage(failure.status());
+  throw mkl_error({fft_source, line_of(failure.step())}, text ? text : "");
+}
+
+dsp::dfti_descriptor make(std::uint64_t length) {
+  if (length > max_fft_length) throw invalid_argument({fft_source, length_line});
+  return at_line(&making_line, [length] {
+    return dsp::dfti_descriptor({.lengths = {static_cast<MKL_LONG>(length), 0}, .in_place = true});
+  });
+}
 
 }  // namespace
 
-fft_transform::fft_transform(std::uint64_t length) : length_(length) {
-  if (length > max_fft_length) throw invalid_argument(length_position, fft_size_unsupported);
-  const mkl_section section;
-  const mkl_memory::descriptor_watch watched;
-  DFTI_DESCRIPTOR_HANDLE handle = nullptr;
-  const MKL_LONG created = DftiCreateDescriptor(&handle, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
-  descriptor made(handle);
-  throw_if_failed(watched.status(created), create_position);
-  throw_if_failed(DftiSetValue(handle, DFTI_PLACEMENT, DFTI_INPLACE), placement_position);
-  throw_if_failed(watched.status(DftiCommitDescriptor(handle)), commit_position);
-  descriptor_ = std::move(made);
-}
+fft_transform::fft_transform(std::uint64_t length) : descriptor_(make(length)), length_(length) {}
 
-fft_transform::fft_transform(const fft_transform &prototype) : length_(prototype.length_) {
-  const mkl_section section;
-  const mkl_memory::descriptor_watch watched;
-  DFTI_DESCRIPTOR_HANDLE handle = nullptr;
-  const MKL_LONG copied = DftiCopyDescriptor(prototype.descriptor_.get(), &handle);
-  descriptor made(handle);
-  throw_if_failed(watched.status(copied), copy_position);
-  throw_if_failed(watched.status(DftiCommitDescriptor(handle)), commit_copy_position);
-  descriptor_ = std::move(made);
-}
+fft_transform::fft_transform(const fft_transform &prototype)
+    : descriptor_(at_line(&copying_line, [&] { return dsp::dfti_descriptor(prototype.descriptor_); })),
+      length_(prototype.length_) {}
 
-void fft_transform::forward(std::complex<float> *data) {
-  const auto compute = [&] { return DftiComputeForward(descriptor_.get(), data); };
-  throw_if_failed(mkl_memory::watched_status(compute), forward_position);
+void fft_transform::forward(std::complex<float> *data, const mkl_section &around) {
+  at_line([](dsp::dfti_step) { return forward_line; }, [&] { descriptor_.forward(data, around); });
 }
 
 fft_lease::~fft_lease() {

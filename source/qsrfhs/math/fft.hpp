@@ -1,8 +1,6 @@
 // Committed MKL transforms, pooled by length. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <mkl_dfti.h>
-
 #include <complex>
 #include <cstdint>
 #include <list>
@@ -12,12 +10,11 @@
 #include <utility>
 
 #include "qsrfhs/math/mkl_runtime.hpp"
-#include "qsrfhs/math/mkl_section.hpp"
+#include "signal/dfti_descriptor.hpp"
 
 namespace qsrfhs {
 
-/// Longest transform in points. Sizes beyond it make MKL 2020.4 divide by zero or run without end.
-inline constexpr std::uint64_t max_fft_length = std::uint64_t{1} << 27;
+inline constexpr std::uint64_t max_fft_length = dsp::most_fft_points;
 
 /// One committed descriptor: complex single precision, in place, unscaled.
 class fft_transform {
@@ -28,20 +25,12 @@ class fft_transform {
   explicit fft_transform(const fft_transform &prototype);
   fft_transform &operator=(const fft_transform &) = delete;
 
-  /// Inside of an mkl_section.
-  void forward(std::complex<float> *data);
+  /// Throws mkl_error.
+  void forward(std::complex<float> *data, const mkl_section &around);
   [[nodiscard]] std::uint64_t length() const noexcept { return length_; }
 
  private:
-  struct free_descriptor {
-    void operator()(DFTI_DESCRIPTOR *descriptor) const noexcept {
-      const mkl_section section;
-      (void)DftiFreeDescriptor(&descriptor);
-    }
-  };
-  using descriptor = std::unique_ptr<DFTI_DESCRIPTOR, free_descriptor>;
-
-  descriptor descriptor_;
+  dsp::dfti_descriptor descriptor_;
   std::uint64_t length_;
 };
 

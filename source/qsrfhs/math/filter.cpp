@@ -7,7 +7,8 @@
 
 namespace qsrfhs {
 
-Filter::Filter(std::uint64_t length) : coefficients_(length) {
+Filter Filter::flat_top(std::uint64_t length) {
+  Filter window(length, 0.0F);
   const double step = 1.0 / static_cast<double>(length) * (2.0 * std::numbers::pi);
   for (std::uint64_t k = 0; k < length; ++k) {
     const double x = static_cast<double>(k) * step;
@@ -15,8 +16,9 @@ Filter::Filter(std::uint64_t length) : coefficients_(length) {
     double w = 0.277263158 * std::cos(x + x) + (0.21557895 - 0.41663158 * std::cos(x));
     w = w - 0.083578947 * std::cos(3.0 * x);
     w = w + 0.006947368 * std::cos(4.0 * x);
-    coefficients_.data()[k] = static_cast<float>(w);
+    window.coefficients()[k] = static_cast<float>(w);
   }
+  return window;
 }
 
 Filter::Filter(std::uint64_t length, float value) : coefficients_(length) {

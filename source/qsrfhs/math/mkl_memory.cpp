@@ -20,7 +20,6 @@ constinit thread_local std::uint64_t refusals = 0;
 namespace {
 
 constinit thread_local descriptor_watch *making = nullptr;
-constinit thread_local bool has_thread_state = false;
 
 void unlink(block &linked) noexcept {
   if (!linked.next) return;
@@ -89,12 +88,9 @@ void attach() noexcept {
 }
 
 descriptor_watch::descriptor_watch() noexcept {
-  // MKL's own record of the thread outlives the descriptor: it is made before the descriptor's blocks are told apart.
-  if (!has_thread_state) {
-    void *const any = mkl_malloc(1, alignof(block));
-    has_thread_state = any && !refused();
-    mkl_free(any);
-  }
+  // MKL's own record of the thread outlives the descriptor: where there was no memory for it before, it is made before
+  // the descriptor's blocks are told apart.
+  mkl_free(mkl_malloc(1, alignof(block)));
   making = this;
 }
 

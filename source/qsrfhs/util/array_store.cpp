@@ -1,10 +1,14 @@
 // SPDX-License-Identifier: MIT
 #include "qsrfhs/util/array_store.hpp"
 
+#include <lumra/status.h>
+
 #include <algorithm>
 #include <cstring>
 #include <limits>
 #include <new>
+#include <optional>
+#include <span>
 
 #include "host/host_array.hpp"
 #include "host/resize_service.hpp"
@@ -14,17 +18,6 @@
 
 namespace qsrfhs {
 namespace {
-
-enum array_store_status : std::int32_t {
-  allocate_bad_reference = -33620066,  // 0xFDFEFF9E
-  negative_count = -33620069,          // 0xFDFEFF9B
-  no_block = -33620079,                // 0xFDFEFF91
-  free_bad_reference = -33620097,      // 0xFDFEFF7F
-  length_bad_reference = -33620121,    // 0xFDFEFF67
-  length_no_array = -33620126,         // 0xFDFEFF62
-  read_bad_reference = -33620139,      // 0xFDFEFF55
-  read_refused_resize = -33620151      // 0xFDFEFF49
-};
 
 constexpr std::uint32_t unit = 4096;
 constexpr std::int32_t end_of_counts = 1 << 29;  // the bytes no longer fit 32 bits
@@ -52,7 +45,7 @@ array_block &make_block(std::uint32_t units) {
   return *block;
 }
 
-void give_back_array(std::uint64_t, void *block) noexcept {
+void give_back_array(void *block) noexcept {
   recycler::instance().give_back(*static_cast<array_block *>(block));
 }
 
@@ -60,12 +53,13 @@ bool is_valid(lumra_array_ref *const *array) noexcept {
   return array && *array && (*array)->kind == 1;
 }
 
-/// What a reference's block holds; nothing for a null block and for one that is not in use.
-std::span<const lumra_cf32> stored(const array_block *block, bool &attached) noexcept {
-  std::span<const lumra_cf32> elements;
-  attached = block && cleanup_registry::instance().visit(block, &give_back_array, [&] {
-    elements = {block->data, block->count};
-  });
+/// What a reference's block holds; none for a null block and for one that is not in use.
+std::optional<std::span<const lumra_cf32>> stored(const array_block *block) noexcept {
+  std::optional<std::span<const lumra_cf32>> elements;
+  if (block) {
+    cleanup_registry::instance().visit(block, &give_back_array,
+                                       [&] { elements = std::span<const lumra_cf32>(block->data, block->count); });
+  }
   return elements;
 }
 
@@ -155,7 +149,7 @@ std::int32_t cleanup_registry::add(std::uint64_t owner, void *object, release_fu
   newest_ = &added;
   return 0;
 } catch (...) {
-  return no_memory;
+  return LUMRA_REGISTRY_NO_MEMORY;
 }
 
 void cleanup_registry::unlink(registration &entry) noexcept {
@@ -167,7 +161,7 @@ void cleanup_registry::release_object(const void *object, release_function relea
   const std::lock_guard lock(mutex_);
   const auto found = registrations_.find(object);
   if (found == registrations_.end() || found->second.release != release) return;
-  release(found->second.owner, found->second.object);
+  release(found->second.object);
   unlink(found->second);
   registrations_.erase(found);
 }
@@ -178,7 +172,7 @@ void cleanup_registry::release_owner(std::uint64_t owner) noexcept {
     registration &seen = *entry;
     entry = seen.older;
     if (seen.owner != owner) continue;
-    seen.release(owner, seen.object);
+    seen.release(seen.object);
     unlink(seen);
     registrations_.erase(seen.object);
   }
@@ -189,18 +183,18 @@ void cleanup_registry::release_owner(std::uint64_t owner) noexcept {
 using namespace qsrfhs;
 
 int32_t qsUtilHS_AllocateArray_CSG(lumra_array_ref **array, int32_t count, uint64_t owner) {
-  if (!is_valid(array)) return Management::addError(allocate_bad_reference);
-  if (count < 0) return Management::addError(negative_count);
+  if (!is_valid(array)) return Management::addError(LUMRA_ARRAY_ALLOCATE_REFERENCE);
+  if (count < 0) return Management::addError(LUMRA_ARRAY_NEGATIVE_COUNT);
   if (count == 0) {
     (*array)->block = nullptr;
     return 0;
   }
-  if (count >= end_of_counts) return Management::addError(no_block);
+  if (count >= end_of_counts) return Management::addError(LUMRA_ARRAY_NO_BLOCK);
   array_block *block = nullptr;
   try {
     block = &recycler::instance().take(static_cast<std::uint32_t>(count));
   } catch (const std::bad_alloc &) {
-    return Management::addError(no_block);
+    return Management::addError(LUMRA_ARRAY_NO_BLOCK);
   }
   if (const std::int32_t status = cleanup_registry::instance().add(owner, block, &give_back_array)) {
     recycler::instance().give_back(*block);
@@ -211,7 +205,7 @@ int32_t qsUtilHS_AllocateArray_CSG(lumra_array_ref **array, int32_t count, uint6
 }
 
 int32_t qsUtilHS_FreeArray_CSG(lumra_array_ref **array) {
-  if (!is_valid(array)) return Management::addError(free_bad_reference);
+  if (!is_valid(array)) return Management::addError(LUMRA_ARRAY_FREE_REFERENCE);
   const array_block *const block = (*array)->block;
   (*array)->block = nullptr;
   if (block) cleanup_registry::instance().release_object(block, &give_back_array);
@@ -224,21 +218,19 @@ int32_t qsUtilHS_FreeArrayIDH_CSG(uint64_t owner) {
 }
 
 int32_t qsUtilHS_ArrayLength_CSG(lumra_array_ref **array, uint32_t *length) {
-  if (!is_valid(array) || !length) return Management::addError(length_bad_reference);
-  bool attached = false;
-  const auto elements = stored((*array)->block, attached);
-  if (!attached) return Management::addError(length_no_array);
-  *length = static_cast<std::uint32_t>(elements.size());
+  if (!is_valid(array) || !length) return Management::addError(LUMRA_ARRAY_LENGTH_REFERENCE);
+  const auto elements = stored((*array)->block);
+  if (!elements) return Management::addError(LUMRA_ARRAY_LENGTH_NONE);
+  *length = static_cast<std::uint32_t>(elements->size());
   return 0;
 }
 
 int32_t qsUtilHS_ReadArray_CSG(lumra_array_ref **array, lumra_cf32_array *destination, int32_t offset, int32_t count) {
-  if (!is_valid(array) || !destination) return Management::addError(read_bad_reference);
-  if (count < 0) return Management::addError(negative_count);
+  if (!is_valid(array) || !destination) return Management::addError(LUMRA_ARRAY_READ_REFERENCE);
+  if (count < 0) return Management::addError(LUMRA_ARRAY_NEGATIVE_COUNT);
   const auto out = host::size_output(destination, static_cast<std::size_t>(count));
   if (!host::has_block(*destination) || (**destination)->count != count)
-    return Management::addError(read_refused_resize);
-  bool attached = false;
-  copy_with_zeros(stored((*array)->block, attached), offset, out);
+    return Management::addError(LUMRA_ARRAY_READ_RESIZE);
+  copy_with_zeros(stored((*array)->block).value_or(std::span<const lumra_cf32>{}), offset, out);
   return 0;
 }

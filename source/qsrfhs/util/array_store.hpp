@@ -50,11 +50,11 @@ class recycler {
 class cleanup_registry {
  public:
   /// Gives the object back; called under the registry's lock.
-  using release_function = void (*)(std::uint64_t owner, void *object) noexcept;
+  using release_function = void (*)(void *object) noexcept;
 
   static cleanup_registry &instance() noexcept;
 
-  /// 0, or no_memory without a trace.
+  /// 0, or without a trace LUMRA_REGISTRY_NO_MEMORY, which is not recorded.
   std::int32_t add(std::uint64_t owner, void *object, release_function release) noexcept;
   /// Releases an object that was registered with this function; nothing otherwise.
   void release_object(const void *object, release_function release) noexcept;
@@ -74,8 +74,6 @@ class cleanup_registry {
   void before_fork() noexcept { mutex_.lock(); }
   void after_fork_in_parent() noexcept { mutex_.unlock(); }
   void after_fork_in_child() noexcept { mutex_.unlock(); }
-
-  static constexpr std::int32_t no_memory = -46;  // not a recorded code
 
  private:
   struct registration {

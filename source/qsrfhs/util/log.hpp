@@ -10,18 +10,13 @@
 #include <string>
 
 #include "platform/fork.hpp"
-#include "qsrfhs/math/exceptions.hpp"
 
 namespace qsrfhs::log {
-
-enum class level : std::int32_t { unknown_failure = 4, exception = 5 };
 
 struct entry {
   std::int32_t line;
   const char *file;  // static storage
   std::string message;
-  std::int32_t level;
-  std::uint32_t thread_id;
 };
 
 class Logger {

@@ -1,18 +1,17 @@
 // SPDX-License-Identifier: MIT
 #include "qsrfhs/vector/fft_resampler.hpp"
 
+#include <lumra/status.h>
 #include <mkl_dfti.h>
 
 #include <algorithm>
 #include <cmath>
-#include <exception>
 #include <memory>
 #include <new>
 #include <utility>
 
 #include "platform/fork.hpp"
 #include "platform/immortal.hpp"
-#include "qsrfhs/math/fft.hpp"
 #include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_runtime.hpp"
 #include "qsrfhs/math/mkl_section.hpp"
@@ -20,6 +19,7 @@
 #include "qsrfhs/util/array_store.hpp"
 #include "qsrfhs/util/management.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/dfti_descriptor.hpp"
 
 namespace qsrfhs {
 namespace {
@@ -40,27 +40,37 @@ bool free_transform(resampler_descriptor &descriptor) noexcept {
   return freed;
 }
 
-std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, bool inverse,
+std::int32_t code_of(dsp::dfti_step failed, direction towards) noexcept {
+  switch (failed) {
+    case dsp::dfti_step::scale:
+      return LUMRA_RESAMPLER_SCALE;
+    case dsp::dfti_step::placement:
+      return towards == direction::inverse ? LUMRA_RESAMPLER_IN_PLACE : LUMRA_RESAMPLER_OUT_OF_PLACE;
+    case dsp::dfti_step::commit:
+      return LUMRA_RESAMPLER_COMMIT;
+    default:
+      return LUMRA_RESAMPLER_CREATE;
+  }
+}
+
+/// Makes a transform; where it fails, what there is of it has to be freed while `watched` lasts.
+std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, direction towards,
                     const mkl_memory::watch &watched) noexcept {
-  if (descriptor.transform) {
-    MKL_LONG present = 0;
-    if (failed(DftiGetValue(transform_of(descriptor), DFTI_LENGTHS, &present))) return resampler_length_query;
-    if (present == static_cast<MKL_LONG>(length)) return resampler_ok;
-    if (!free_transform(descriptor)) return resampler_free_failed;
-  }
-  if (length < 1 || length > max_fft_length) return resampler_create;
-  const mkl_section section;
+  if (length < 1 || length > dsp::most_fft_points) return LUMRA_RESAMPLER_CREATE;
+  const bool inverse = towards == direction::inverse;
   DFTI_DESCRIPTOR_HANDLE made = nullptr;
-  const MKL_LONG created = DftiCreateDescriptor(&made, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(length));
+  const auto failure = dsp::make_descriptor(
+      made, {.lengths = {length, 0}, .in_place = inverse, .backward_scale = inverse ? 1.0 / length : 1.0}, watched);
   descriptor.transform = made;
-  if (failed(watched.status(created))) return resampler_create;
-  if (inverse) {
-    if (failed(DftiSetValue(made, DFTI_BACKWARD_SCALE, 1.0 / length))) return resampler_scale;
-    if (failed(DftiSetValue(made, DFTI_PLACEMENT, DFTI_INPLACE))) return resampler_in_place;
-  } else if (failed(DftiSetValue(made, DFTI_PLACEMENT, DFTI_NOT_INPLACE))) {
-    return resampler_out_of_place;
-  }
-  return failed(watched.status(DftiCommitDescriptor(made))) ? resampler_commit : resampler_ok;
+  return failure ? code_of(failure->step(), towards) : LUMRA_SUCCESS;
+}
+
+/// Frees a transform of another length.
+std::int32_t make_way(resampler_descriptor &descriptor, std::uint32_t length) noexcept {
+  MKL_LONG present = 0;
+  if (failed(DftiGetValue(transform_of(descriptor), DFTI_LENGTHS, &present))) return LUMRA_RESAMPLER_LENGTH_QUERY;
+  if (present == static_cast<MKL_LONG>(length)) return LUMRA_SUCCESS;
+  return free_transform(descriptor) ? LUMRA_SUCCESS : LUMRA_RESAMPLER_FREE_FAILED;
 }
 
 bool transform_forward(const resampler_descriptor &descriptor, const sample *in, sample *out) noexcept {
@@ -88,7 +98,8 @@ template <class Put>
 void for_each_run(std::int64_t n, std::int64_t m, std::int64_t centre, Put put) {
   const std::int64_t middle = n / 2, start = centre - m / 2, end = centre + m / 2;
   if (start < 0) {
-    // From end + middle, not from the middle on: what callers' weights are made for. Past the spectrum there is none.
+    // The stretch begins at end + middle, not at the middle, as callers' weights are made for. The spectrum has none past
+    // its end.
     const std::int64_t source = end + middle, count = std::min(m + start, n - source);
     if (count > 0) put(-start, source, count);
     return;
@@ -149,13 +160,21 @@ const platform::fork_participant<descriptor_cache> takes_part(platform::fork_ran
 
 }  // namespace
 
-std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, bool inverse) noexcept {
+std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, direction towards) noexcept {
   const mkl_runtime::use in_use;
-  const mkl_memory::descriptor_watch watched;
-  const std::int32_t status = set_up(descriptor, length, inverse, watched);
-  if (status == resampler_ok) return status;
+  std::int32_t status = descriptor.transform ? make_way(descriptor, length) : LUMRA_SUCCESS;
+  if (status == LUMRA_SUCCESS && descriptor.transform) return status;
+  bool freed = true;
+  {
+    const mkl_section section;
+    const mkl_memory::descriptor_watch watched;
+    if (status == LUMRA_SUCCESS) status = set_up(descriptor, length, towards, watched);
+    if (status != LUMRA_SUCCESS && descriptor.transform) freed = free_transform(descriptor);
+  }
+  if (status == LUMRA_SUCCESS) return status;
+  // Nothing is recorded inside of the section: that takes a lock.
   Management::addError(status);
-  if (descriptor.transform && !free_transform(descriptor)) Management::addError(resampler_free_failed_again);
+  if (!freed) Management::addError(LUMRA_RESAMPLER_FREE_FAILED_AGAIN);
   descriptor.transform = nullptr;
   return status;
 }
@@ -165,7 +184,7 @@ void release(resampler_descriptor &descriptor) noexcept {
   descriptor.buffer_block = descriptor.aligned_buffer = nullptr;
   if (descriptor.transform) (void)free_transform(descriptor);
   descriptor.transform = nullptr;
-  descriptor.status = Management::addError(resampler_released);
+  descriptor.status = Management::addError(LUMRA_RESAMPLER_RELEASED);
 }
 
 descriptor_cache &descriptor_cache::instance() noexcept {
@@ -204,14 +223,11 @@ void descriptor_cache::put_back(entry &taken, std::uint64_t turn_before) noexcep
   taken.available = true;
 }
 
-/// One without an entry is beyond repair: it was never handed out.
-void descriptor_cache::give_back(std::uint64_t, void *descriptor) noexcept {
-  descriptor_cache &cache = instance();
-  const std::lock_guard lock(cache.mutex_);
-  entry *seen = cache.first_;
-  while (seen && &seen->descriptor != descriptor) seen = seen->next;
-  if (!seen) std::terminate();
-  seen->available = true;
+/// Nothing but an entry's descriptor is registered with it.
+void descriptor_cache::give_back(void *descriptor) noexcept {
+  auto &returned = static_cast<entry &>(*static_cast<resampler_descriptor *>(descriptor));
+  const std::lock_guard lock(instance().mutex_);
+  returned.available = true;
 }
 
 std::int32_t descriptor_cache::create(resampler_descriptor **out, std::uint32_t length, std::uint32_t buffer_flag,
@@ -222,17 +238,17 @@ std::int32_t descriptor_cache::create(resampler_descriptor **out, std::uint32_t 
   entry *lent = take(wanted, turn_before);
   std::unique_ptr<entry> made;
   if (!lent) {
-    made.reset(new (std::nothrow) entry);
-    if (!made) return Management::addError(resampler_no_descriptor);
+    made.reset(new (std::nothrow) entry{});
+    if (!made) return Management::addError(LUMRA_RESAMPLER_NO_DESCRIPTOR);
     made->made_for = wanted;
-    resampler_descriptor &fresh = made->descriptor;
+    resampler_descriptor &fresh = *made;
     fresh.length = length;
     fresh.buffer_flag = buffer_flag;
     fresh.inverse_flag = inverse_flag;
-    fresh.status = prepare(fresh, length, inverse_flag != 0);
-    if (fresh.status == resampler_ok && buffer_flag != 0 && inverse_flag != 0 && !make_buffer(fresh))
-      fresh.status = Management::addError(resampler_no_buffer);
-    if (const std::int32_t status = fresh.status; status != resampler_ok) {
+    fresh.status = prepare(fresh, length, inverse_flag != 0 ? direction::inverse : direction::forward);
+    if (fresh.status == LUMRA_SUCCESS && buffer_flag != 0 && inverse_flag != 0 && !make_buffer(fresh))
+      fresh.status = Management::addError(LUMRA_RESAMPLER_NO_BUFFER);
+    if (const std::int32_t status = fresh.status; status != LUMRA_SUCCESS) {
       release(fresh);
       return status;
     }
@@ -240,30 +256,33 @@ std::int32_t descriptor_cache::create(resampler_descriptor **out, std::uint32_t 
     lent = made.get();
     add(*lent);
   }
-  if (const std::int32_t status = cleanup_registry::instance().add(owner, &lent->descriptor, &give_back)) {
-    if (!made) put_back(*lent, turn_before);
-    if (made) remove(*lent);
+  resampler_descriptor *const descriptor = lent;
+  if (const std::int32_t status = cleanup_registry::instance().add(owner, descriptor, &give_back)) {
+    if (made)
+      remove(*lent);
+    else
+      put_back(*lent, turn_before);
     Management::addError(status);
-    if (made) release(made->descriptor);
+    if (made) release(*made);
     return status;
   }
-  *out = &lent->descriptor;
+  *out = descriptor;
   (void)made.release();
-  return resampler_ok;
+  return LUMRA_SUCCESS;
 }
 
 void process_block(const resampler_plan &plan, resampler_descriptor &forward, resampler_descriptor &inverse,
                    const sample *input, sample *spectrum, std::uint64_t block, bool first,
                    std::span<resampler_channel> channels) noexcept {
   const mkl_runtime::use in_use;
-  if (prepare(forward, plan.n, false) != resampler_ok || !transform_forward(forward, input, spectrum))
-    Management::addError(resampler_forward);
+  if (prepare(forward, plan.n, direction::forward) != LUMRA_SUCCESS || !transform_forward(forward, input, spectrum))
+    Management::addError(LUMRA_RESAMPLER_FORWARD);
   auto *const bins = static_cast<sample *>(inverse.aligned_buffer);
   const auto start = static_cast<double>(block * plan.hop());
   for (resampler_channel &channel : channels) {
     fill_bins(plan, channel, start * channel.phase_step + channel.phase_start, spectrum, bins);
-    if (prepare(inverse, plan.m, true) != resampler_ok || !transform_backward(inverse, bins))
-      Management::addError(resampler_backward);
+    if (prepare(inverse, plan.m, direction::inverse) != LUMRA_SUCCESS || !transform_backward(inverse, bins))
+      Management::addError(LUMRA_RESAMPLER_BACKWARD);
     put_out(plan, channel, bins, first);
   }
 }
@@ -273,6 +292,6 @@ void process_block(const resampler_plan &plan, resampler_descriptor &forward, re
 int32_t qsUtilHS_FFTResampler_CSG_CreateDescriptor(lumra_resampler_descriptor **out, uint32_t length,
                                                    uint32_t bufferFlag, uint32_t inverseFlag, uint64_t owner) {
   using namespace qsrfhs;
-  if (!out) return Management::addError(resampler_no_descriptor);
+  if (!out) return Management::addError(LUMRA_RESAMPLER_NO_DESCRIPTOR);
   return descriptor_cache::instance().create(out, length, bufferFlag, inverseFlag, owner);
 }

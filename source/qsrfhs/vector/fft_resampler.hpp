@@ -13,26 +13,12 @@ namespace qsrfhs {
 
 using resampler_descriptor = lumra_resampler_descriptor;
 
-enum resampler_status : std::int32_t {
-  resampler_ok = 0,
-  resampler_free_failed_again = -50397436,  // 0xFCFEFF04
-  resampler_length_query = -50397466,       // 0xFCFEFEE6
-  resampler_free_failed = -50397473,        // 0xFCFEFEDF
-  resampler_create = -50397485,             // 0xFCFEFED3
-  resampler_scale = -50397494,              // 0xFCFEFECA
-  resampler_in_place = -50397499,           // 0xFCFEFEC5
-  resampler_out_of_place = -50397506,       // 0xFCFEFEBE
-  resampler_commit = -50397513,             // 0xFCFEFEB7
-  resampler_no_buffer = -50397544,          // 0xFCFEFE98
-  resampler_released = -50397566,           // 0xFCFEFE82
-  resampler_no_descriptor = -50397684,      // 0xFCFEFE0C
-  resampler_forward = -50397767,            // 0xFCFEFDB9
-  resampler_backward = -50397840            // 0xFCFEFD70
-};
+/// Forward is out of place and unscaled, inverse in place and scaled by 1 / length.
+enum class direction { forward, inverse };
 
 /// Makes sure that the descriptor holds a committed transform of the length. One that has it is kept as it is, whatever
 /// its direction. Failures are recorded, and leave no transform.
-std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, bool inverse) noexcept;
+std::int32_t prepare(resampler_descriptor &descriptor, std::uint32_t length, direction towards) noexcept;
 
 /// Frees transform and buffer and marks the descriptor as released, which is recorded as a code of its own.
 void release(resampler_descriptor &descriptor) noexcept;
@@ -57,8 +43,7 @@ class descriptor_cache {
     std::uint32_t length, buffer_flag, inverse_flag;
     friend bool operator==(const purpose &, const purpose &) = default;
   };
-  struct entry {
-    resampler_descriptor descriptor{};
+  struct entry : resampler_descriptor {
     purpose made_for{};
     std::uint64_t turn = 0;  // counts what the cache hands out
     bool available = false;
@@ -69,7 +54,7 @@ class descriptor_cache {
   void add(entry &made) noexcept;
   void remove(entry &made) noexcept;
   void put_back(entry &taken, std::uint64_t turn_before) noexcept;
-  static void give_back(std::uint64_t owner, void *descriptor) noexcept;
+  static void give_back(void *descriptor) noexcept;
 
   std::mutex mutex_;
   entry *first_ = nullptr;   // under mutex_
