@@ -1,4 +1,4 @@
-/* Filters by specification: designed once, shared, and kept for the next who asks. SPDX-License-Identifier: MIT
+/* Filters by key: designed once, shared, and kept for the next who asks. SPDX-License-Identifier: MIT
  *
  * A filter is registered under a key; who registers an equal key shares it. Filters without references are kept until
  * together with the others they exceed 134217728 bytes, an entry of n coefficients counting for (n + 384) * 32; the
@@ -61,7 +61,7 @@ typedef struct lumra_filter_record {
  *
  * filter          entry and identifier are written; the whole record is copied to the filter
  * designInput     LUMRA_FILTER_GIVEN: a lumra_f32_array with the coefficients; else not looked at
- * spec            the key
+ * key             equal to those of all who share the filter
  * designArgument  number of coefficients wanted, at most 2^24 for a filter to be designed; 0: as many as the values
  *                 say, or as are given. For LUMRA_FILTER_GIVEN it is 0 or their count
  *
@@ -69,7 +69,7 @@ typedef struct lumra_filter_record {
  * of the checks, both recorded: -50462874 null record; -50462898 no filter: a null key, values that make none, nothing
  * given, or no memory. */
 LUMRA_EXPORT int32_t qsUtilHS_RegisterFilterSpec(lumra_filter_record *filter, const void *designInput,
-                                                 const lumra_filter_key *spec, uint64_t designArgument);
+                                                 const lumra_filter_key *key, uint64_t designArgument);
 
 /* Gives a reference back (the name is spelled so). The record stays as it is, but is stale now.
  * Returns 0, or in the order of the checks, all recorded: -50462818 null record; -50462821 its entry is null or its
@@ -79,12 +79,12 @@ LUMRA_EXPORT int32_t qsUtilHS_UnegisterFilterSpec(lumra_filter_record *filter);
 /* Looks a key up.
  *
  * filter  receives the record of who registered last, and a reference, when the key is found and erase is 0
- * spec    the key
+ * key     as it was registered
  * erase   not 0: the filter is found no more, and is freed with its last reference
  *
  * Returns 0; -50462794 when the filter was erased; or in the order of the checks: -50462763 null record and -50462766
  * null key, both recorded; -50462810 not found. */
-LUMRA_EXPORT int32_t qsUtilHS_MatchFilterSpecErase(lumra_filter_record *filter, const lumra_filter_key *spec,
+LUMRA_EXPORT int32_t qsUtilHS_MatchFilterSpecErase(lumra_filter_record *filter, const lumra_filter_key *key,
                                                    int32_t erase);
 
 #ifdef __cplusplus

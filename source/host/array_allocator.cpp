@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "host/array_allocator.hpp"
 
+#include <lumra/status.h>
+
 #include <cstring>
 #include <limits>
 
@@ -34,32 +36,32 @@ std::size_t array_allocator::capacity_of(void *block) const {
 
 std::int32_t array_allocator::create(element_type type, std::int32_t dimensions, const std::int32_t *sizes,
                                      void ***handle) noexcept {
-  if (!handle) return array_no_memory;
+  if (!handle) return LUMRA_TOOLKIT_NO_MEMORY;
   *handle = nullptr;
-  if (!is_valid(type, dimensions) || !sizes) return array_bad_type;
+  if (!is_valid(type, dimensions) || !sizes) return LUMRA_TOOLKIT_BAD_OPTION;
   std::uint64_t count = 1;
   for (std::int32_t d = 0; d < dimensions; ++d) {
-    if (sizes[d] < 0) return array_negative_size;
+    if (sizes[d] < 0) return LUMRA_TOOLKIT_NEGATIVE_SIZE;
     count *= static_cast<std::uint64_t>(sizes[d]);
   }
   const std::int32_t status = resize(type, dimensions, handle, count);
-  if (status == array_ok) std::memcpy(**handle, sizes, static_cast<std::size_t>(dimensions) * sizeof *sizes);
+  if (status == LUMRA_SUCCESS) std::memcpy(**handle, sizes, static_cast<std::size_t>(dimensions) * sizeof *sizes);
   return status;
 }
 
 std::int32_t array_allocator::resize(element_type type, std::int32_t dimensions, void ***handle,
                                      std::uint64_t count) noexcept try {
-  if (!handle) return array_no_memory;
-  if (!is_valid(type, dimensions)) return array_bad_type;
-  if (count > max_count) return array_no_memory;
-  if (count == 0 && *handle && **handle) return array_ok;  // every block has that room; scratch is emptied so
+  if (!handle) return LUMRA_TOOLKIT_NO_MEMORY;
+  if (!is_valid(type, dimensions)) return LUMRA_TOOLKIT_BAD_OPTION;
+  if (count > max_count) return LUMRA_TOOLKIT_NO_MEMORY;
+  if (count == 0 && *handle && **handle) return LUMRA_SUCCESS;  // every block has that room; scratch is emptied so
   const std::size_t header = header_size(type, dimensions);
   const std::size_t bytes = static_cast<std::size_t>(count) * element_size(type);
 
   void *const old = *handle ? **handle : nullptr;
   const std::size_t old_capacity = old ? capacity_of(old) : 0;
-  if (old && old_capacity == 0) return array_no_memory;
-  if (old && old_capacity >= header + bytes) return array_ok;
+  if (old && old_capacity == 0) return LUMRA_TOOLKIT_NO_MEMORY;
+  if (old && old_capacity >= header + bytes) return LUMRA_SUCCESS;
 
   // Element 0 lies on an alignment boundary, the sizes in front of it.
   const auto lead = static_cast<std::size_t>(alignment);
@@ -85,9 +87,9 @@ std::int32_t array_allocator::resize(element_type type, std::int32_t dimensions,
   }
   *handle = cell;
   *cell = block;
-  return array_ok;
+  return LUMRA_SUCCESS;
 } catch (...) {
-  return array_no_memory;
+  return LUMRA_TOOLKIT_NO_MEMORY;
 }
 
 void array_allocator::destroy(void ***handle) noexcept {

@@ -11,13 +11,6 @@
 
 namespace host {
 
-enum array_status : std::int32_t {
-  array_ok = 0,
-  array_no_memory = -20001,
-  array_negative_size = -20004,
-  array_bad_type = -20061,
-};
-
 /// Makes, resizes and frees blocks, and knows its own from foreign ones, so that a foreign block is refused instead of
 /// being moved or freed. Blocks never shrink in memory. All operations may be called from any thread.
 class array_allocator {

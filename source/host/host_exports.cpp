@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <lumra/host_array.h>
+#include <lumra/status.h>
 
 #include "host/array_allocator.hpp"
 #include "host/resize_service.hpp"
@@ -9,7 +10,7 @@ using host::element_type;
 
 int32_t qsHost_SetArrayResize(lumra_array_resize service) {
   host::set_resize_service(service);
-  return host::array_ok;
+  return LUMRA_SUCCESS;
 }
 
 int32_t qsHost_ArrayNew(int32_t typeCode, int32_t dimensions, const int32_t *sizes, void *array) {
@@ -18,7 +19,7 @@ int32_t qsHost_ArrayNew(int32_t typeCode, int32_t dimensions, const int32_t *siz
 
 int32_t qsHost_ArrayFree(void *array) {
   array_allocator::instance().destroy(static_cast<void ***>(array));
-  return host::array_ok;
+  return LUMRA_SUCCESS;
 }
 
 int32_t qsHost_ArrayResize(int32_t typeCode, int32_t dimensions, void *array, uint64_t newSize) {

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <lumra/library_info.h>
+#include <lumra/status.h>
 
 #include <cstring>
 #include <string_view>
@@ -13,14 +14,6 @@ constexpr std::uint32_t version_number = 0x140600C0;  // 20.6
 constexpr std::string_view version_label = "20.6.0f0";
 constexpr std::string_view library_description = "QS Lumra Algo C interface 64bit release";
 
-enum library_info_status : std::int32_t {
-  filename_null = -268501027,      // 0xEFFEFFDD
-  version_null = -268501053,       // 0xEFFEFFC3
-  version_text_null = -268501057,  // 0xEFFEFFBF
-  description_null = -268501061,   // 0xEFFEFFBB
-  avx_result_null = -268501078     // 0xEFFEFFAA
-};
-
 /// Writes a text with its NUL where both fit into `room` bytes, else an empty string.
 void write_text(std::string_view text, char *buffer, int room) noexcept {
   if (room < 1) return;
@@ -33,7 +26,7 @@ void write_text(std::string_view text, char *buffer, int room) noexcept {
 }  // namespace
 
 int32_t qsLumraAlgo_getLibraryFilename(char *buffer, uint16_t size) {
-  if (!buffer) return filename_null;
+  if (!buffer) return LUMRA_INFO_FILENAME_NULL;
   write_text(library_name, buffer, size - 1);
   return 0;
 }
@@ -41,9 +34,9 @@ int32_t qsLumraAlgo_getLibraryFilename(char *buffer, uint16_t size) {
 int32_t qsLumraAlgo_getLibraryInfo(uint32_t *version, char *versionText, uint16_t versionTextSize, char *description,
                                    uint16_t descriptionSize) {
   constexpr int shortest_version_text = 13;
-  if (!version) return version_null;
-  if (!versionText) return version_text_null;
-  if (!description) return description_null;
+  if (!version) return LUMRA_INFO_VERSION_NULL;
+  if (!versionText) return LUMRA_INFO_VERSION_TEXT_NULL;
+  if (!description) return LUMRA_INFO_DESCRIPTION_NULL;
   *version = version_number;
   // Deliberately different: the version text is given one byte less than its buffer, the description all of it.
   if (versionTextSize < shortest_version_text) return 0;
@@ -54,7 +47,7 @@ int32_t qsLumraAlgo_getLibraryInfo(uint32_t *version, char *versionText, uint16_
 }
 
 int32_t qsLumraAlgo_hasAvxHardwareSupport(uint8_t *result) {
-  if (!result) return avx_result_null;
+  if (!result) return LUMRA_INFO_AVX_NULL;
   *result = platform::has_avx() ? 1 : 0;
   return 0;
 }

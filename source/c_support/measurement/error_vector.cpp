@@ -1,5 +1,6 @@
 // Error vectors of two matrices, in MKL's vector math, and scaling in place. SPDX-License-Identifier: MIT
 #include <lumra/error_vector.h>
+#include <lumra/status.h>
 
 #include <mkl_vml.h>
 
@@ -13,12 +14,6 @@
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
 namespace {
-
-enum error_vector_status : std::int32_t {
-  invalid_parameter = -312401,
-  no_memory = -312498,
-};
-constexpr std::int32_t scale_failed = -1;
 
 static_assert(VML_LA == LUMRA_ACCURACY_LOW && VML_HA == LUMRA_ACCURACY_HIGH &&
               VML_EP == LUMRA_ACCURACY_ENHANCED_PERFORMANCE);
@@ -43,10 +38,10 @@ const sample *samples(lumra_cf32_matrix matrix) noexcept {
 template <class Scratch, class Pass>
 std::int32_t compare(lumra_cf32_matrix a, lumra_cf32_matrix b, lumra_f32_matrix e, std::int32_t mode,
                      Pass &&pass) noexcept {
-  if (!host::has_block(a) || !host::has_block(b) || !host::has_block(e)) return invalid_parameter;
+  if (!host::has_block(a) || !host::has_block(b) || !host::has_block(e)) return LUMRA_INVALID_PARAMETER;
   const std::int32_t n = element_count(**a);
-  if (n < 0 || n != element_count(**b) || n != element_count(**e)) return invalid_parameter;
-  if (mode < VML_LA || mode > VML_EP) return invalid_parameter;
+  if (n < 0 || n != element_count(**b) || n != element_count(**e)) return LUMRA_INVALID_PARAMETER;
+  if (mode < VML_LA || mode > VML_EP) return LUMRA_INVALID_PARAMETER;
   if (n == 0) return 0;
   try {
     const qsrfhs::aligned_buffer<Scratch> scratch(static_cast<std::size_t>(std::min(n, piece)));
@@ -57,7 +52,7 @@ std::int32_t compare(lumra_cf32_matrix a, lumra_cf32_matrix b, lumra_f32_matrix 
       first += count;
     }
   } catch (const std::bad_alloc &) {
-    return no_memory;
+    return LUMRA_ALLOCATION_FAILED;
   }
   return 0;
 }
@@ -93,7 +88,7 @@ int32_t qsLumraAlgo_CalculatePhaseError2D(lumra_cf32_matrix a, lumra_cf32_matrix
 
 int32_t qsLumraAlgo_scale_cf(lumra_cf32 *data, uint64_t n, float factor) {
   if (n == 0) return 0;
-  if (!data || n > std::numeric_limits<std::size_t>::max() / sizeof *data) return scale_failed;
+  if (!data || n > std::numeric_limits<std::size_t>::max() / sizeof *data) return LUMRA_REFUSED;
   qsrfhs::kernels::active().scale(reinterpret_cast<float *>(data), factor, 2 * n);
   return 0;
 }

@@ -1,4 +1,4 @@
-// The designs behind the filter-spec registry. SPDX-License-Identifier: MIT
+// The designs behind the registry of filters. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <lumra/filter_registry.h>

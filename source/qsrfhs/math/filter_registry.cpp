@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "qsrfhs/math/filter_registry.hpp"
 
+#include <lumra/status.h>
+
 #include <algorithm>
 #include <functional>
 
@@ -69,10 +71,10 @@ std::int32_t filter_registry::register_filter(lumra_filter_record &record, const
   const std::lock_guard lock(mutex_);
   if (const auto found = by_key_.find(key); found != by_key_.end()) {
     refer(*found->second, record);  // keeps its place in the list
-    return filter_ok;
+    return LUMRA_SUCCESS;
   }
   entry_list made = design(input, key, count);
-  if (made.empty()) return register_no_design;
+  if (made.empty()) return LUMRA_FILTER_NO_DESIGN;
   const auto added = made.begin();
   by_identifier_.emplace(added->identifier, added);
   // A key with a NaN never matches: it has no place among the keys.
@@ -89,41 +91,45 @@ std::int32_t filter_registry::register_filter(lumra_filter_record &record, const
   total_cost_ += added->cost();
   cached_.splice(cached_.end(), made);
   refer(*added, record);
-  return filter_ok;
+  return LUMRA_SUCCESS;
 } catch (...) {
-  return register_no_design;
+  return LUMRA_FILTER_NO_DESIGN;
 }
 
-std::int32_t filter_registry::match_or_erase(lumra_filter_record &record, const lumra_filter_key &key,
-                                             bool erase) noexcept {
+std::int32_t filter_registry::match(lumra_filter_record &record, const lumra_filter_key &key) noexcept {
   const std::lock_guard lock(mutex_);
   const auto found = by_key_.find(key);
-  if (found == by_key_.end()) return match_none;
+  if (found == by_key_.end()) return LUMRA_FILTER_MATCH_NONE;
   const auto matched = found->second;
-  if (!erase) {
-    ++matched->references;
-    record = matched->record;
-    cached_.splice(cached_.end(), cached_, matched);
-    return filter_ok;
-  }
-  if (matched->references == 0) {
-    free_entry(cached_, matched);
+  ++matched->references;
+  record = matched->record;
+  cached_.splice(cached_.end(), cached_, matched);
+  return LUMRA_SUCCESS;
+}
+
+std::int32_t filter_registry::erase(const lumra_filter_key &key) noexcept {
+  const std::lock_guard lock(mutex_);
+  const auto found = by_key_.find(key);
+  if (found == by_key_.end()) return LUMRA_FILTER_MATCH_NONE;
+  const auto erased = found->second;
+  if (erased->references == 0) {
+    free_entry(cached_, erased);
   } else {
-    forget_key(matched);
-    matched->erase_pending = true;
-    erased_.splice(erased_.end(), cached_, matched);
+    forget_key(erased);
+    erased->erase_pending = true;
+    erased_.splice(erased_.end(), cached_, erased);
   }
-  return match_erased;
+  return LUMRA_FILTER_MATCH_ERASED;
 }
 
 std::int32_t filter_registry::unregister_filter(const lumra_filter_record &record) noexcept {
   const std::lock_guard lock(mutex_);
   const auto found = by_identifier_.find(record.identifier);
   if (found == by_identifier_.end() || &*found->second != record.entry || found->second->references == 0)
-    return unregister_unknown;
+    return LUMRA_FILTER_UNREGISTER_UNKNOWN;
   const auto left = found->second;
   if (--left->references == 0 && left->erase_pending) free_entry(erased_, left);
-  return filter_ok;
+  return LUMRA_SUCCESS;
 }
 
 /// Frees cached entries without references, least recently used first, until there is room for more within the budget.
@@ -150,23 +156,24 @@ void filter_registry::free_entry(entry_list &list, entry_list::iterator freed) n
 
 using namespace qsrfhs;
 
-int32_t qsUtilHS_RegisterFilterSpec(lumra_filter_record *filter, const void *designInput, const lumra_filter_key *spec,
+int32_t qsUtilHS_RegisterFilterSpec(lumra_filter_record *filter, const void *designInput, const lumra_filter_key *key,
                                     uint64_t designArgument) {
-  if (!filter) return Management::addError(register_null);
-  if (!spec) return Management::addError(register_no_design);
-  const std::int32_t status = filter_registry::instance().register_filter(*filter, designInput, *spec, designArgument);
-  return status == filter_ok ? filter_ok : Management::addError(status);
+  if (!filter) return Management::addError(LUMRA_FILTER_REGISTER_NULL);
+  if (!key) return Management::addError(LUMRA_FILTER_NO_DESIGN);
+  const std::int32_t status = filter_registry::instance().register_filter(*filter, designInput, *key, designArgument);
+  return status == LUMRA_SUCCESS ? LUMRA_SUCCESS : Management::addError(status);
 }
 
 int32_t qsUtilHS_UnegisterFilterSpec(lumra_filter_record *filter) {
-  if (!filter) return Management::addError(unregister_null);
-  if (!filter->entry || filter->identifier == 0) return Management::addError(unregister_null_entry);
+  if (!filter) return Management::addError(LUMRA_FILTER_UNREGISTER_NULL);
+  if (!filter->entry || filter->identifier == 0) return Management::addError(LUMRA_FILTER_UNREGISTER_EMPTY);
   const std::int32_t status = filter_registry::instance().unregister_filter(*filter);
-  return status == filter_ok ? filter_ok : Management::addError(status);
+  return status == LUMRA_SUCCESS ? LUMRA_SUCCESS : Management::addError(status);
 }
 
-int32_t qsUtilHS_MatchFilterSpecErase(lumra_filter_record *filter, const lumra_filter_key *spec, int32_t erase) {
-  if (!filter) return Management::addError(match_null_record);
-  if (!spec) return Management::addError(match_null_key);
-  return filter_registry::instance().match_or_erase(*filter, *spec, erase != 0);
+int32_t qsUtilHS_MatchFilterSpecErase(lumra_filter_record *filter, const lumra_filter_key *key, int32_t erase) {
+  if (!filter) return Management::addError(LUMRA_FILTER_MATCH_RECORD_NULL);
+  if (!key) return Management::addError(LUMRA_FILTER_MATCH_KEY_NULL);
+  filter_registry &registry = filter_registry::instance();
+  return erase != 0 ? registry.erase(*key) : registry.match(*filter, *key);
 }

@@ -1,4 +1,4 @@
-// Designed filters by specification, shared by reference count, least recently used first to go.
+// Designed filters by key, shared by reference count, least recently used first to go.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -15,19 +15,6 @@
 
 namespace qsrfhs {
 
-enum filter_registry_status : std::int32_t {
-  filter_ok = 0,
-  register_null = -50462874,          // 0xFCFDFF66
-  register_no_design = -50462898,     // 0xFCFDFF4E
-  match_null_record = -50462763,      // 0xFCFDFFD5
-  match_null_key = -50462766,         // 0xFCFDFFD2
-  match_erased = -50462794,           // 0xFCFDFFB6; not recorded
-  match_none = -50462810,             // 0xFCFDFFA6; not recorded
-  unregister_null = -50462818,        // 0xFCFDFF9E
-  unregister_null_entry = -50462821,  // 0xFCFDFF9B
-  unregister_unknown = -50462843      // 0xFCFDFF85
-};
-
 class filter_registry {
  public:
   static constexpr std::uint64_t budget = 134'217'728;
@@ -37,7 +24,8 @@ class filter_registry {
   std::int32_t register_filter(lumra_filter_record &record, const void *input, const lumra_filter_key &key,
                                std::uint64_t count) noexcept;
   std::int32_t unregister_filter(const lumra_filter_record &record) noexcept;
-  std::int32_t match_or_erase(lumra_filter_record &record, const lumra_filter_key &key, bool erase) noexcept;
+  std::int32_t match(lumra_filter_record &record, const lumra_filter_key &key) noexcept;
+  std::int32_t erase(const lumra_filter_key &key) noexcept;
 
   /// Bytes that all filters count for, erased ones with references included.
   [[nodiscard]] std::uint64_t total_cost() const noexcept;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "qsrfhs/util/batch_scheduler.hpp"
 
+#include <lumra/status.h>
+
 #include <algorithm>
 #include <cstring>
 #include <exception>
@@ -13,13 +15,6 @@ namespace {
 
 using std::chrono::steady_clock;
 using namespace std::chrono_literals;
-
-enum scheduler_status : std::int32_t {
-  shared_thread_failed = -67436963,  // 0xFBFAFE5D
-  pinned_thread_failed = -67436809,  // 0xFBFAFEF7
-  shared_timeout = -67436764,        // 0xFBFAFF24
-  pinned_timeout = -67436752,        // 0xFBFAFF30
-};
 
 constexpr auto idle_wait = 5s;  // a thread looks for work that often without being woken
 constexpr auto exit_wait = 1s;  // for threads that leave
@@ -108,7 +103,7 @@ bool batch_scheduler::start_team(team_kind kind) {
     }
   }
   for (; failures > 0; --failures)
-    (void)record_(kind == team_kind::shared ? shared_thread_failed : pinned_thread_failed);
+    (void)record_(kind == team_kind::shared ? LUMRA_THREADS_SHARED_FAILED : LUMRA_THREADS_PINNED_FAILED);
   return true;
 }
 
@@ -164,7 +159,7 @@ std::int32_t batch_scheduler::run_shared(worker work, void *records, std::uint32
       own.in_use = false;  // a worker takes it back later
     }
   }
-  return in_time ? 0 : record_(shared_timeout);
+  return in_time ? 0 : record_(LUMRA_THREADS_SHARED_TIMEOUT);
 }
 
 /// The oldest task not handed out, or null; `more` when there is another. Takes back the batches that it comes past and
@@ -249,7 +244,7 @@ std::int32_t batch_scheduler::run_pinned(worker work, void *records, std::uint32
     }
     in_time = in_time && await(lock, header);
   }
-  return in_time ? 0 : record_(pinned_timeout);
+  return in_time ? 0 : record_(LUMRA_THREADS_PINNED_TIMEOUT);
 }
 
 void batch_scheduler::serve_pinned(slot &own) {

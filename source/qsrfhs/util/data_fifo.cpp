@@ -19,7 +19,6 @@ namespace {
 using namespace std::chrono_literals;
 
 constexpr std::chrono::milliseconds longest_wait = 100ms;
-constexpr std::int32_t internal_error = -312402;
 
 const platform::fork_participant<fifo_table> takes_part(platform::fork_rank::fifos);
 
@@ -93,33 +92,33 @@ bool data_fifo::has(end &own, const end &other, std::uint32_t count) noexcept {
   return enough();
 }
 
-/// Waits for bytes or room. The other end first publishes its count, then looks for a wish; here it is the other way
+/// Waits for bytes or room. The other end first publishes its count, then looks for a wish; this one goes the other way
 /// round, so that one of the two sees the other.
 std::int32_t data_fifo::wait(std::unique_lock<std::mutex> &lock, end &own, const end &other,
                              std::uint32_t count) noexcept {
   const wanted_bytes::wish made = own.wish.want(count);
   if (has(own, other, count)) {
     (void)own.wish.withdraw(made);
-    return fifo_ok;
+    return LUMRA_SUCCESS;
   }
   ++own.waiting;
   lock.unlock();
   const bool granted = own.wish.wait_for(made, longest_wait);
   lock.lock();
   if (--own.waiting == 0) own.idle.notify_all();
-  if (state_ == state::closing) return fifo_unknown;
+  if (state_ == state::closing) return LUMRA_FIFO_UNKNOWN;
   // A second waiter on this side may have been meant: what cannot fit never goes on.
-  return granted && count <= capacity_ ? fifo_ok : fifo_timed_out;
+  return granted && count <= capacity_ ? LUMRA_SUCCESS : LUMRA_REFUSED;
 }
 
 template <class Copy>
 std::int32_t data_fifo::transfer(std::uint64_t handle, end &own, end &other, std::uint32_t count, Copy copy) noexcept {
   std::unique_lock lock(own.mutex);
-  if (handle_ != handle) return fifo_unknown;
+  if (handle_ != handle) return LUMRA_FIFO_UNKNOWN;
   if (count == 0) return 0;
   const bool waits = !has(own, other, count);
   if (waits) {
-    if (const std::int32_t status = wait(lock, own, other, count); status != fifo_ok) {
+    if (const std::int32_t status = wait(lock, own, other, count); status != LUMRA_SUCCESS) {
       lock.unlock();
       hand_back_if_forgotten();
       return status;
@@ -128,7 +127,7 @@ std::int32_t data_fifo::transfer(std::uint64_t handle, end &own, end &other, std
 
   const std::uint32_t position = own.position, first = std::min(count, capacity_ - position);
   copy(buffer_.get() + position, first, buffer_.get(), count - first);
-  // A wish that was granted is enough; but where a flush came in between, nothing is taken from what comes after it.
+  // A granted wish is enough to copy. But where a flush came in between, the bytes behind it are not taken.
   if (has(own, other, count)) {
     own.position = first < count ? count - first : position + count;
     own.moved = own.moved.load(std::memory_order_relaxed) + count;
@@ -160,21 +159,21 @@ std::int32_t data_fifo::read(std::uint64_t handle, std::byte *destination, std::
 
 std::int32_t data_fifo::flush(std::uint64_t handle) noexcept {
   const std::scoped_lock lock(writer_.mutex, reader_.mutex);
-  if (handle_ != handle) return fifo_unknown;
+  if (handle_ != handle) return LUMRA_FIFO_UNKNOWN;
   const std::uint64_t written = writer_.moved;
   reader_.moved = reader_.seen = writer_.seen = written;
   writer_.position = reader_.position = 0;
-  return fifo_ok;
+  return LUMRA_SUCCESS;
 }
 
 std::int32_t data_fifo::get_status(std::uint64_t handle, std::uint32_t &capacity, std::uint32_t &held) const noexcept {
   const std::uint32_t bytes = capacity_;
   // More than fits may have gone through while we looked.
   const auto in_it = static_cast<std::uint32_t>(std::min<std::uint64_t>(fill(), bytes));
-  if (handle_ != handle) return fifo_unknown;
+  if (handle_ != handle) return LUMRA_FIFO_UNKNOWN;
   capacity = bytes;
   held = in_it;
-  return fifo_ok;
+  return LUMRA_SUCCESS;
 }
 
 void data_fifo::before_fork() noexcept {
@@ -203,7 +202,7 @@ fifo_table &fifo_table::instance() noexcept {
   return table.get();
 }
 
-std::uint64_t fifo_table::create(std::string_view name, std::uint32_t capacity, bool reuse,
+std::uint64_t fifo_table::create(std::string_view name, std::uint32_t capacity, existing same_name,
                                  std::uint64_t **cell_out) noexcept try {
   *cell_out = nullptr;
   auto made = std::make_unique<std::uint64_t>(0);
@@ -223,26 +222,26 @@ std::uint64_t fifo_table::create(std::string_view name, std::uint32_t capacity, 
   }
   if (chosen == slot_count) return 0;
 
-  data_fifo *const existing = slots_[chosen].load();
+  data_fifo *const found = slots_[chosen].load();
   bool replace = false;
-  if (existing) {
+  if (found) {
     std::uint32_t unused = 0, fill = 0;
-    const std::uint64_t handle = existing->handle();
-    (void)existing->get_status(handle, unused, fill);
+    const std::uint64_t handle = found->handle();
+    (void)found->get_status(handle, unused, fill);
     replace = fill < capacity;  // what it holds, not what it could hold: on purpose
-    if (!replace && reuse) {
-      (void)existing->flush(handle);
+    if (!replace && same_name == existing::reused) {
+      (void)found->flush(handle);
       return cell = handle;
     }
   }
   cell = open_in(chosen, name, capacity);
-  if (!existing || cell == 0) return cell;
+  if (!found || cell == 0) return cell;
   if (replace) {
-    existing->close();
-  } else if (!existing->forget()) {
+    found->close();
+  } else if (!found->forget()) {
     return cell;
   }
-  existing->next_spare = std::exchange(spares_, existing);
+  found->next_spare = std::exchange(spares_, found);
   return cell;
 } catch (const std::bad_alloc &) {
   return 0;
@@ -286,13 +285,13 @@ std::int32_t fifo_table::unreserve(std::uint64_t **cell) noexcept {
   {
     const std::lock_guard lock(mutex_);
     const auto found = cells_.find(*cell);
-    if (found == cells_.end()) return fifo_unknown;
+    if (found == cells_.end()) return LUMRA_FIFO_UNKNOWN;
     *cell = nullptr;
     handle = *found->second;
     cells_.erase(found);
   }
   remove(handle);
-  return fifo_ok;
+  return LUMRA_SUCCESS;
 }
 
 void fifo_table::recycle(data_fifo &fifo) noexcept {
@@ -329,16 +328,18 @@ using namespace qsrfhs;
 uint64_t qsLTEHS_DataFIFOCreate(const char *name, uint32_t capacity, uint32_t flags, uint64_t **cellOut) {
   if (!cellOut) return 0;
   const std::string_view known_by(name ? name : "", name ? ::strnlen(name, data_fifo::longest_name) : 0);
-  return fifo_table::instance().create(known_by, capacity, (flags & LUMRA_FIFO_REUSE) != 0, cellOut);
+  using existing = fifo_table::existing;
+  const existing same_name = (flags & LUMRA_FIFO_REUSE) != 0 ? existing::reused : existing::forgotten;
+  return fifo_table::instance().create(known_by, capacity, same_name, cellOut);
 }
 
 int32_t qsLTEHS_DataFIFODelete(uint64_t handle) {
   fifo_table::instance().remove(handle);
-  return fifo_ok;
+  return LUMRA_SUCCESS;
 }
 
 int32_t qsLTEHS_DataFIFOUnreserve(uint64_t **cell) {
-  if (!cell || !*cell) return fifo_unknown;
+  if (!cell || !*cell) return LUMRA_FIFO_UNKNOWN;
   return fifo_table::instance().unreserve(cell);
 }
 
@@ -347,8 +348,8 @@ int32_t qsLTEHS_DataFIFO(uint64_t handle, int32_t direction, const void *source,
   constexpr std::uint32_t longest = std::numeric_limits<std::int32_t>::max();
   const bool reads = direction != LUMRA_FIFO_WRITE;
   data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
-  if (!fifo || count > longest) return fifo_unknown;
-  if (count != 0 && !(reads ? destination : source)) return fifo_unknown;
+  if (!fifo || count > longest) return LUMRA_FIFO_UNKNOWN;
+  if (count != 0 && !(reads ? destination : source)) return LUMRA_FIFO_UNKNOWN;
   const std::uint32_t first = count == 0 ? 0 : offset;  // without bytes to move the memory may be null
   if (reads) return fifo->read(handle, static_cast<std::byte *>(destination) + first, count);
   return fifo->write(handle, static_cast<const std::byte *>(source) + first, count);
@@ -357,7 +358,7 @@ int32_t qsLTEHS_DataFIFO(uint64_t handle, int32_t direction, const void *source,
 int32_t qsLTEHS_DataFIFO_GetStatus(uint64_t handle, uint32_t *capacity, uint32_t *fill) {
   std::uint32_t bytes = 0, held = 0;
   data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
-  const std::int32_t status = fifo ? fifo->get_status(handle, bytes, held) : fifo_unknown;
+  const std::int32_t status = fifo ? fifo->get_status(handle, bytes, held) : LUMRA_FIFO_UNKNOWN;
   if (capacity) *capacity = bytes;
   if (fill) *fill = held;
   return status;
@@ -365,9 +366,9 @@ int32_t qsLTEHS_DataFIFO_GetStatus(uint64_t handle, uint32_t *capacity, uint32_t
 
 int32_t qsLTEHS_DataFIFO_Flush(uint64_t handle) {
   data_fifo *const fifo = handle == 0 ? nullptr : fifo_table::instance().find(handle);
-  return fifo ? fifo->flush(handle) : fifo_unknown;
+  return fifo ? fifo->flush(handle) : LUMRA_FIFO_UNKNOWN;
 }
 
 int32_t qsLTEHS(void) {
-  return internal_error;
+  return LUMRA_NOT_OFFERED;
 }

@@ -16,8 +16,6 @@
 
 namespace qsrfhs {
 
-enum fifo_status : std::int32_t { fifo_ok = 0, fifo_timed_out = -1, fifo_unknown = -2 };
-
 /// A ring of bytes between two ends, each with a lock of its own that is held while it transfers, so that the ends meet
 /// only in the counts of what they moved. The object itself is never freed, only used again, so that a thread which
 /// looked it up while it was being closed finds a lock to take and, behind it, another handle.
@@ -90,7 +88,10 @@ class fifo_table {
     return slots_[handle % slot_count].load(std::memory_order_acquire);
   }
 
-  std::uint64_t create(std::string_view name, std::uint32_t capacity, bool reuse, std::uint64_t **cell) noexcept;
+  /// What becomes of a FIFO of the name that holds as much as is asked for.
+  enum class existing { reused, forgotten };
+  std::uint64_t create(std::string_view name, std::uint32_t capacity, existing same_name,
+                       std::uint64_t **cell) noexcept;
   void remove(std::uint64_t handle) noexcept;
   std::int32_t unreserve(std::uint64_t **cell) noexcept;
   /// Keeps an object that nobody uses for the next FIFO.

@@ -2,6 +2,7 @@
 #include "qsrfhs/util/management.hpp"
 
 #include <lumra/core_services.h>
+#include <lumra/status.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -13,12 +14,6 @@
 
 namespace qsrfhs {
 namespace {
-
-enum error_list_status : std::int32_t {
-  count_null = -67371090,         // 0xFBFBFFAE
-  codes_null = -67371105,         // 0xFBFBFF9F
-  capacity_too_small = -67371113  // 0xFBFBFF97
-};
 
 const platform::fork_participant<Management> takes_part(platform::fork_rank::error_list);
 
@@ -81,14 +76,14 @@ bool Management::copy_errors(std::span<std::int32_t> codes) const {
 using qsrfhs::Management;
 
 int32_t qsrfhs_getErrorCnt(uint64_t *count) {
-  if (!count) return Management::addError(qsrfhs::count_null);
+  if (!count) return Management::addError(LUMRA_ERRORS_COUNT_NULL);
   *count = Management::instance().error_count();
   return 0;
 }
 
 int32_t qsrfhs_getErrors(int32_t *codes, uint64_t capacity) {
-  if (!codes) return Management::addError(qsrfhs::codes_null);
-  if (!Management::instance().copy_errors({codes, capacity})) return Management::addError(qsrfhs::capacity_too_small);
+  if (!codes) return Management::addError(LUMRA_ERRORS_CODES_NULL);
+  if (!Management::instance().copy_errors({codes, capacity})) return Management::addError(LUMRA_ERRORS_CAPACITY);
   return 0;
 }
 

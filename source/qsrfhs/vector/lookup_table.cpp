@@ -1,5 +1,6 @@
 // Gains from a table, applied to samples; long inputs are shared among the library's own threads.
 // SPDX-License-Identifier: MIT
+#include <lumra/status.h>
 #include <lumra/vector_utilities.h>
 
 #include <algorithm>
@@ -16,35 +17,23 @@ using namespace qsrfhs;
 
 namespace {
 
-constexpr std::int32_t table_invalid = -380127;  // 0xFFFA3321
-constexpr std::int32_t out_null = -1;
-
 constexpr std::size_t smallest_shared_count = 65537, samples_per_task = 32768, task_granularity = 32;
 constexpr std::uint32_t max_tasks = 4;
 
 struct lookup_batch;
 
-/// What one task works on. The batch scheduler knows the first three words.
+/// What one task works on.
 struct lookup_record {
-  std::uint32_t index;
-  std::uint32_t slot;
-  std::uint64_t record_index;
-  void *header;
-  float start, step;
-  std::uint64_t count;
-  const float *keys;
-  float *out;
-  const float *in;
   lookup_batch *batch;
-  std::int32_t status;
+  const float *keys, *in;
+  float *out;
+  std::size_t count;
 };
-static_assert(sizeof(lookup_record) == 80 && offsetof(lookup_record, header) == 16);
 
 /// The records of one call. They outlive a call whose batch timed out: it takes its last user to free them.
 struct lookup_batch {
   std::atomic<std::uint32_t> users{0};
-  int entry_count = 0;
-  const float *entries = nullptr;
+  kernels::lookup_table table{};
   lookup_record records[max_tasks]{};
 };
 
@@ -71,12 +60,9 @@ void drop_batch(lookup_batch &batch) noexcept {
 }
 
 void run_task(void *address, void * /*task*/) {
-  auto &record = *static_cast<lookup_record *>(address);
-  lookup_batch &batch = *record.batch;
-  kernels::active().lookup({batch.entries, batch.entry_count, record.start, record.step}, record.keys, record.in,
-                           record.out, record.count);
-  record.status = 0;
-  drop_batch(batch);
+  const auto &record = *static_cast<const lookup_record *>(address);
+  kernels::active().lookup(record.batch->table, record.keys, record.in, record.out, record.count);
+  drop_batch(*record.batch);
 }
 
 std::uint32_t task_count(std::size_t n) noexcept {
@@ -92,27 +78,14 @@ std::int32_t run_shared(const kernels::lookup_table &table, const float *keys, c
     kernels::active().lookup(table, keys, in, out, n);
     return 0;
   }
-  batch->entries = table.entries;
-  batch->entry_count = table.count;
+  batch->table = table;
   const std::size_t share = n / tasks / task_granularity * task_granularity;
   for (std::uint32_t i = 0; i < tasks; ++i) {
     const std::size_t first = i * share;
-    batch->records[i] = {.index = i,
-                         .slot = i,
-                         .record_index = i,
-                         .header = nullptr,
-                         .start = table.start,
-                         .step = table.step,
-                         .count = i + 1 == tasks ? n - first : share,
-                         .keys = keys + first,
-                         .out = out + 2 * first,
-                         .in = in + 2 * first,
-                         .batch = batch,
-                         .status = 0};
+    batch->records[i] = {batch, keys + first, in + 2 * first, out + 2 * first, i + 1 == tasks ? n - first : share};
   }
-  std::int32_t status = Management::instance().RunBatch(&run_task, batch->records, tasks, sizeof(lookup_record),
-                                                        batch_scheduler::shared_mode);
-  for (std::uint32_t i = 0; i < tasks && status == 0; ++i) status = batch->records[i].status;
+  const std::int32_t status = Management::instance().RunBatch(&run_task, batch->records, tasks, sizeof(lookup_record),
+                                                              batch_scheduler::shared_mode);
   drop_batch(*batch);
   return status;
 }
@@ -121,8 +94,8 @@ std::int32_t run_shared(const kernels::lookup_table &table, const float *keys, c
 
 int32_t qsUtilHS_LookupTable(lumra_f32_array keys, lumra_cf32_array in, lumra_cf32_array *out, lumra_cf32_array table,
                              float start, float step) {
-  if (host::elements(table).empty() || step == 0.0F) return table_invalid;
-  if (!out) return out_null;
+  if (host::elements(table).empty() || step == 0.0F) return LUMRA_LOOKUP_TABLE_INVALID;
+  if (!out) return LUMRA_REFUSED;
   // Before an output that is the table gets its new count.
   const int entry_count = static_cast<int>(host::elements(table).size() / 2);
   const std::size_t n = host::has_block(in) ? host::elements(keys).size() : 0;

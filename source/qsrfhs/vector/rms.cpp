@@ -1,4 +1,5 @@
 // Level of a block of samples. Nothing here is recorded in the error list. SPDX-License-Identifier: MIT
+#include <lumra/status.h>
 #include <lumra/vector_utilities.h>
 
 #include <cmath>
@@ -9,8 +10,6 @@
 using namespace qsrfhs;
 
 namespace {
-
-constexpr std::int32_t argument_null = -1;
 
 float root_mean(float sum, std::size_t n) noexcept {
   return std::sqrt(sum / static_cast<float>(n));
@@ -26,7 +25,7 @@ int32_t qsUtilHS_RMS_IQ(lumra_cf32_array x, float *rms) {
 }
 
 int32_t qsUtilHS_RMS_IQ_with_peak_calc(lumra_cf32_array x, float *rms, float *peak) {
-  if (!host::has_block(x) || !rms || !peak) return argument_null;
+  if (!host::has_block(x) || !rms || !peak) return LUMRA_REFUSED;
   const auto samples = host::elements(x);
   float sum = 0, highest = 0;
   kernels::active().sum_power_and_peak(floats(samples), samples.size(), &sum, &highest);

@@ -1,4 +1,5 @@
 // Scaled logarithms of host arrays. Nothing here is recorded in the error list. SPDX-License-Identifier: MIT
+#include <lumra/status.h>
 #include <lumra/vector_utilities.h>
 
 #include "host/host_array.hpp"
@@ -9,12 +10,10 @@ using namespace qsrfhs;
 
 namespace {
 
-constexpr std::int32_t out_null = -1;
-
 template <class Block>
 std::int32_t write_logarithms(Block **x, lumra_f32_array *out, float a, float b,
                               void (*kernel)(const float *, float, float, float *, std::size_t)) noexcept {
-  if (!out) return out_null;
+  if (!out) return LUMRA_REFUSED;
   const auto result = host::size_output(out, host::elements(x).size());
   kernel(floats(host::elements(x)), a, b, floats(result), result.size());
   return 0;
