@@ -27,7 +27,7 @@ enum lumra_fifo_direction { LUMRA_FIFO_WRITE = 0, LUMRA_FIFO_READ = 1 };
  * capacity  in bytes; 0 is allowed
  * flags     LUMRA_FIFO_*
  * cellOut   receives the cell, to be given to qsLTEHS_DataFIFOUnreserve; a cell holding 0 where there is no handle,
- * null where there is no memory for a cell
+ *           null where there is no memory for a cell
  *
  * Where a FIFO of that name exists, what it holds decides, not its capacity:
  *   - it holds fewer bytes than `capacity`: it is closed (its transfers return -2) and replaced;

@@ -162,8 +162,8 @@ LUMRA_EXPORT int32_t qsRFPELTA_zd1DCorrelationH(lumra_cf64_array x, lumra_f64_ar
                                                 lumra_cf64_array scratch, lumra_cf64_array transformScratch,
                                                 void **slot);
 
-/* Cross-correlation of matrices:  r[i, j] = sum over k, l of conj(x[k, l]) y[k + i - (rows_x - 1), l + j - (columns_x -
- * 1)].
+/* Cross-correlation of matrices:
+ *   r[i, j] = sum over k, l of conj(x[k, l]) y[k + i - (rows_x - 1), l + j - (columns_x - 1)]
  *
  * x, y              matrices; the same one twice is allowed
  * out               resized to rows_x + rows_y - 1 rows and columns_x + columns_y - 1 columns; the numbers of

@@ -76,8 +76,8 @@ LUMRA_EXPORT int32_t qsRFHS_complex_magnitude_squared(lumra_cf32_array x, lumra_
  * coefficients    as x; may be the output too
  * output          a handle, not its address. One of another count than n, larger or smaller, is resized to n (size
  *                 argument n * 4, complex n * 8); n = 0 or m = 0 makes it empty. A refused resize is not reported: the
- *                 count stays and results are written as far as it goes. A null handle receives
- *                 nothing. With complex coefficients it must not be x (nothing is evaluated then)
+ *                 count stays and results are written as far as it goes. A null handle receives nothing. With
+ *                 complex coefficients it must not be x (nothing is evaluated then)
  * elapsedSeconds  receives the time that sizing and evaluation took, except for n = 0 or m = 0; may be null
  *
  * Returns 0 always. */
@@ -97,8 +97,8 @@ LUMRA_EXPORT int32_t qsRFHS_ApplyPolynomialCplx(lumra_f32_array x, lumra_cf32_ar
  * qsRFHS_log2_scaled_SGL   in place; a negative value or NaN gives NaN, a zero of either sign a * -126.99997 + b.
  *                          Returns 0 always
  * qsUtilHS_aLog2Plusb_SGL  the same into out, but a zero of either sign gives minus infinity whatever a and b
- * qsUtilHS_aLog2Plusb_IQ   v = re * re + im * im of complex samples; no value is special: zero gives a * -126.99997 +
- * b, a NaN what its bits say (a * 128.585 + b for the usual one)
+ * qsUtilHS_aLog2Plusb_IQ   v = re * re + im * im of complex samples; no value is special: zero gives
+ *                          a * -126.99997 + b, a NaN what its bits say (a * 128.585 + b for the usual one)
  *
  * The two that write out return 0, or -1 when out is null, not recorded. */
 LUMRA_EXPORT int32_t qsRFHS_log2_scaled_SGL(lumra_f32_array x, float a, float b);
@@ -138,8 +138,8 @@ LUMRA_EXPORT int32_t qsUtilHS_RMS_IQ_with_peak_calc(lumra_cf32_array x, float *r
  * in           complex, n samples or more: its count is not looked at; a null handle or block counts as no keys
  * out          sized as above; may be in, not keys nor table
  * table        complex, two elements an entry: value V[k], then slope S[k], the change for one step. An odd last
- * element is ignored; without a whole entry the output is zeros start, step  key of entry 0, distance of the keys; step
- * may be negative or NaN
+ *              element is ignored; without a whole entry the output is zeros
+ * start, step  key of entry 0, distance of the keys; step may be negative or NaN
  *
  * From 65537 samples on, two to four threads of the library share the work: n / 32768 parts, at most 4. They are
  * started at the first such call and end with the process.
