@@ -34,47 +34,53 @@ std::vector<build> builds() {
   return all;
 }
 
-constexpr std::size_t lengths[] = {0, 1, 7, 8, 9, 15, 16, 17, 31, 32, 33, 63, 64, 65, 1003};
-constexpr std::size_t offsets[] = {0, 1, 2, 3, 5, 7};
+/// Where the arrays of a call lie: behind a page that faults, in front of one, or at an odd float.
+enum class place { front, back, odd };
 
 constexpr float inf = std::numeric_limits<float>::infinity();
 constexpr float nan = std::numeric_limits<float>::quiet_NaN();
 constexpr float tiny = std::numeric_limits<float>::denorm_min();
 constexpr float largest = std::numeric_limits<float>::max();
 
-/// Floats at an offset from a boundary of 64 bytes, in memory that ends with them.
-class placed {
+/// Memory for one array, between two pages that fault.
+class room {
  public:
-  placed(std::size_t n, std::size_t offset) : memory_(new (std::align_val_t{64}) float[n + offset]), n_(n) {
-    values_ = memory_.get() + offset;
+  explicit room(std::size_t floats) : floats_(floats / page * page + page), memory_(4 * floats_, tests::edge::front) {}
+  float *put(std::span<const float> values, place at) const {
+    const std::size_t offset = at == place::back ? floats_ - values.size() : at == place::odd ? 1 : 0;
+    std::copy(values.begin(), values.end(), memory_.as<float>() + offset);
+    return memory_.as<float>() + offset;
   }
-  [[nodiscard]] float *data() const { return values_; }
-  [[nodiscard]] std::span<float> values() const { return {values_, n_}; }
 
  private:
-  struct free_aligned {
-    void operator()(float *memory) const { ::operator delete[](memory, std::align_val_t{64}); }
-  };
-  std::unique_ptr<float[], free_aligned> memory_;
-  float *values_;
-  std::size_t n_;
+  static constexpr std::size_t page = 1024;
+  std::size_t floats_;
+  tests::guarded memory_;
+};
+
+/// For both inputs and the output of a call.
+struct rooms {
+  explicit rooms(std::size_t floats) : x(floats), y(floats), out(floats) {}
+  room x, y, out;
 };
 
 /// Ordinary values of all magnitudes, among them every kind of special one.
-void fill(std::span<float> values, unsigned seed) {
+std::vector<float> filled(std::size_t n, unsigned seed) {
+  std::vector<float> values(n);
   constexpr float special[] = {0,   -0.0F, 1,   -1,   2,       0.5F,     tiny, -tiny,  1.17549435e-38F,
                                inf, -inf,  nan, -nan, largest, -largest, 3,    1e-30F, -1e25F};
   std::mt19937 random(seed);
   std::uniform_real_distribution<float> mantissa(-2, 2);
   std::uniform_int_distribution<int> kind(0, 99), exponent(-140, 126);
   constexpr std::size_t period = 5003;
-  for (float &value : values.first(std::min(period, values.size()))) {
-    const int k = kind(random);
-    value = k < 12   ? special[random() % std::size(special)]
-            : k < 40 ? std::ldexp(mantissa(random), exponent(random))
-                     : mantissa(random) * 8;
+  for (std::size_t i = 0; i < n; ++i) {
+    const int k = i < period ? kind(random) : 0;
+    values[i] = i >= period ? values[i - period]
+                : k < 12    ? special[random() % std::size(special)]
+                : k < 40    ? std::ldexp(mantissa(random), exponent(random))
+                            : mantissa(random) * 8;
   }
-  for (std::size_t i = period; i < values.size(); ++i) values[i] = values[i - period];
+  return values;
 }
 
 bool same(float a, float b) {
@@ -276,8 +282,7 @@ std::vector<operation> operations() {
                    [a, b](auto x, auto, auto out) { *out = a * define_log2(define_power(x)) + b; }});
   }
   for (const std::size_t m : {1U, 2U, 9U, 33U}) {
-    std::vector<float> c(2 * m);
-    fill(c, static_cast<unsigned>(m));
+    std::vector<float> c = filled(2 * m, static_cast<unsigned>(m));
     std::replace_if(
         c.begin(), c.end(), [](float v) { return !(std::abs(v) < 100); }, 0.75F);
     const std::vector<float> real(c.begin(), c.begin() + static_cast<std::ptrdiff_t>(m));
@@ -316,81 +321,51 @@ std::vector<float> define(const operation &op, std::span<const float> x, std::sp
   return out;
 }
 
-void check(const operation &op, std::size_t n, std::size_t offset) {
-  SCOPED_TRACE(testing::Message() << op.name << " n " << n << " offset " << offset);
-  const placed x(n * op.x_width, offset), y(n * op.y_width, (offset + 3) % 8), out(n * op.out_width, (offset * 5) % 16);
-  fill(x.values(), static_cast<unsigned>(n));
-  fill(y.values(), static_cast<unsigned>(n + 1));
-  const std::vector<float> expected = define(op, x.values(), y.values(), n);
-  for (const build &b : builds()) {
-    SCOPED_TRACE(b.name);
-    std::fill(out.values().begin(), out.values().end(), -77.0F);
-    op.run(*b.table, x.data(), y.data(), out.data(), n);
-    EXPECT_TRUE(same(expected, out.values()));
-  }
-}
+/// Which input the output is, too.
+enum class output { apart, over_x, over_y };
 
-TEST(VectorKernels, BothBuildsFollowTheFormulas) {
-  for (const operation &op : operations())
-    for (const std::size_t n : lengths)
-      for (const std::size_t offset : offsets) check(op, n, offset);
-}
-
-TEST(VectorKernels, NothingBesidesTheArraysIsTouched) {
-  std::vector<std::size_t> all_lengths = {63, 64, 65, 127, 1003};
-  for (std::size_t n = 0; n <= 40; ++n) all_lengths.push_back(n);
-  for (const operation &op : operations())
-    for (const std::size_t n : all_lengths)
-      for (const tests::edge at : {tests::edge::front, tests::edge::back}) {
-        SCOPED_TRACE(testing::Message() << op.name << " n " << n << (at == tests::edge::back ? " back" : " front"));
-        std::vector<float> first(n * op.x_width), second(n * op.y_width);
-        fill(first, static_cast<unsigned>(n));
-        fill(second, static_cast<unsigned>(n + 1));
-        const std::vector<float> expected = define(op, first, second, n);
-        const tests::guarded x(first, at), y(second, at), out(std::vector<float>(expected.size()), at);
-        for (const build &b : builds()) {
-          op.run(*b.table, x.as<float>(), y.as<float>(), out.as<float>(), n);
-          EXPECT_TRUE(same(expected, {out.as<float>(), expected.size()})) << b.name;
-        }
-      }
-  for (const std::size_t n : all_lengths)
-    for (const tests::edge at : {tests::edge::front, tests::edge::back}) {
-      const tests::guarded x(std::vector<float>(2 * n, 1.0F), at), sum(sizeof(float), at), peak(sizeof(float), at);
-      for (const build &b : builds()) {
-        EXPECT_EQ(2.0F * static_cast<float>(n), b.table->sum_power(x.as<float>(), n));
-        b.table->sum_power_and_peak(x.as<float>(), n, sum.as<float>(), peak.as<float>());
-        EXPECT_EQ(2.0F * static_cast<float>(n), *sum.as<float>());
-      }
+void check(const rooms &in, const operation &op, std::size_t n, place at) {
+  const auto first = filled(n * op.x_width, static_cast<unsigned>(n));
+  const auto second = filled(n * op.y_width, static_cast<unsigned>(n + 1));
+  const std::vector<float> expected = define(op, first, second, n), before(expected.size(), -77.0F);
+  for (const build &b : builds())
+    for (const output where : {output::apart, output::over_x, output::over_y}) {
+      const std::size_t width = where == output::over_x ? op.x_width : op.y_width;
+      if (where != output::apart && (!op.in_place || op.out_width > width)) continue;
+      float *const x = in.x.put(first, at), *const y = in.y.put(second, at);
+      float *const out = where == output::over_x ? x : where == output::over_y ? y : in.out.put(before, at);
+      op.run(*b.table, x, y, out, n);
+      EXPECT_TRUE(same(expected, {out, expected.size()}))
+          << b.name << ' ' << op.name << " n " << n << " place " << static_cast<int>(at) << " output "
+          << static_cast<int>(where);
     }
+}
+
+std::vector<std::size_t> lengths() {
+  std::vector<std::size_t> all = {63, 64, 65, 127, 1003};
+  for (std::size_t n = 0; n <= 40; ++n) all.push_back(n);
+  return all;
+}
+constexpr place places[] = {place::front, place::back, place::odd};
+
+TEST(VectorKernels, BothBuildsFollowTheFormulasAndTouchNothingElse) {
+  const rooms in(2048);
+  for (const operation &op : operations())
+    for (const std::size_t n : lengths())
+      for (const place at : places) check(in, op, n, at);
 }
 
 // Complex outputs that bypass the caches; how they are stored depends on the shape of the operation only.
 TEST(VectorKernels, LongArraysComeOutTheSame) {
-  std::set<std::array<std::size_t, 3>> shapes;
-  for (const operation &op : operations()) {
-    if (op.out_width != 2 || !shapes.insert({op.x_width, op.y_width, op.out_width}).second) continue;
-    const std::size_t n = (std::size_t{24} << 20) / (4 * (op.x_width + op.y_width + op.out_width)) + 1003;
-    for (const std::size_t offset : {0U, 1U}) check(op, n, offset);
+  constexpr std::size_t floats = std::size_t{24} << 18;
+  const rooms in(floats);
+  std::set<std::array<std::size_t, 2>> shapes;
+  for (operation op : operations()) {
+    if (op.out_width != 2 || !shapes.insert({op.x_width, op.y_width}).second) continue;
+    op.in_place = false;
+    for (const place at : {place::back, place::odd})
+      check(in, op, floats / (op.x_width + op.y_width + op.out_width) + 1003, at);
   }
-}
-
-TEST(VectorKernels, AnOutputMayBeAnInput) {
-  for (const operation &op : operations())
-    for (const std::size_t n : lengths)
-      for (const bool over_x : {true, false}) {
-        if (!op.in_place || op.out_width > (over_x ? op.x_width : op.y_width)) continue;
-        SCOPED_TRACE(testing::Message() << op.name << " n " << n << (over_x ? " over x" : " over y"));
-        for (const build &b : builds()) {
-          SCOPED_TRACE(b.name);
-          const placed x(n * op.x_width, 1), y(n * op.y_width, 1);
-          fill(x.values(), 1);
-          fill(y.values(), 2);
-          const std::vector<float> expected = define(op, x.values(), y.values(), n);
-          float *out = over_x ? x.data() : y.data();
-          op.run(*b.table, x.data(), y.data(), out, n);
-          EXPECT_TRUE(same(expected, {out, expected.size()}));
-        }
-      }
 }
 
 TEST(VectorKernels, LookupIndicesBeyondTheExactFloats) {
@@ -421,28 +396,28 @@ float define_sum(std::span<const float> x) {
 }
 
 TEST(VectorKernels, SumsKeepTheirOrder) {
-  for (const std::size_t n : lengths)
-    for (const std::size_t offset : offsets)
+  const rooms in(2048);
+  for (const std::size_t n : lengths())
+    for (const place at : places)
       for (const bool with_specials : {false, true}) {
-        SCOPED_TRACE(testing::Message() << "n " << n << " offset " << offset);
-        const placed x(2 * n, offset);
-        fill(x.values(), static_cast<unsigned>(n + offset));
+        auto values = filled(2 * n, static_cast<unsigned>(n));
         if (!with_specials)
-          for (float &v : x.values()) v = std::isfinite(v) && std::abs(v) < 1e15F ? v : 0.1F;
+          for (float &v : values) v = std::isfinite(v) && std::abs(v) < 1e15F ? v : 0.1F;
         float sequential = 0, peak = -largest;
         for (std::size_t i = 0; i < n; ++i) {
-          const float power = define_power(x.data() + 2 * i);
+          const float power = define_power(&values[2 * i]);
           sequential += power;
           if (power > peak) peak = power;
         }
+        const float *const x = in.x.put(values, at);
+        float *const sum = in.y.put(std::array{0.0F}, at), *const highest = in.out.put(std::array{0.0F}, at);
         for (const build &b : builds()) {
-          SCOPED_TRACE(b.name);
-          EXPECT_TRUE(same(define_sum(x.values()), b.table->sum_power(x.data(), n)));
-          float sum = 0, highest = 0;
-          b.table->sum_power_and_peak(x.data(), n, &sum, &highest);
-          EXPECT_TRUE(same(peak, highest));
+          SCOPED_TRACE(testing::Message() << b.name << " n " << n << " place " << static_cast<int>(at));
+          EXPECT_TRUE(same(define_sum(values), b.table->sum_power(x, n)));
+          b.table->sum_power_and_peak(x, n, sum, highest);
+          EXPECT_TRUE(same(peak, *highest));
           const bool in_lanes = b.table == &qsrfhs::kernels::avx_kernels;
-          EXPECT_TRUE(same(in_lanes ? define_sum(x.values()) : sequential, sum));
+          EXPECT_TRUE(same(in_lanes ? define_sum(values) : sequential, *sum));
         }
       }
 }
