@@ -5,13 +5,13 @@
 #include <complex>
 #include <limits>
 #include <numbers>
-#include <random>
 #include <thread>
 #include <vector>
 
 #include "c_support/base/session.hpp"
 #include "support/near.hpp"
 #include "support/session.hpp"
+#include "support/signals.hpp"
 #include "support/test_array.hpp"
 
 namespace {
@@ -24,14 +24,6 @@ using complex = std::complex<double>;
 constexpr double nan = std::numeric_limits<double>::quiet_NaN();
 constexpr double inf = std::numeric_limits<double>::infinity();
 
-std::vector<lumra_cf32> noise(std::size_t count) {
-  std::mt19937 random(42);
-  std::normal_distribution<float> value;
-  std::vector<lumra_cf32> samples(count);
-  for (auto &s : samples) s = {value(random), value(random)};
-  return samples;
-}
-
 /// Window as its formula has it, in double precision; no window for other types.
 double window_value(std::int32_t type, std::size_t k, std::size_t n) {
   const double x = 2 * std::numbers::pi * static_cast<double>(k) / static_cast<double>(n);
@@ -43,19 +35,15 @@ double window_value(std::int32_t type, std::size_t k, std::size_t n) {
 
 /// The averaged power spectrum by its definition.
 std::vector<double> spectrum(std::span<const lumra_cf32> x, std::int32_t type, std::size_t n, std::size_t step) {
-  std::vector<complex> root(n);
-  for (std::size_t k = 0; k < n; ++k)
-    root[k] = std::polar(1.0, -2 * std::numbers::pi * static_cast<double>(k) / static_cast<double>(n));
   std::vector<double> sum(n, 0.0);
-  std::size_t segments = 0;
-  for (std::size_t start = 0; start + n <= x.size(); start += step, ++segments)
-    for (std::size_t bin = 0; bin < n; ++bin) {
-      complex value = 0;
-      for (std::size_t k = 0; k < n; ++k)
-        value += complex(x[start + k].re, x[start + k].im) * window_value(type, k, n) * root[k * bin % n];
-      sum[bin] += std::norm(value);
-    }
-  for (double &s : sum) s /= static_cast<double>(segments);
+  std::vector<complex> segment(n);
+  const std::size_t segments = (x.size() - n) / step + 1;
+  for (std::size_t start = 0; start < segments * step; start += step) {
+    for (std::size_t k = 0; k < n; ++k)
+      segment[k] = complex(x[start + k].re, x[start + k].im) * window_value(type, k, n);
+    const auto bins = tests::transform_of(segment, -1);
+    for (std::size_t k = 0; k < n; ++k) sum[k] += std::norm(bins[k]) / static_cast<double>(segments);
+  }
   return sum;
 }
 
@@ -88,7 +76,7 @@ TEST(WindowedFft, MatchesItsDefinition) {
   } rows[] = {{0, 16, 0, 16, 16},     {0, 16, 50, 40, 8},     {1, 64, 75, 1000, 16}, {1, 16, 99.99, 40, 1},
               {2, 64, 50, 333, 32},   {2, 17, 0, 60, 17},     {1, 19, 20, 200, 16},  {1, 500, 33.35, 3000, 334},
               {0, 128, 0, 1000, 128}, {1, 256, 50, 2000, 128}};
-  const auto samples = noise(5000);
+  const auto samples = tests::noise_of<lumra_cf32>(5000);
   const open_session session;
   for (const auto &r : rows) {
     SCOPED_TRACE(testing::Message() << "window " << r.window << " N " << r.n << " overlap " << r.overlap);
@@ -107,7 +95,7 @@ TEST(WindowedFft, MatchesItsDefinition) {
 }
 
 TEST(WindowedFft, APreparedTransformAndAResetChangeNothing) {
-  const auto samples = noise(3000);
+  const auto samples = tests::noise_of<lumra_cf32>(3000);
   const open_session session;
   ASSERT_EQ(0, qsLumraAlgo_InitializeWindow(session, 1, 256));
   const auto cold = measure(session, 1, 256, 50, samples).power;
@@ -120,7 +108,7 @@ TEST(WindowedFft, APreparedTransformAndAResetChangeNothing) {
 }
 
 TEST(WindowedFft, RefusesInOrder) {
-  const auto samples = noise(16);
+  const auto samples = tests::noise_of<lumra_cf32>(16);
   const open_session session;
   cf32_array input(samples);
   const lumra_waveform in{0, 1e-6, input.handle()};
@@ -151,7 +139,7 @@ TEST(WindowedFft, RefusesInOrder) {
 }
 
 TEST(WindowedFft, SizesItsOutputOnceAndSurvivesARefusal) {
-  const auto samples = noise(64);
+  const auto samples = tests::noise_of<lumra_cf32>(64);
   const open_session session;
   cf32_array input(samples);
   const lumra_waveform in{0, 1e-6, input.handle()};
@@ -180,7 +168,7 @@ TEST(WindowedFft, SizesItsOutputOnceAndSurvivesARefusal) {
 }
 
 TEST(WindowedFft, NonFiniteTimesAndSamplesPropagate) {
-  auto samples = noise(32);
+  auto samples = tests::noise_of<lumra_cf32>(32);
   const open_session session;
   EXPECT_EQ(-inf, measure(session, 0, 16, 0, samples, 0.0).f0);
   EXPECT_TRUE(std::isnan(measure(session, 0, 16, 0, samples, nan).df));
@@ -199,7 +187,7 @@ TEST(WindowedFft, SizesBeyondTheLimitAreLoggedAndLeaveTheSessionUsable) {
   }
   const auto &context = c_support::SessionManager::instance().get(session)->context;
   EXPECT_EQ(0, context.transforms.idle_count());
-  EXPECT_EQ(0, measure(session, 0, 16, 0, noise(16)).code);
+  EXPECT_EQ(0, measure(session, 0, 16, 0, tests::noise_of<lumra_cf32>(16)).code);
 }
 
 TEST(Windows, AreCachedWithAlternatingSign) {
@@ -220,7 +208,7 @@ TEST(Windows, AreCachedWithAlternatingSign) {
 }
 
 TEST(SessionConcurrency, CallsShareASessionThatIsResetAndClosed) {
-  const auto samples = noise(2000);
+  const auto samples = tests::noise_of<lumra_cf32>(2000);
   std::uint64_t session = 0;
   ASSERT_EQ(0, qsLumraAlgo_CreateSession(&session));
   {

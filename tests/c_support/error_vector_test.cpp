@@ -7,8 +7,8 @@
 #include <complex>
 #include <functional>
 #include <numbers>
-#include <random>
 
+#include "support/signals.hpp"
 #include "support/test_array.hpp"
 
 namespace {
@@ -30,17 +30,13 @@ const comparison comparisons[] = {
     {"phase", &qsLumraAlgo_CalculatePhaseError2D, [](auto a, auto b) { return std::arg(b * std::conj(a)); }}};
 
 TEST(ErrorVector, MatchesItsDefinition) {
-  std::mt19937 random(1);
-  std::normal_distribution<float> normal;
   for (const comparison &c : comparisons)
     for (const auto &[rows, columns] : {std::pair{1, 1}, {7, 9}, {1, 2048}, {3, 683}, {64, 129}}) {
       const auto n = static_cast<std::size_t>(rows * columns);
-      cf32_matrix a(rows, columns), b(columns, rows);  // only the number of elements matters
+      const auto noise = tests::noise_of<lumra_cf32>(2 * n);
+      cf32_matrix a(rows, columns, std::span(noise).first(n));
+      cf32_matrix b(columns, rows, std::span(noise).last(n));  // only the number of elements matters
       f32_matrix e(1, rows * columns);
-      for (std::size_t i = 0; i < n; ++i) {
-        a.block()->elements[i] = {normal(random), normal(random)};
-        b.block()->elements[i] = {normal(random), normal(random)};
-      }
       // Units of the values: 2^-22 and 2^-23 of rounding, and half of the bits.
       for (const auto &[mode, bound] : {std::pair{1, 4e-6}, {2, 2e-6}, {3, 4e-3}}) {
         SCOPED_TRACE(testing::Message() << c.name << " n " << n << " mode " << mode);

@@ -13,6 +13,7 @@
 #include <set>
 #include <thread>
 
+#include "fault/session_calls.hpp"
 #include "qsrfhs/util/batch_scheduler.hpp"
 #include "support/failing_malloc.h"
 #include "support/session.hpp"
@@ -158,36 +159,21 @@ TEST(SessionMemory, RunsOut) {
     if (code == 0) qsLumraAlgo_CloseSession(session);
     return outcome(code);
   });
-  // The calls of a measurement, each after those in front of it. 1009: MKL's transforms of primes allocate most.
+  // Each call after those in front of it. 1009: MKL's transforms of primes allocate most.
   constexpr std::int32_t n = 1009;
-  struct call {
-    const char *name;
-    std::int32_t (*run)(std::uint64_t session, const lumra_waveform &in, lumra_spectrum &out);
-  };
-  const call calls[] = {
-      {"InitializeFFT", [](auto s, auto &, auto &) { return qsLumraAlgo_InitializeFFT(s, n); }},
-      {"InitializeWindow", [](auto s, auto &, auto &) { return qsLumraAlgo_InitializeWindow(s, 1, n); }},
-      {"spectrum",
-       [](auto s, auto &in, auto &out) { return qsLumraAlgo_PerformWindowingFFTAndIQTransform(s, 1, n, &in, &out); }},
-      {"ResetSession", [](auto s, auto &, auto &) { return qsLumraAlgo_ResetSession(s); }},
-      {"overlapped spectrum, unprepared",
-       [](auto s, auto &in, auto &out) {
-         return qsLumraAlgo_PerformWindowingOverlappedSeqFFTAndIQTransform(s, 1, n, 50, &in, &out);
-       }},
-  };
   cf32_array input = filled<toolkit::c>(noise<toolkit::c>(4 * n));
-  for (const call &last : calls)
+  for (const session_call &last : session_calls)
     exhaust(last.name, {-380122, kept_count}, everywhere, [&](auto &limit) {
       lumra_waveform in{0, 1, input.handle()};
       lumra_spectrum out{-1, -1, nullptr};
       const open_session session;
-      for (const call *c = calls; c != &last; ++c) EXPECT_EQ(0, c->run(session, in, out));
+      for (const session_call *c = session_calls; c != &last; ++c) EXPECT_EQ(0, c->run(session, n, in, out));
       qsHost_ArrayFree(&out.y);
       out = {-1, -1, nullptr};
-      const std::int32_t code = limit([&] { return last.run(session, in, out); });
+      const std::int32_t code = limit([&] { return last.run(session, n, in, out); });
       if (code != 0) {
         EXPECT_EQ(-1, out.f0);
-        EXPECT_EQ(0, last.run(session, in, out));  // the same session goes on
+        EXPECT_EQ(0, last.run(session, n, in, out));  // the same session goes on
       }
       const outcome result = out.df == -1 ? outcome(code) : of_output(code, out.y, n);
       qsHost_ArrayFree(&out.y);

@@ -1,7 +1,9 @@
 // Sessions while MKL fails, at every place where it can. SPDX-License-Identifier: MIT
 #include <lumra/session.h>
 
-#include "c_support/base/session.hpp"
+#include <mkl_dfti.h>
+
+#include "fault/session_calls.hpp"
 #include "support/faults.hpp"
 #include "support/session.hpp"
 #include "support/test_array.hpp"
@@ -11,22 +13,6 @@ namespace {
 using namespace tests;
 
 constexpr std::int32_t n = 64;
-
-/// The calls of a measurement on one session, in the order in which a user makes them.
-struct call {
-  const char *name;
-  std::int32_t (*run)(std::uint64_t session, const lumra_waveform &in, lumra_spectrum &out);
-};
-const call calls[] = {
-    {"InitializeFFT", [](auto s, auto &, auto &) { return qsLumraAlgo_InitializeFFT(s, n); }},
-    {"InitializeWindow", [](auto s, auto &, auto &) { return qsLumraAlgo_InitializeWindow(s, 1, n); }},
-    {"unknown window", [](auto s, auto &, auto &) { return qsLumraAlgo_InitializeWindow(s, 9, n); }},
-    {"prepared",
-     [](auto s, auto &in, auto &out) { return qsLumraAlgo_PerformWindowingFFTAndIQTransform(s, 1, n, &in, &out); }},
-    {"reset", [](auto s, auto &, auto &) { return qsLumraAlgo_ResetSession(s); }},
-    {"unprepared",
-     [](auto s, auto &in, auto &out) { return qsLumraAlgo_PerformWindowingFFTAndIQTransform(s, 1, n, &in, &out); }},
-};
 
 /// Each operation inside each call fails in turn. A failure is an internal error and a log entry, and the call succeeds
 /// when it is repeated.
@@ -38,13 +24,13 @@ TEST(SessionFaults, MklFailsAtEveryCall) {
   lumra_spectrum out{};
   const open_session session;
   int failures = 0;
-  for (const call &c : calls) {
+  for (const session_call &c : session_calls) {
     SCOPED_TRACE(c.name);
     fail_each(
         transforms,
         [&] {
           out = {-1, -1, output.handle()};
-          return c.run(session, in, out);
+          return c.run(session, n, in, out);
         },
         [&](std::int32_t code, bool failed) {
           EXPECT_TRUE(failed || code == 0);

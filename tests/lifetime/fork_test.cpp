@@ -1,37 +1,19 @@
 // Forks while other threads are inside the library: the child uses all of it. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
-#include <pthread.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <atomic>
 #include <chrono>
-#include <cstdio>
-#include <filesystem>
 #include <thread>
 #include <vector>
 
 #include "lifetime/caller.hpp"
+#include "support/process.hpp"
 
 namespace {
 
 using lifetime::caller;
 using lifetime::shared_objects;
-
-/// Exit status of a child that runs work; -1 where it crashes, or hangs for longer than any work may take. It leaves at
-/// once: exit() would have it destroy what threads of the parent use.
-template <class Work>
-int in_child(Work &&work) {
-  std::fflush(nullptr);
-  const pid_t child = fork();
-  if (child == 0) {
-    alarm(10);
-    _exit(work() ? 0 : 1);
-  }
-  int status = 0;
-  waitpid(child, &status, 0);
-  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-}
+using tests::in_child;
 
 /// Threads that are in the library as long as this lives.
 template <class Work>
@@ -153,17 +135,12 @@ TEST(QuietFork, InsideAHostsResizeService) {
   for (lumra_cf32_array *array : {&out, &in, &scratch}) (void)qsHost_ArrayFree(array);
 }
 
-std::ptrdiff_t thread_count() {
-  const std::filesystem::directory_iterator tasks("/proc/self/task");
-  return std::distance(begin(tasks), end(tasks));
-}
-
 TEST(Sessions, HaveNoThreadsOfTheirOwn) {
   shared_objects shared;
   std::vector<std::uint64_t> sessions(5000);
-  const auto before = thread_count();
+  const auto before = tests::thread_count();
   for (std::uint64_t &session : sessions) ASSERT_EQ(0, qsLumraAlgo_CreateSession(&session));
-  EXPECT_EQ(before, thread_count());
+  EXPECT_EQ(before, tests::thread_count());
   EXPECT_EQ(0, in_child([&] { return caller(shared, 1).call_all(); }));
   for (const std::uint64_t session : sessions) EXPECT_EQ(0, qsLumraAlgo_CloseSession(session));
 }

@@ -1,9 +1,6 @@
 // Transform pool, worker pool. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <filesystem>
 #include <latch>
 #include <memory>
 #include <string_view>
@@ -14,6 +11,7 @@
 #include "qsrfhs/math/exceptions.hpp"
 #include "qsrfhs/math/fft.hpp"
 #include "qsrfhs/util/thread_pool.hpp"
+#include "support/process.hpp"
 
 namespace {
 
@@ -86,16 +84,11 @@ TEST(ThreadPoolConcurrency, DroppedWorkersFinishTheirTaskAndTheRestServeTheQueue
   }
 }
 
-std::ptrdiff_t thread_count() {
-  const std::filesystem::directory_iterator tasks("/proc/self/task");
-  return std::distance(begin(tasks), end(tasks));
-}
-
 TEST(ThreadPool, HasNoThreadsBeforeItsFirstTask) {
-  const auto before = thread_count();
+  const auto before = tests::thread_count();
   ctpl::thread_pool pool(8);
   EXPECT_EQ(8, pool.size());
-  EXPECT_GE(before, thread_count());  // fewer where another test's have just left
+  EXPECT_GE(before, tests::thread_count());  // fewer where another test's have just left
   EXPECT_EQ(7, pool.push([](std::int32_t) { return 7; }).get());
 }
 
@@ -111,18 +104,11 @@ TEST(ThreadPoolFork, WorkersStartAnewInTheChild) {
   running.wait();
   auto queued = pool.push([](std::int32_t) { return 1; });
   pool.before_fork();
-  const pid_t child = fork();
-  if (child == 0) {
-    pool.after_fork_in_child();
-    alarm(20);
-    const int later = pool.push([](std::int32_t) { return 2; }).get();
-    _exit(queued.get() + later);
-  }
+  EXPECT_EQ(0, tests::in_child([&] {
+              pool.after_fork_in_child();
+              return pool.push([](std::int32_t) { return 2; }).get() == 2 && queued.get() == 1;
+            }));
   pool.after_fork_in_parent();
-  int status = 0;
-  waitpid(child, &status, 0);
-  EXPECT_TRUE(WIFEXITED(status));
-  EXPECT_EQ(3, WEXITSTATUS(status));
   release.count_down();
   EXPECT_EQ(1, queued.get());
 }

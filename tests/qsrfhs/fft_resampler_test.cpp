@@ -9,13 +9,13 @@
 #include <cmath>
 #include <cstring>
 #include <numbers>
-#include <random>
 #include <thread>
 #include <vector>
 
 #include "qsrfhs/math/filter_design.hpp"
 #include "support/near.hpp"
 #include "support/recorded.hpp"
+#include "support/signals.hpp"
 
 namespace {
 
@@ -38,23 +38,6 @@ struct lent {
   ~lent() { qsUtilHS_FreeArrayIDH_CSG(key); }
 };
 
-std::vector<sample> noise(std::size_t n, unsigned seed) {
-  std::mt19937 random(seed);
-  std::normal_distribution<float> value;
-  std::vector<sample> x(n);
-  for (sample &s : x) s = {value(random), value(random)};
-  return x;
-}
-
-std::vector<exact> transform(const std::vector<exact> &x, double sign) {
-  const std::size_t n = x.size();
-  std::vector<exact> y(n);
-  for (std::size_t k = 0; k < n; ++k)
-    for (std::size_t i = 0; i < n; ++i)
-      y[k] += x[i] * std::polar(1.0, sign * 2 * pi * static_cast<double>(k * i % n) / static_cast<double>(n));
-  return y;
-}
-
 // Bin j of a channel, bin by bin, as it is defined.
 exact channel_bin(const std::vector<exact> &spectrum, std::int64_t m, std::int64_t centre, std::int64_t j) {
   const auto n = static_cast<std::int64_t>(spectrum.size());
@@ -72,9 +55,9 @@ TEST(FftResampler, ABlockIsTheDirectComputation) {
   for (const row &r : {row{64, 16, 3}, row{64, 64, 5}, row{60, 12, 2}, row{64, 48, 0}, row{50, 13, 4}}) {
     const qsrfhs::resampler_plan plan{r.n, r.m, r.overlap};
     const lent forward(r.n, 0, 0), inverse(r.m, 1, 1);
-    const auto x = noise(r.n, r.n + r.m), w = noise(r.m, 9);
+    const auto x = tests::noise_of<sample>(r.n, r.n + r.m), w = tests::noise_of<sample>(r.m, 9);
     std::vector<sample> work(r.n);
-    const auto spectrum = transform({x.begin(), x.end()}, -1);
+    const auto spectrum = tests::transform_of({x.begin(), x.end()}, -1);
     const auto *const weights = reinterpret_cast<const float *>(w.data());
     const auto n = static_cast<std::int64_t>(r.n), m = static_cast<std::int64_t>(r.m);
     std::vector<std::int64_t> centres;
@@ -97,7 +80,7 @@ TEST(FftResampler, ABlockIsTheDirectComputation) {
           bins[static_cast<std::size_t>(swapped)] =
               exact(bin.real() * weight.real(), bin.imag() * weight.imag()) * std::polar(1.0, phase);
         }
-        const auto block = transform(bins, 1);
+        const auto block = tests::transform_of(bins, 1);
         const std::size_t from = first ? 0 : r.overlap, kept = r.m - r.overlap - from;
         EXPECT_EQ(kept, channels[i].produced);
         for (std::size_t k = 0; k < kept; ++k)
@@ -132,7 +115,7 @@ TEST(FftResampler, BlocksJoinWithoutSeamAndAlias) {
     double phase;
   };
   const row rows[] = {{128, 32, 0}, {128, 16, 0.7}, {40, 32, 0}, {200, 8, -2}, {16, 32, 0}, {239, 32, 1}, {120, 4, 0}};
-  const auto x = noise(n + blocks * plan.hop(), 5);
+  const auto x = tests::noise_of<sample>(n + blocks * plan.hop(), 5);
   std::vector<std::vector<sample>> out(std::size(rows), std::vector<sample>(1000));
   std::vector<qsrfhs::resampler_channel> channels;
   for (std::size_t i = 0; i < std::size(rows); ++i)
@@ -169,7 +152,7 @@ TEST(FftResampler, BlocksJoinWithoutSeamAndAlias) {
 TEST(FftResampler, NothingIsWrittenBeyondTheOutput) {
   const qsrfhs::resampler_plan plan{32, 16, 4};
   const lent forward(32, 0, 0), inverse(16, 1, 1);
-  const auto x = noise(32, 1), w = noise(16, 2);
+  const auto x = tests::noise_of<sample>(32, 1), w = tests::noise_of<sample>(16, 2);
   std::vector<sample> work(32), out(16, sample(5));
   const auto *const weights = reinterpret_cast<const float *>(w.data());
   for (const std::uint64_t offset : {std::uint64_t{0}, std::uint64_t{2}, std::uint64_t{3}, ~std::uint64_t{0} / 2}) {

@@ -1,4 +1,4 @@
-// Filter-spec registry and its designs. SPDX-License-Identifier: MIT
+// The registry of filters and its designs. SPDX-License-Identifier: MIT
 #include "qsrfhs/math/filter_registry.hpp"
 
 #include <gtest/gtest.h>
@@ -32,8 +32,8 @@ struct registered {
   lumra_filter_record record{};
   std::int32_t status;
 
-  explicit registered(const lumra_filter_key &spec, const void *input = nullptr, std::uint64_t count = 0)
-      : key(spec), status(qsUtilHS_RegisterFilterSpec(&record, input, &spec, count)) {}
+  explicit registered(const lumra_filter_key &of, const void *input = nullptr, std::uint64_t count = 0)
+      : key(of), status(qsUtilHS_RegisterFilterSpec(&record, input, &key, count)) {}
   registered(const registered &) = delete;
   registered &operator=(const registered &) = delete;
   ~registered() {
@@ -132,50 +132,34 @@ TEST(FilterDesign, RefusesWhatMakesNoFilter) {
   empty.block()->count = 0;
   negative.block()->count = -1;
   struct row {
-    lumra_filter_key key;
-    const void *input;
+    std::int32_t kind;
+    double values[4];
     std::uint64_t count;
   };
-  const row rows[] = {{key_of(3, 1, 1, 1, 1), given, 0},
-                      {key_of(-1, 1, 1, 1, 1), given, 0},
-                      {key_of(0, 1), nullptr, 0},
-                      {key_of(0, 1), empty, 0},
-                      {key_of(0, 1), negative, 0},
-                      {key_of(0, 1), none, 0},
-                      {key_of(0, 1), given, 3},
-                      {key_of(1, 1, .1, .6, 60), nullptr, 0},
-                      {key_of(1, 1, .2, .2, 60), nullptr, 0},
-                      {key_of(1, 1, .3, .2, 60), nullptr, 0},
-                      {key_of(1, 1, -.1, .2, 60), nullptr, 0},
-                      {key_of(1, 1, .1, .2, 0), nullptr, 0},
-                      {key_of(1, 1, .1, .2, -60), nullptr, 0},
-                      {key_of(1, 1, .1, .2, 1e300), nullptr, 0},
-                      {key_of(1, 0, .1, .2, 60), nullptr, 0},
-                      {key_of(1, -1, -.2, -.1, 60), nullptr, 0},
-                      {key_of(1, nan, .1, .2, 60), nullptr, 0},
-                      {key_of(1, inf, .1, .2, 60), nullptr, 0},
-                      {key_of(1, 1, .1, .2, inf), nullptr, 0},
-                      {key_of(1, 1, .1, .1 + 1e-12, 60), nullptr, 0},
-                      {key_of(1, 1, .1, .2, 60), nullptr, ~0ULL},
-                      {key_of(1, 1, .1, .2, 60), nullptr, (1 << 24) + 1},
-                      {key_of(2, 1, 2, .2, 10), nullptr, 0},
-                      {key_of(2, 4, 0, .2, 10), nullptr, 0},
-                      {key_of(2, 4, -1, .2, 10), nullptr, 0},
-                      {key_of(2, -4, -1, .2, 10), nullptr, 0},
-                      {key_of(2, 4, 1, -.1, 10), nullptr, 0},
-                      {key_of(2, 4, 1, 1.1, 10), nullptr, 0},
-                      {key_of(2, 4, 1, .2, 0), nullptr, 0},
-                      {key_of(2, 4, 1, .2, 1e300), nullptr, 0},
-                      {key_of(2, 1e300, 1e-300, .2, 10), nullptr, 0},
-                      {key_of(2, 4, 1, nan, 10), nullptr, 0}};
+  // Low-passes, then root raised cosines, each with one value after the other beyond its range; kinds that do not exist.
+  constexpr row rows[] = {
+      {1, {1, .1, .6, 60}, 0},         {1, {1, .2, .2, 60}, 0},     {1, {1, .3, .2, 60}, 0},
+      {1, {1, -.1, .2, 60}, 0},        {1, {1, .1, .2, 0}, 0},      {1, {1, .1, .2, -60}, 0},
+      {1, {1, .1, .2, 1e300}, 0},      {1, {0, .1, .2, 60}, 0},     {1, {-1, -.2, -.1, 60}, 0},
+      {1, {nan, .1, .2, 60}, 0},       {1, {inf, .1, .2, 60}, 0},   {1, {1, .1, .2, inf}, 0},
+      {1, {1, .1, .1 + 1e-12, 60}, 0}, {1, {1, .1, .2, 60}, ~0ULL}, {1, {1, .1, .2, 60}, (1 << 24) + 1},
+      {2, {1, 2, .2, 10}, 0},          {2, {4, 0, .2, 10}, 0},      {2, {4, -1, .2, 10}, 0},
+      {2, {-4, -1, .2, 10}, 0},        {2, {4, 1, -.1, 10}, 0},     {2, {4, 1, 1.1, 10}, 0},
+      {2, {4, 1, .2, 0}, 0},           {2, {4, 1, .2, 1e300}, 0},   {2, {1e300, 1e-300, .2, 10}, 0},
+      {2, {4, 1, nan, 10}, 0},         {3, {1, 1, 1, 1}, 0},        {-1, {1, 1, 1, 1}, 0}};
   const std::uint64_t before = total();
   const tests::recorded list;
+  lumra_filter_record record{};
   for (const row &r : rows) {
-    lumra_filter_record record{};
-    EXPECT_EQ(-50462898, qsUtilHS_RegisterFilterSpec(&record, r.input, &r.key, r.count)) << &r - rows;
-    EXPECT_EQ(nullptr, record.entry);
+    const lumra_filter_key key = key_of(r.kind, r.values[0], r.values[1], r.values[2], r.values[3]);
+    EXPECT_EQ(-50462898, qsUtilHS_RegisterFilterSpec(&record, given, &key, r.count)) << &r - rows;
   }
-  EXPECT_EQ(std::size(rows), list.codes().size());
+  const lumra_filter_key key = key_of(0, 1);
+  for (const lumra_f32_array input : {lumra_f32_array{}, empty.handle(), negative.handle(), none.handle()})
+    EXPECT_EQ(-50462898, qsUtilHS_RegisterFilterSpec(&record, input, &key, 0));
+  EXPECT_EQ(-50462898, qsUtilHS_RegisterFilterSpec(&record, given, &key, 3));
+  EXPECT_EQ(nullptr, record.entry);
+  EXPECT_EQ(std::size(rows) + 5, list.codes().size());
   EXPECT_EQ(before, total());
 }
 

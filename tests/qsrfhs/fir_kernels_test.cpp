@@ -8,30 +8,21 @@
 #include <vector>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "support/signals.hpp"
 
 namespace {
 
 using namespace qsrfhs::kernels;
 
-template <class Real>
-std::vector<Real> values(std::size_t n, unsigned seed) {
-  std::vector<Real> out(n);
-  for (Real &v : out) {
-    seed = seed * 1664525U + 1013904223U;
-    v = static_cast<Real>(seed >> 8) / 8388608 - 1;
-  }
-  return out;
-}
-
 /// Real taps for real and complex samples, then complex taps. `behind` must not enter any sum.
 template <class Real, class Fir, class ComplexFir>
 void expect_sums(Fir kernel_table::*fir, ComplexFir kernel_table::*complex_fir) {
   constexpr std::size_t behind = 32 / sizeof(Real);
-  const auto taps = values<Real>(2 * 70, 1);
+  const auto taps = tests::noise_of<Real>(2 * 70, 1);
   for (const kernel_table *table : {&baseline_kernels, &active()})
     for (const std::size_t count : std::initializer_list<std::size_t>{1, 2, 3, 64, 70})
       for (const std::size_t n : std::initializer_list<std::size_t>{0, 1, 2, 3, 7, 8, 9, 31, 64, 100, 131}) {
-        auto x = values<Real>(2 * (n + count - 1), 7);
+        auto x = tests::noise_of<Real>(2 * (n + count - 1), 7);
         x.resize(x.size() + behind, std::numeric_limits<Real>::quiet_NaN());
         for (const std::size_t width : {std::size_t{1}, std::size_t{2}}) {
           std::vector<Real> expected(width * n), got(width * n);
@@ -70,7 +61,7 @@ TEST(FirKernels, SumsInOrder) {
 
 TEST(FirKernels, ProductsOfSpectra) {
   for (const std::size_t n : std::initializer_list<std::size_t>{0, 1, 2, 5}) {
-    const auto a = values<double>(2 * n, 1), b = values<double>(2 * n, 2);
+    const auto a = tests::noise_of<double>(2 * n, 1), b = tests::noise_of<double>(2 * n, 2);
     for (const kernel_table *table : {&baseline_kernels, &active()}) {
       auto got = a;
       table->multiply_double(got.data(), b.data(), n);

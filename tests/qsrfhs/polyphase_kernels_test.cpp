@@ -3,33 +3,23 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <limits>
 #include <vector>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
 #include "support/guarded.hpp"
+#include "support/signals.hpp"
 
 namespace {
 
 using namespace qsrfhs::kernels;
 using tests::edge, tests::guarded;
 
-/// n values and, up to `size`, others that must not count.
-std::vector<float> values(std::size_t n, std::size_t size, unsigned seed) {
-  std::vector<float> out(size, std::numeric_limits<float>::quiet_NaN());
-  for (std::size_t k = 0; k < n; ++k) {
-    seed = seed * 1664525U + 1013904223U;
-    out[k] = static_cast<float>(seed >> 8) / 8388608.F - 1.F;
-  }
-  return out;
-}
-
 /// Real outputs, then complex ones, of one kernel of either kind in both builds.
 template <class Taps, class Kernel>
 void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
                  Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places, std::size_t samples,
                  const std::vector<std::vector<double>> &taps) {
-  const auto x = values(2 * samples, 2 * samples, 7);
+  const auto x = tests::noise_of<float>(2 * samples, 7);
   // Nothing before the samples is read, and behind the last group of any place neither.
   std::vector<std::vector<float>> got;
   for (const edge at : {edge::front, edge::back}) {
@@ -64,7 +54,7 @@ std::size_t slot(std::size_t k, bool complex) {
 
 TEST(PolyphaseKernels, TapsInRows) {
   constexpr std::size_t rows = 3, length = 40;
-  const auto in_order = values(2 * rows * length, 2 * rows * length, 1);
+  const auto in_order = tests::noise_of<float>(2 * rows * length, 1);
   auto for_complex = in_order;
   for (std::size_t i = 0; i < in_order.size(); i += 8)
     for (std::size_t k = 0; k < 8; ++k) for_complex[i + slot(k, true)] = in_order[i + k];
@@ -89,7 +79,7 @@ TEST(PolyphaseKernels, TapsInRows) {
 TEST(PolyphaseKernels, TapsAtOffsets) {
   constexpr std::size_t length = 40, size = 200;
   constexpr double step = 4.9;
-  const auto h = values(size, size, 1);
+  const auto h = tests::noise_of<float>(size, 1);
   std::vector<float> in_order(2 * length), for_complex(2 * length);
   for (std::size_t k = 0; k < length; ++k) {
     const double offset = step * static_cast<double>(k);

@@ -3,13 +3,9 @@
 #include <lumra/vector_utilities.h>
 
 #include <gtest/gtest.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <array>
 #include <atomic>
-#include <cmath>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <limits>
@@ -17,34 +13,15 @@
 #include <vector>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "support/process.hpp"
+#include "support/recorded.hpp"
 #include "support/test_array.hpp"
 
 namespace {
 
 using tests::cf32_array;
 using tests::f32_array;
-
-constexpr std::int32_t table_invalid = -380127;
-
-std::uint64_t recorded_count() {
-  std::uint64_t count = 0;
-  qsrfhs_getErrorCnt(&count);
-  return count;
-}
-
-TEST(LookupTable, RefusesWithoutARecordAndTouchesNothing) {
-  const std::uint64_t before = recorded_count();
-  f32_array keys{0.F};
-  cf32_array in{{1, 0}}, out{{7, 7}, {7, 7}}, table{{1, 0}, {0, 0}}, empty(0), none;
-  for (const lumra_cf32_array bad : {lumra_cf32_array{}, none.handle(), empty.handle()})
-    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys, in, out.address(), bad, 0, 1));
-  for (const float step : {0.0F, -0.0F})
-    EXPECT_EQ(table_invalid, qsUtilHS_LookupTable(keys, in, nullptr, table, 0, step));
-  EXPECT_EQ(-1, qsUtilHS_LookupTable(keys, in, nullptr, table, 0, 1));
-  EXPECT_EQ(before, recorded_count());
-  EXPECT_EQ(2U, out.elements().size());
-  EXPECT_EQ(7, out.elements()[0].re);
-}
+using tests::in_child;
 
 TEST(LookupTable, FollowsTheTable) {
   constexpr float nan = std::numeric_limits<float>::quiet_NaN();
@@ -121,25 +98,13 @@ TEST(LookupTableConcurrency, ManyCallersAtOnce) {
 
 constexpr bool thread_sanitizer = std::string_view(LUMRA_SANITIZE).find("thread") != std::string_view::npos;
 
-/// Exit status of a forked child that runs work and leaves through exit(), as a host does; -1 when it hangs.
-template <class Work>
-int in_child(Work &&work) {
-  std::fflush(nullptr);
-  const pid_t child = fork();
-  if (child == 0) {
-    alarm(20);
-    std::exit(work() ? 0 : 1);
-  }
-  int status = 0;
-  waitpid(child, &status, 0);
-  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-}
-
 TEST(LookupTableFork, ChildrenFindWorkingTeams) {
   if (thread_sanitizer) GTEST_SKIP() << "no threads after a fork";
   long_call call(100000);
   ASSERT_TRUE(call.run());
-  EXPECT_EQ(0, in_child([&] { return call.run() && in_child([&] { return call.run(); }) == 0; }));
+  // They leave as a host does.
+  const auto runs = [&] { return call.run(); };
+  EXPECT_EQ(0, in_child([&] { return runs() && in_child(runs, &std::exit) == 0; }, &std::exit));
   EXPECT_TRUE(call.run());
 }
 
@@ -155,9 +120,9 @@ TEST(LookupTableFork, ForksInTheMiddleOfCalls) {
       while (!over) bad += own.run() ? 0 : 1;
     });
   long_call call(70000);
-  const auto recorded = recorded_count();
+  const tests::recorded list;
   for (int i = 0; i < 20; ++i)
-    EXPECT_EQ(0, in_child([&] { return call.run() && qsUtilHS_NumCPUs() > 0 && recorded_count() == recorded; }));
+    EXPECT_EQ(0, in_child([&] { return call.run() && qsUtilHS_NumCPUs() > 0 && list.codes().empty(); }, &std::exit));
   over = true;
   for (std::thread &caller : callers) caller.join();
   EXPECT_EQ(0, bad);
