@@ -6,7 +6,6 @@
 #include <cmath>
 #include <complex>
 #include <functional>
-#include <numbers>
 
 #include "support/signals.hpp"
 #include "support/test_array.hpp"
@@ -47,20 +46,6 @@ TEST(ErrorVector, MatchesItsDefinition) {
         }
       }
     }
-}
-
-TEST(ErrorVector, ClosedForms) {
-  cf32_matrix a(1, 3), b(1, 3);
-  f32_matrix e(3, 1);
-  for (lumra_cf32 *value = a.block()->elements; value != a.block()->elements + 3; ++value) *value = {1, 0};
-  const lumra_cf32 values[] = {{1, 0}, {0, 1}, {-1, 0}};
-  std::memcpy(b.block()->elements, values, sizeof values);
-  constexpr float pi = std::numbers::pi_v<float>;
-  const float expected[][3] = {{0, std::numbers::sqrt2_v<float>, 2}, {0, 0, 0}, {0, pi / 2, pi}};
-  for (std::size_t c = 0; c < 3; ++c) {
-    ASSERT_EQ(0, comparisons[c].call(a.handle(), b.handle(), e.handle(), LUMRA_ACCURACY_HIGH));
-    for (std::size_t i = 0; i < 3; ++i) EXPECT_FLOAT_EQ(expected[c][i], e.block()->elements[i]) << comparisons[c].name;
-  }
 }
 
 TEST(ErrorVector, RefusesAndTouchesNothing) {

@@ -151,7 +151,7 @@ TEST_F(BatchSchedulerConcurrency, TimesOutAndRecovers) {
 }
 
 TEST_F(BatchSchedulerConcurrency, ABatchThatFindsNoRecordTimesOut) {
-  batch_scheduler scheduler(mutex_, 1, &record_code, 30ms);
+  batch_scheduler scheduler(mutex_, 1, &record_code, 10ms);
   std::latch opened(1);
   gate = &opened;
   std::vector<std::unique_ptr<task[]>> tasks;

@@ -4,23 +4,18 @@
 #include <lumra/array_store.h>
 
 #include <gtest/gtest.h>
-#include <mkl_dfti.h>
 
 #include <cmath>
 #include <cstring>
-#include <numbers>
 #include <thread>
 #include <vector>
 
-#include "qsrfhs/math/filter_design.hpp"
-#include "support/near.hpp"
 #include "support/recorded.hpp"
 #include "support/signals.hpp"
 
 namespace {
 
 using qsrfhs::direction;
-using std::numbers::pi;
 using sample = std::complex<float>;
 using exact = std::complex<double>;
 constexpr std::uint64_t owner = 4711;
@@ -50,9 +45,10 @@ exact channel_bin(const std::vector<exact> &spectrum, std::int64_t m, std::int64
 
 TEST(FftResampler, ABlockIsTheDirectComputation) {
   struct row {
-    std::uint32_t n, m, overlap;
+    std::uint32_t n, m, overlap, hop;
   };
-  for (const row &r : {row{64, 16, 3}, row{64, 64, 5}, row{60, 12, 2}, row{64, 48, 0}, row{50, 13, 4}}) {
+  for (const row &r :
+       {row{64, 16, 3, 40}, row{64, 64, 5, 54}, row{60, 12, 2, 40}, row{64, 48, 0, 64}, row{50, 13, 4, 26}}) {
     const qsrfhs::resampler_plan plan{r.n, r.m, r.overlap};
     const lent forward(r.n, 0, 0), inverse(r.m, 1, 1);
     const auto x = tests::noise_of<sample>(r.n, r.n + r.m), w = tests::noise_of<sample>(r.m, 9);
@@ -64,14 +60,16 @@ TEST(FftResampler, ABlockIsTheDirectComputation) {
     for (std::int64_t centre = -m; centre <= n + m; ++centre) centres.push_back(centre);
     centres.insert(centres.end(), {std::int64_t{-1} << 40, std::int64_t{1} << 40});
     for (const bool first : {true, false}) {
-      std::vector<std::vector<sample>> out(centres.size(), std::vector<sample>(r.m, sample(77)));
+      constexpr std::uint64_t offset = 3, before = 11;  // of the output, and samples of the blocks before
+      std::vector<std::vector<sample>> out(centres.size(), std::vector<sample>(2 * r.m + 20, sample(77)));
       std::vector<qsrfhs::resampler_channel> channels;
       for (std::size_t i = 0; i < centres.size(); ++i)
-        channels.push_back({centres[i], r.m, weights, out[i], 0, i % 2 ? 0.3 : 0.0, i % 2 ? 0.01 : 0.0, 0});
+        channels.push_back({centres[i], i % 3 ? r.m : 1 + static_cast<std::uint32_t>(i) % r.m, weights, out[i], offset,
+                            i % 2 ? 0.3 : 0.0, i % 2 ? 0.01 : 0.0, before});
       qsrfhs::process_block(plan, *forward.descriptor, *inverse.descriptor, x.data(), work.data(), 5, first, channels);
       for (std::size_t i = 0; i < centres.size(); ++i) {
         SCOPED_TRACE(testing::Message() << r.n << " " << r.m << " centre " << centres[i] << " first " << first);
-        const double phase = 5.0 * plan.hop() * channels[i].phase_step + channels[i].phase_start;
+        const double phase = 5.0 * r.hop * channels[i].phase_step + channels[i].phase_start;
         std::vector<exact> bins(r.m);
         for (std::int64_t j = 0; j < m; ++j) {
           const exact bin = channel_bin(spectrum, m, centres[i], j);
@@ -82,70 +80,14 @@ TEST(FftResampler, ABlockIsTheDirectComputation) {
         }
         const auto block = tests::transform_of(bins, 1);
         const std::size_t from = first ? 0 : r.overlap, kept = r.m - r.overlap - from;
-        EXPECT_EQ(kept, channels[i].produced);
-        for (std::size_t k = 0; k < kept; ++k)
-          EXPECT_NEAR(0, std::abs(exact(out[i][k]) - block[from + k] / static_cast<double>(m)), 2e-5);
-        for (std::size_t k = kept; k < r.m; ++k) EXPECT_EQ(sample(77), out[i][k]);
+        EXPECT_EQ(before + kept, channels[i].produced);
+        std::vector<sample> expected(out[i].size(), sample(77));
+        const std::size_t stride = r.m / channels[i].divisor;
+        for (std::size_t k = 0; k < kept; k += stride)
+          expected[offset + before / stride + k / stride] = sample(block[from + k] / static_cast<double>(m));
+        for (std::size_t k = 0; k < expected.size(); ++k) EXPECT_NEAR(0, std::abs(expected[k] - out[i][k]), 2e-5);
       }
     }
-  }
-}
-
-// Blocks of noise against one long convolution with the filter that the weights stand for: what is aliased, or does not
-// fit together from block to block, would show.
-TEST(FftResampler, BlocksJoinWithoutSeamAndAlias) {
-  constexpr std::uint32_t n = 256, m = 32, overlap = 8, rate = n / m;
-  constexpr std::size_t blocks = 12;
-  const qsrfhs::resampler_plan plan{n, m, overlap};
-  ASSERT_EQ(128U, plan.hop());
-  const auto filter = qsrfhs::design_filter({1, {}, {1, .028, .0625, 60}}, nullptr, 2 * overlap * rate + 1);
-  const auto h = filter->coefficients();
-  const auto reach = static_cast<std::int64_t>(h.size() / 2);
-  std::vector<sample> weights(m);
-  for (std::size_t j = 0; j < m; ++j) {
-    double sum = 0;
-    for (std::size_t i = 0; i < h.size(); ++i)
-      sum += static_cast<double>(h[i]) * std::cos(2 * pi / n * (static_cast<double>(j) - m / 2) *
-                                                  (static_cast<double>(i) - static_cast<double>(reach)));
-    weights[j] = {static_cast<float>(sum), static_cast<float>(sum)};
-  }
-  struct row {
-    std::int64_t centre;
-    std::uint32_t divisor;
-    double phase;
-  };
-  const row rows[] = {{128, 32, 0}, {128, 16, 0.7}, {40, 32, 0}, {200, 8, -2}, {16, 32, 0}, {239, 32, 1}, {120, 4, 0}};
-  const auto x = tests::noise_of<sample>(n + blocks * plan.hop(), 5);
-  std::vector<std::vector<sample>> out(std::size(rows), std::vector<sample>(1000));
-  std::vector<qsrfhs::resampler_channel> channels;
-  for (std::size_t i = 0; i < std::size(rows); ++i)
-    channels.push_back({rows[i].centre, rows[i].divisor, reinterpret_cast<const float *>(weights.data()), out[i], 3,
-                        rows[i].phase, -2 * pi * static_cast<double>(rows[i].centre - n / 2) / n, 0});
-  const lent forward(n, 0, 0), inverse(m, 1, 1);
-  std::vector<sample> work(n);
-  for (std::size_t b = 0; b < blocks; ++b)
-    qsrfhs::process_block(plan, *forward.descriptor, *inverse.descriptor, x.data() + b * plan.hop(), work.data(), b,
-                          b == 0, channels);
-  for (std::size_t i = 0; i < std::size(rows); ++i) {
-    SCOPED_TRACE(i);
-    const std::size_t produced = channels[i].produced, stride = m / rows[i].divisor;
-    EXPECT_EQ(m - overlap + (blocks - 1) * (m - 2 * overlap), produced);
-    std::vector<exact> expected, got;
-    // The first `overlap` samples of all reach back before the input.
-    for (std::size_t p = (overlap + stride - 1) / stride * stride; p < produced; p += stride) {
-      exact sum = 0;
-      for (std::int64_t k = -reach; k <= reach; ++k) {
-        const std::int64_t t = static_cast<std::int64_t>(p * rate) - k;
-        sum += static_cast<double>(h[static_cast<std::size_t>(k + reach)]) * exact(x[static_cast<std::size_t>(t)]) *
-               std::polar(1.0, -2 * pi * static_cast<double>((rows[i].centre - n / 2) * t) / n);
-      }
-      expected.push_back(sum * static_cast<double>(rate) * std::polar(1.0, rows[i].phase));
-      got.emplace_back(out[i][3 + p / stride]);
-    }
-    // 60 dB over the seven eighths of the spectrum that are folded.
-    EXPECT_LT(tests::relative_error(got, expected), 1e-3 * std::sqrt(7.0));
-    EXPECT_EQ(sample(0), out[i][2]);
-    EXPECT_EQ(sample(0), out[i][3 + (produced + stride - 1) / stride]);
   }
 }
 
@@ -219,16 +161,6 @@ TEST(ResamplerDescriptors, PrepareKeepsATransformOfTheLength) {
   const void *const inverse = descriptor.transform;
   ASSERT_EQ(0, qsrfhs::prepare(descriptor, 64, direction::forward));
   EXPECT_EQ(inverse, descriptor.transform);
-  MKL_LONG placement = 0;
-  float scale = 0;
-  const auto transform = [&] { return static_cast<DFTI_DESCRIPTOR_HANDLE>(descriptor.transform); };
-  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_PLACEMENT, &placement));
-  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_BACKWARD_SCALE, &scale));
-  EXPECT_EQ(DFTI_INPLACE, placement);
-  EXPECT_EQ(1.F / 64, scale);
-  ASSERT_EQ(0, qsrfhs::prepare(descriptor, 32, direction::forward));
-  EXPECT_EQ(0, DftiGetValue(transform(), DFTI_PLACEMENT, &placement));
-  EXPECT_EQ(DFTI_NOT_INPLACE, placement);
   const tests::recorded list;
   EXPECT_EQ(-50397485, qsrfhs::prepare(descriptor, 0, direction::forward));
   EXPECT_EQ(nullptr, descriptor.transform);
