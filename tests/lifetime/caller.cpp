@@ -127,11 +127,14 @@ bool caller::stored_arrays() {
   const auto owner = static_cast<std::uint64_t>(1000 + number_);
   lumra_array_ref kept{1, nullptr}, other{1, nullptr}, *kept_address = &kept, *other_address = &other;
   std::uint32_t length = 0;
-  const bool good = qsUtilHS_AllocateArray_CSG(&kept_address, 100, owner) == 0 &&
-                    qsUtilHS_AllocateArray_CSG(&other_address, 5000, owner) == 0 &&
-                    qsUtilHS_ArrayLength_CSG(&kept_address, &length) == 0 && length == 100 &&
-                    qsUtilHS_ReadArray_CSG(&other_address, &scratch_, 4990, 20) == 0 &&
-                    (*scratch_)->elements[19].re == 0 && qsUtilHS_FreeArray_CSG(&kept_address) == 0;
+  bool good = qsUtilHS_AllocateArray_CSG(&kept_address, 100, owner) == 0 &&
+              qsUtilHS_AllocateArray_CSG(&other_address, 5000, owner) == 0;
+  const auto own = static_cast<float>(number_);
+  if (good) kept.block->data[99].re = other.block->data[4999].re = own;
+  good = good && qsUtilHS_ArrayLength_CSG(&kept_address, &length) == 0 && length == 100 &&
+         qsUtilHS_ReadArray_CSG(&other_address, &scratch_, 4990, 20) == 0 && kept.block->data[99].re == own &&
+         (*scratch_)->elements[9].re == own && (*scratch_)->elements[19].re == 0 &&
+         qsUtilHS_FreeArray_CSG(&kept_address) == 0;
   return qsUtilHS_FreeArrayIDH_CSG(owner) == 0 && good;
 }
 
@@ -169,8 +172,10 @@ bool caller::fifos() {
 bool caller::resampler() {
   const auto owner = static_cast<std::uint64_t>(2000 + number_);
   lumra_resampler_descriptor *descriptor = nullptr;
-  const bool good =
-      qsUtilHS_FFTResampler_CSG_CreateDescriptor(&descriptor, 64, 1, 1, owner) == 0 && descriptor->length == 64;
+  if (qsUtilHS_FFTResampler_CSG_CreateDescriptor(&descriptor, 64, 1, 1, owner) != 0) return false;
+  auto *const samples_of_own = static_cast<lumra_cf32 *>(descriptor->aligned_buffer);
+  samples_of_own[0].re = samples_of_own[63].im = static_cast<float>(number_);
+  const bool good = descriptor->length == 64 && samples_of_own[0].re == samples_of_own[63].im;
   return qsUtilHS_FreeArrayIDH_CSG(owner) == 0 && good;
 }
 

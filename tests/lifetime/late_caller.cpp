@@ -1,5 +1,5 @@
-// A library that uses the library until its very end: its destructor still calls every family. SPDX-License-Identifier:
-// MIT
+// A library that uses the library until its very end: its destructor still calls every family.
+// SPDX-License-Identifier: MIT
 #include <unistd.h>
 
 #include "lifetime/caller.hpp"

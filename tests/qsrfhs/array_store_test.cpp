@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <limits>
 #include <random>
-#include <thread>
 #include <vector>
 
 #include "support/recorded.hpp"
@@ -212,25 +211,6 @@ TEST(ArrayStore, ForgedReferencesAreHarmless) {
   EXPECT_EQ(0, qsUtilHS_FreeArray_CSG(array.address()));
   reference first(4), second(4);
   EXPECT_NE(first.block(), second.block());
-}
-
-TEST(ArrayStoreConcurrency, EveryThreadHasBlocksOfItsOwn) {
-  std::vector<std::jthread> threads;
-  for (std::uint64_t t = 0; t < 4; ++t)
-    threads.emplace_back([t] {
-      tests::cf32_array out(8);
-      for (int i = 0; i < 2000; ++i) {
-        reference a(8, 1000 + t), b(600, 1000 + t);
-        a.block()->data[0].re = static_cast<float>(t);
-        b.block()->data[0].re = static_cast<float>(t);
-        EXPECT_EQ(0, qsUtilHS_ReadArray_CSG(a.address(), out.address(), 0, 8));
-        EXPECT_EQ(static_cast<float>(t), out.elements()[0].re);
-        EXPECT_EQ(static_cast<float>(t), b.block()->data[0].re);
-        if (i % 10 != 0) continue;
-        qsUtilHS_FreeArrayIDH_CSG(1000 + t);
-        a.record.block = b.record.block = nullptr;  // another thread may have the blocks by now
-      }
-    });
 }
 
 }  // namespace

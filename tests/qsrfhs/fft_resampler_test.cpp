@@ -7,7 +7,6 @@
 
 #include <cmath>
 #include <cstring>
-#include <thread>
 #include <vector>
 
 #include "support/recorded.hpp"
@@ -189,19 +188,6 @@ TEST(ResamplerDescriptors, RefusesAndRecords) {
   EXPECT_EQ(-33620126, qsUtilHS_ArrayLength_CSG(&pointer, &length));
   EXPECT_EQ(0, qsUtilHS_FreeArray_CSG(&pointer));
   EXPECT_NE(d.descriptor, lent(16, 1, 1, owner + 1).descriptor);  // still lent
-}
-
-TEST(ResamplerDescriptorsConcurrency, NoTwoThreadsHoldTheSame) {
-  std::vector<std::jthread> threads;
-  for (std::uint64_t t = 0; t < 4; ++t)
-    threads.emplace_back([t] {
-      for (int i = 0; i < 300; ++i) {
-        const lent d(96, 1, 1, 9000 + t);
-        auto *const data = static_cast<sample *>(d.descriptor->aligned_buffer);
-        std::fill_n(data, 96, sample(static_cast<float>(t)));
-        EXPECT_EQ(sample(static_cast<float>(t)), data[95]);
-      }
-    });
 }
 
 }  // namespace

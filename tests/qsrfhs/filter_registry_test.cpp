@@ -8,7 +8,6 @@
 #include <limits>
 #include <numbers>
 #include <random>
-#include <thread>
 #include <vector>
 
 #include "support/recorded.hpp"
@@ -280,22 +279,6 @@ TEST(FilterRegistry, RefusesNullsForgedAndStaleRecords) {
     ASSERT_EQ(-50462843, qsUtilHS_UnegisterFilterSpec(&record));
   }
   EXPECT_EQ(3007U, list.codes().size());
-}
-
-TEST(FilterRegistryConcurrency, ThreadsShareAndEraseTheSameKeys) {
-  const std::uint64_t before = total();
-  {
-    std::vector<std::jthread> threads;
-    for (int t = 0; t < 4; ++t)
-      threads.emplace_back([t] {
-        for (int i = 0; i < 300; ++i) {
-          const registered filter(key_of(2, 4, 1, .1, 4 + (t + i) % 3));
-          EXPECT_EQ(0, filter.status);
-          EXPECT_GT(filter.record.entry->coefficients[filter.record.entry->n / 2], 0.F);
-        }
-      });
-  }
-  EXPECT_EQ(before, total());
 }
 
 }  // namespace
