@@ -22,6 +22,18 @@ enum class products : std::int32_t {
   fourier = LUMRA_METHOD_FOURIER
 };
 
+namespace detail {
+/// The object that load(bytes, size, &object) makes, which must be one for elements of T.
+template <sample T, class Owned, class Load, class GetType>
+Owned load(std::span<const std::byte> bytes, Load load, GetType get_type) {
+  auto loaded = make<Owned>([&](auto **out) { return load(bytes.data(), bytes.size(), out); });
+  std::int32_t type = 0;
+  check_open(get_type(loaded.get(), &type));
+  if (type != type_code<T>) throw error(status(LUMRA_WRONG_TYPE), "what was saved is for another type of samples");
+  return loaded;
+}
+}  // namespace detail
+
 /// A filter with a finite response over a stream of T; see filter.h. One thread at a time.
 template <sample T>
 class fir_filter {
@@ -45,15 +57,18 @@ class fir_filter {
   }
   void reset() { check_open(lumra_fir_reset(filter_.get())); }
 
-  /// Of the stream, not the taps.
   [[nodiscard]] std::vector<std::byte> save() const {
     return detail::save(filter_.get(), &lumra_fir_state_size, &lumra_fir_save);
   }
-  void load(std::span<const std::byte> bytes) { check_open(lumra_fir_load(filter_.get(), bytes.data(), bytes.size())); }
+  /// A filter that goes on where the saved one was, which must be of T.
+  [[nodiscard]] static fir_filter load(std::span<const std::byte> bytes) {
+    return fir_filter(detail::load<T, owned>(bytes, &lumra_fir_load, &lumra_fir_get_type));
+  }
 
  private:
   using owned = detail::owned<lumra_fir, &lumra_fir_free>;
 
+  explicit fir_filter(owned filter) noexcept : filter_(std::move(filter)) {}
   fir_filter(const void *taps, std::size_t count, std::int32_t taps_type, products method)
       : filter_(detail::make<owned>([&](lumra_fir **out) {
           lumra_fir_options how = LUMRA_FIR_OPTIONS;
@@ -70,8 +85,8 @@ class fir_filter {
 enum class mode : std::int32_t { full = LUMRA_MODE_FULL, same = LUMRA_MODE_SAME, valid = LUMRA_MODE_VALID };
 
 namespace detail {
-template <class T, class Run>
-std::vector<T> combine(Run run, std::span<const T> x, std::span<const T> y, mode kept, products method) {
+template <class T, class Tap, class Run>
+std::vector<T> combine(Run run, std::span<const T> x, std::span<const Tap> y, mode kept, products method) {
   const auto part = static_cast<std::int32_t>(kept);
   std::uint64_t count = 0;
   check_open(lumra_convolve_size(x.size(), y.size(), part, &count));
@@ -88,14 +103,22 @@ template <sample T>
                                       mode kept = mode::full, products method = products::automatic) {
   constexpr auto run =
       detail::form<T>(&lumra_convolve_f32, &lumra_convolve_f64, &lumra_convolve_cf32, &lumra_convolve_cf64);
-  return detail::combine<T>(run, x, y, kept, method);
+  return detail::combine(run, x, y, kept, method);
+}
+template <sample T>
+[[nodiscard]] std::vector<T> convolve(
+    std::span<const T> x, std::type_identity_t<std::span<const real_type<T>>> y, mode kept = mode::full,
+    products method = products::automatic) requires(!std::is_same_v<T, real_type<T>>) {
+  constexpr auto run =
+      detail::form<T>(nullptr, nullptr, &lumra_convolve_with_real_cf32, &lumra_convolve_with_real_cf64);
+  return detail::combine(run, x, y, kept, method);
 }
 template <sample T>
 [[nodiscard]] std::vector<T> correlate(std::span<const T> x, std::type_identity_t<std::span<const T>> y,
                                        mode kept = mode::full, products method = products::automatic) {
   constexpr auto run =
       detail::form<T>(&lumra_correlate_f32, &lumra_correlate_f64, &lumra_correlate_cf32, &lumra_correlate_cf64);
-  return detail::combine<T>(run, x, y, kept, method);
+  return detail::combine(run, x, y, kept, method);
 }
 
 namespace detail {
@@ -181,18 +204,15 @@ class recursive_filter {
   [[nodiscard]] std::vector<std::byte> save() const {
     return detail::save(filter_.get(), &lumra_iir_state_size, &lumra_iir_save);
   }
-  /// Replaces the filter by a saved one, which must be of T.
-  void load(std::span<const std::byte> bytes) {
-    auto loaded = detail::make<owned>([&](lumra_iir **out) { return lumra_iir_load(bytes.data(), bytes.size(), out); });
-    std::int32_t type = 0;
-    check_open(lumra_iir_get_type(loaded.get(), &type));
-    if (type != detail::type_code<T>) throw error(status(LUMRA_WRONG_TYPE), "the saved filter is of another type");
-    filter_ = std::move(loaded);
+  /// A filter that goes on where the saved one was, which must be of T.
+  [[nodiscard]] static recursive_filter load(std::span<const std::byte> bytes) {
+    return recursive_filter(detail::load<T, owned>(bytes, &lumra_iir_load, &lumra_iir_get_type));
   }
 
  private:
   using owned = detail::owned<lumra_iir, &lumra_iir_free>;
 
+  explicit recursive_filter(owned filter) noexcept : filter_(std::move(filter)) {}
   static lumra_iir_options options(recursion method) noexcept {
     lumra_iir_options how = LUMRA_IIR_OPTIONS;
     how.type = detail::type_code<T>;

@@ -23,8 +23,8 @@ dsp::convolution_part checked_part(std::uint64_t nx, std::uint64_t ny, std::int3
 }
 
 /// A convolution or correlation, whichever `compute` is.
-template <class T, class Compute>
-lumra_status combine(const char *function, const T *x, std::uint64_t nx, const T *y, std::uint64_t ny,
+template <class T, class Tap, class Compute>
+lumra_status combine(const char *function, const T *x, std::uint64_t nx, const Tap *y, std::uint64_t ny,
                      std::int32_t mode, std::int32_t method_number, T *out, std::uint64_t room,
                      Compute compute) noexcept {
   return enter(function, [&] {
@@ -56,17 +56,19 @@ lumra_status lumra_convolve_size(uint64_t nx, uint64_t ny, int32_t mode, uint64_
   });
 }
 
-#define COMBINATIONS(SUFFIX, T, SAMPLE)                                                                                \
-  lumra_status lumra_convolve_##SUFFIX(const T *x, uint64_t nx, const T *y, uint64_t ny, int32_t mode, int32_t method, \
-                                       T *out, uint64_t room) {                                                        \
-    return combine(__func__, x, nx, y, ny, mode, method, out, room, dsp::convolve<SAMPLE>);                            \
-  }                                                                                                                    \
-  lumra_status lumra_correlate_##SUFFIX(const T *x, uint64_t nx, const T *y, uint64_t ny, int32_t mode,                \
-                                        int32_t method, T *out, uint64_t room) {                                       \
-    return combine(__func__, x, nx, y, ny, mode, method, out, room, dsp::correlate<SAMPLE>);                           \
+#define COMBINATION(NAME, T, TAP, COMPUTE)                                                                            \
+  lumra_status lumra_##NAME(const T *x, uint64_t nx, const TAP *y, uint64_t ny, int32_t mode, int32_t method, T *out, \
+                            uint64_t room) {                                                                          \
+    return combine(__func__, x, nx, y, ny, mode, method, out, room, COMPUTE);                                         \
   }
-COMBINATIONS(f32, float, float)
-COMBINATIONS(f64, double, double)
-COMBINATIONS(cf32, lumra_cf32, std::complex<float>)
-COMBINATIONS(cf64, lumra_cf64, std::complex<double>)
-#undef COMBINATIONS
+COMBINATION(convolve_f32, float, float, (dsp::convolve<float, float>))
+COMBINATION(convolve_f64, double, double, (dsp::convolve<double, double>))
+COMBINATION(convolve_cf32, lumra_cf32, lumra_cf32, (dsp::convolve<std::complex<float>, std::complex<float>>))
+COMBINATION(convolve_cf64, lumra_cf64, lumra_cf64, (dsp::convolve<std::complex<double>, std::complex<double>>))
+COMBINATION(convolve_with_real_cf32, lumra_cf32, float, (dsp::convolve<std::complex<float>, float>))
+COMBINATION(convolve_with_real_cf64, lumra_cf64, double, (dsp::convolve<std::complex<double>, double>))
+COMBINATION(correlate_f32, float, float, dsp::correlate<float>)
+COMBINATION(correlate_f64, double, double, dsp::correlate<double>)
+COMBINATION(correlate_cf32, lumra_cf32, lumra_cf32, dsp::correlate<std::complex<float>>)
+COMBINATION(correlate_cf64, lumra_cf64, lumra_cf64, dsp::correlate<std::complex<double>>)
+#undef COMBINATION

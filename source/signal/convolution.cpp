@@ -12,8 +12,8 @@ namespace dsp {
 namespace {
 
 /// Copies x[first] to x[first + count - 1], where there is silence around x.
-template <class Sample>
-void copy_with_silence(std::span<const Sample> x, std::ptrdiff_t first, std::size_t count, Sample *to) noexcept {
+template <class From, class Sample>
+void copy_with_silence(std::span<const From> x, std::ptrdiff_t first, std::size_t count, Sample *to) noexcept {
   const auto n = static_cast<std::ptrdiff_t>(x.size());
   const std::ptrdiff_t last = first + static_cast<std::ptrdiff_t>(count);
   const std::ptrdiff_t begin = std::clamp(first, std::ptrdiff_t{0}, n), end = std::clamp(last, begin, n);
@@ -24,8 +24,8 @@ void copy_with_silence(std::span<const Sample> x, std::ptrdiff_t first, std::siz
 }
 
 /// Each output from the taps that meet samples. Outputs whose samples are all there need no copy of them.
-template <class Sample>
-void convolve_directly(std::span<const Sample> x, std::span<const Sample> taps, const convolution_part &part,
+template <class Sample, class Tap>
+void convolve_directly(std::span<const Sample> x, std::span<const Tap> taps, const convolution_part &part,
                        Sample *out) {
   constexpr std::size_t behind = readable / sizeof(Sample), at_ends = 256, inside = 1024;
   const std::size_t last = part.first + part.count;
@@ -47,10 +47,10 @@ void convolve_directly(std::span<const Sample> x, std::span<const Sample> taps, 
 }
 
 /// In overlapping blocks of one transform length.
-template <class Sample>
-void convolve_in_blocks(std::span<const Sample> x, std::span<const Sample> taps, const convolution_part &part,
+template <class Sample, class Tap>
+void convolve_in_blocks(std::span<const Sample> x, std::span<const Tap> taps, const convolution_part &part,
                         Sample *out) {
-  overlap_save<Sample, Sample> blocks(taps, best_block<Sample>(taps.size()));
+  overlap_save<Sample, Tap> blocks(taps, best_block<Sample>(taps.size()));
   const auto window = blocks.window();
   for (std::size_t done = 0, n = 0; done < part.count; done += n) {
     n = std::min(part.count - done, blocks.step());
@@ -65,8 +65,8 @@ std::size_t whole_length(std::size_t nx, std::size_t ny, const convolution_part 
   return fast_length(std::max({nx + ny - 1 - part.first, part.first + part.count, nx}));
 }
 
-template <class Sample>
-void convolve_in_one(std::span<const Sample> x, std::span<const Sample> y, const convolution_part &part,
+template <class Sample, class Tap>
+void convolve_in_one(std::span<const Sample> x, std::span<const Tap> y, const convolution_part &part,
                      std::size_t length, Sample *out) {
   const qsrfhs::mkl_runtime::use in_use;
   const block_transform<Sample> transform(length);
@@ -93,11 +93,19 @@ convolution_part kept_part(std::size_t nx, std::size_t ny, convolution_mode mode
   return {0, nx + ny - 1};
 }
 
-template <class Sample>
-void convolve(std::span<const Sample> x, std::span<const Sample> y, const convolution_part &part,
+template <class Sample, class Tap>
+void convolve(std::span<const Sample> x, std::span<const Tap> y, const convolution_part &part,
               convolution_method method, Sample *out) {
-  if (x.size() < y.size()) std::swap(x, y);
-  const double direct = static_cast<double>(part.count) * static_cast<double>(y.size()) * tap_cost<Sample, Sample>;
+  if (x.size() < y.size()) {  // the shorter record is the taps
+    if constexpr (std::is_same_v<Sample, Tap>) {
+      std::swap(x, y);
+    } else {
+      const qsrfhs::aligned_buffer<Sample> wide(y.size());
+      std::copy(y.begin(), y.end(), wide.data());
+      return convolve<Sample, Sample>(wide.elements(), x, part, method, out);
+    }
+  }
+  const double direct = static_cast<double>(part.count) * static_cast<double>(y.size()) * tap_cost<Sample, Tap>;
   if (method == convolution_method::direct || y.size() > longest_in_blocks) return convolve_directly(x, y, part, out);
   const std::size_t block = best_block<Sample>(y.size()), step = block - y.size() + 1;
   // Beside the blocks there are the taps to transform; in one piece, three transforms instead of a block's two.
@@ -118,18 +126,22 @@ void correlate(std::span<const Sample> x, std::span<const Sample> y, const convo
   std::reverse_copy(y.begin(), y.end(), reversed.data());
   if constexpr (is_complex<Sample>)
     std::for_each_n(reversed.data(), reversed.size(), [](Sample &v) { v = std::conj(v); });
-  convolve<Sample>(x, reversed.elements(), part, method, out);
+  convolve<Sample, Sample>(x, reversed.elements(), part, method, out);
 }
 
-#define INSTANTIATE(SAMPLE)                                                                           \
-  template void convolve(std::span<const SAMPLE>, std::span<const SAMPLE>, const convolution_part &,  \
-                         convolution_method, SAMPLE *);                                               \
-  template void correlate(std::span<const SAMPLE>, std::span<const SAMPLE>, const convolution_part &, \
-                          convolution_method, SAMPLE *)
-INSTANTIATE(float);
-INSTANTIATE(double);
-INSTANTIATE(std::complex<float>);
-INSTANTIATE(std::complex<double>);
+#define INSTANTIATE(OPERATION, SAMPLE, TAP)                                                                            \
+  template void OPERATION(std::span<const SAMPLE>, std::span<const TAP>, const convolution_part &, convolution_method, \
+                          SAMPLE *)
+INSTANTIATE(convolve, float, float);
+INSTANTIATE(convolve, double, double);
+INSTANTIATE(convolve, std::complex<float>, float);
+INSTANTIATE(convolve, std::complex<double>, double);
+INSTANTIATE(convolve, std::complex<float>, std::complex<float>);
+INSTANTIATE(convolve, std::complex<double>, std::complex<double>);
+INSTANTIATE(correlate, float, float);
+INSTANTIATE(correlate, double, double);
+INSTANTIATE(correlate, std::complex<float>, std::complex<float>);
+INSTANTIATE(correlate, std::complex<double>, std::complex<double>);
 #undef INSTANTIATE
 
 }  // namespace dsp

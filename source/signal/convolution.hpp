@@ -25,9 +25,9 @@ struct convolution_part {
 inline constexpr std::size_t longest_in_blocks = most_fft_points / 2;
 
 /// out[k] = sum over j of x[j] y[part.first + k - j], as many as the part has, apart from x and y. Throws
-/// std::bad_alloc, dfti_failure.
-template <class Sample>
-void convolve(std::span<const Sample> x, std::span<const Sample> y, const convolution_part &part,
+/// std::bad_alloc, dfti_failure. Taps are samples, or real.
+template <class Sample, class Tap>
+void convolve(std::span<const Sample> x, std::span<const Tap> y, const convolution_part &part,
               convolution_method method, Sample *out);
 
 /// The same with y reversed and conjugated.

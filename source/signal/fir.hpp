@@ -85,6 +85,7 @@ class fir_filter {
   void process(std::span<const Sample> in, Sample *out);
   void reset() noexcept;
 
+  [[nodiscard]] std::span<const Tap> taps() const noexcept { return taps_.elements(); }
   /// All that the filter remembers: its latest samples, one less than there are taps.
   [[nodiscard]] std::span<const Sample> past() const noexcept { return line_.past(); }
   void set_past(std::span<const Sample> samples) noexcept;
