@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "host_arrays.hpp"
 
-#include <cmath>
 #include <utility>
 
 namespace fuzz {
@@ -22,26 +21,6 @@ bool is_wide(host::element_type type) noexcept {
 }
 bool is_complex(host::element_type type) noexcept {
   return type == host::element_type::cf32 || type == host::element_type::cf64;
-}
-
-/// Noise, with special values among it or without, or the input's own bytes. Whether all are tame.
-template <class T>
-bool fill(input &in, char *to, std::size_t n) {
-  const unsigned style = in.choice(5);
-  std::uint32_t seed = style < 4 ? in.byte() : 0;
-  bool tame = true;
-  for (std::size_t i = 0; i < n; ++i) {
-    seed = seed * 1664525U + 1013904223U;
-    T value = static_cast<T>(static_cast<float>(seed >> 8) / 8388608.F - 1.F);
-    if (style == 3 && seed % 3 == 0) {
-      value = static_cast<T>(in.left() ? in.real() : 0);
-    } else if (style == 4) {
-      value = in.raw<T>();
-    }
-    tame = tame && (value == 0 || (std::abs(value) <= 1 && std::abs(value) >= T(1e-9)));
-    std::memcpy(to + i * sizeof value, &value, sizeof value);
-  }
-  return tame;
 }
 
 }  // namespace

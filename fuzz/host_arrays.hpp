@@ -52,8 +52,9 @@ struct array {
   std::vector<unsigned char> before;
   std::vector<std::complex<double>> values;  // as they were before the call
 
+  /// As arguments take it.
   template <class Block>
-  Block **as() noexcept {
+  operator Block **() noexcept {
     return reinterpret_cast<Block **>(handle);
   }
   [[nodiscard]] std::int32_t size(int dimension) const noexcept;  // 0 where there is none

@@ -231,7 +231,7 @@ class filters {
       case 0: {
         auto &given = on.give<lumra_f32_block>(reads, static_cast<int>(in.choice(40)));
         const std::uint64_t count = special ? 1 + in.byte() : in.one_in(4) ? in.choice(300) : 0;
-        const auto code = qsUtilHS_RegisterFilterSpec(place, given.as<lumra_f32_block>(), spec,
+        const auto code = qsUtilHS_RegisterFilterSpec(place, static_cast<lumra_f32_block **>(given), spec,
                                                       in.one_in(32) ? in.raw<std::uint64_t>() | 1ULL << 32 : count);
         if (check_code(code, {-50462874, -50462898})) return;
         return take(record);

@@ -88,8 +88,8 @@ void measure(bench &b) {
   const std::int32_t size = b.fft_size(), type = b.in.option(3);
   const bool overlaps = b.in.flag();
   const double percent = !overlaps ? 0 : b.in.one_in(4) ? b.in.real() * 100 : b.in.choice(100);
-  const lumra_waveform in{0, 1e-6, x.as<lumra_cf32_block>()};
-  lumra_spectrum spectrum{7, 7, out.as<lumra_f32_block>()};
+  const lumra_waveform in{0, 1e-6, x};
+  lumra_spectrum spectrum{7, 7, out};
   const auto *const from = b.in.one_in(64) ? nullptr : &in;
   auto *const to = b.in.one_in(64) ? nullptr : &spectrum;
   const auto code =
@@ -192,8 +192,7 @@ void error_vector(bench &b) {
   auto &e = on.give<lumra_f32_matrix_block>(reads, rows, columns);
   const unsigned form = b.in.choice(3);
   const std::int32_t mode = b.in.option(4);
-  const auto code = forms[form](x.as<lumra_cf32_matrix_block>(), y.as<lumra_cf32_matrix_block>(),
-                                e.as<lumra_f32_matrix_block>(), mode);
+  const auto code = forms[form](x, y, e, mode);
   const bool valid = mode >= 1 && mode <= 3 && x.values.size() == y.values.size() && x.values.size() == e.values.size();
   hold(code == 0 ? valid : code == -312401 && (!valid || !on.plain()), "code of error vectors");
   if (code == 0) e.roles = 0;

@@ -56,7 +56,7 @@ typedef struct lumra_window_quality {
 
 /* Computes the figures from the n values, in time proportional to n.
  *
- * n        1 or more
+ * n        1 to 2^32
  * figures  written
  *
  * Returns 0, or in the order of the checks: LUMRA_UNKNOWN_CHOICE type; LUMRA_OUT_OF_RANGE parameter;

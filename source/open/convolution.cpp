@@ -33,7 +33,8 @@ lumra_status combine(const char *function, const T *x, std::uint64_t nx, const T
     require(method != dsp::convolution_method::fourier || std::min(nx, ny) <= dsp::longest_in_blocks,
             LUMRA_OUT_OF_RANGE, "the shorter record has ", std::min(nx, ny),
             " elements; with LUMRA_METHOD_FOURIER it has at most 2^26");
-    const auto first = array(samples(x), nx, "x"), second = array(samples(y), ny, "y");
+    const auto first = array(samples(x), nx, "x");
+    const auto second = array(samples(y), ny, "y");
     require(room >= part.count, LUMRA_TOO_LITTLE_ROOM, "room is ", room, "; the result has ", std::uint64_t{part.count},
             " elements");
     const auto result = array(samples(out), part.count, "out");

@@ -53,7 +53,8 @@ lumra_status lumra_window_figures(int32_t type, double parameter, int32_t span, 
   return enter(__func__, [&] {
     const dsp::window_shape shape = checked_shape(type, parameter);
     const dsp::window_span extent = checked_span(span);
-    require(n >= 1, LUMRA_OUT_OF_RANGE, "n is 0; a window has at least 1 value");
+    constexpr std::uint64_t most = std::uint64_t{1} << 32;
+    require(n >= 1 && n <= most, LUMRA_OUT_OF_RANGE, "n is ", n, "; figures are measured of 1 to 2^32 values");
     require_present(figures, "figures");
     const dsp::window_quality measured = dsp::measure_window(shape, extent, n);
     *figures = {measured.coherent_gain, measured.noise_bandwidth, measured.scalloping_loss};
