@@ -181,7 +181,7 @@ void recursive_filter::reset() noexcept {
 }
 
 template <class Visit>
-void recursive_filter::for_each_stage(Visit visit) const noexcept {
+void recursive_filter::for_each_stage(Visit visit) const {
   const double *plan = plans_.data();
   double *memory = memory_.data();
   for (const recursion_coefficients &stage : stages_) {

@@ -81,7 +81,7 @@ class recursive_filter {
   using planes = std::array<double *, 2>;
 
   template <class Visit>
-  void for_each_stage(Visit visit) const noexcept;
+  void for_each_stage(Visit visit) const;
   void run_chunk(planes &in, planes &out, std::size_t n) noexcept;
   [[nodiscard]] std::size_t plane_size() const noexcept;
   void run_stage(const stage_view &stage, const planes &in, const planes &out, std::size_t n) noexcept;

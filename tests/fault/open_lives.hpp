@@ -1,0 +1,158 @@
+// What callers of the open interface do, in steps that can be done again after a failure. SPDX-License-Identifier: MIT
+#pragma once
+
+#include <gtest/gtest.h>
+#include <lumra/lumra.h>
+
+#include <algorithm>
+#include <initializer_list>
+#include <type_traits>
+#include <vector>
+
+namespace tests {
+
+/// Room and data of one life; nothing of it is allocated inside of a step.
+struct open_life {
+  std::vector<float> in, out, taps;
+  std::vector<unsigned char> bytes;
+  std::uint64_t count = 0;
+  lumra_fft *fft = nullptr;
+  lumra_fir *fir = nullptr, *loaded_fir = nullptr;
+  lumra_iir *iir = nullptr, *loaded_iir = nullptr;
+  lumra_least_squares *solver = nullptr;
+
+  open_life() : in(8192), out(16384), taps(300), bytes(1 << 16) {
+    for (std::size_t k = 0; k < in.size(); ++k) in[k] = static_cast<float>(k * k % 97) / 97 - 0.5F;
+    std::copy_n(in.begin(), taps.size(), taps.begin());
+  }
+  open_life(const open_life &) = delete;
+  open_life &operator=(const open_life &) = delete;
+  ~open_life() {
+    lumra_fft_free(fft);
+    lumra_fir_free(fir);
+    lumra_fir_free(loaded_fir);
+    lumra_iir_free(iir);
+    lumra_iir_free(loaded_iir);
+    lumra_least_squares_free(solver);
+  }
+};
+
+using open_step = lumra_status (*)(open_life &);
+
+/// The first failure of calls that follow each other.
+inline lumra_status first_of(std::initializer_list<lumra_status> codes) {
+  for (const lumra_status code : codes)
+    if (code != LUMRA_SUCCESS) return code;
+  return LUMRA_SUCCESS;
+}
+
+template <class Samples>
+auto *complex(Samples &x) {
+  return reinterpret_cast<std::conditional_t<std::is_const_v<Samples>, const lumra_cf32, lumra_cf32> *>(x.data());
+}
+
+struct named_life {
+  const char *name;
+  std::vector<open_step> steps;
+};
+
+/// Every object is made, used, saved and loaded; transforms of a prime's length are MKL's hardest.
+inline const named_life open_lives[] = {
+    {"transforms",
+     {[](open_life &l) {
+        const lumra_fft_options options{sizeof options, LUMRA_TYPE_CF32, 1009, LUMRA_FFT_SCALE_BACKWARD, 0};
+        return lumra_fft_create(&options, &l.fft);
+      },
+      [](open_life &l) { return lumra_fft_forward(l.fft, l.in.data(), l.out.data(), 3, nullptr); },
+      [](open_life &l) {
+        const lumra_fft_layout rows{2, 1, 3, 1};
+        return lumra_fft_backward(l.fft, l.in.data(), l.out.data(), 2, &rows);
+      }}},
+    {"FIR filters",
+     {[](open_life &l) {
+        const lumra_fir_options options{sizeof options, LUMRA_TYPE_F32, 0, LUMRA_METHOD_FOURIER};
+        return lumra_fir_create(&options, l.taps.data(), l.taps.size(), &l.fir);
+      },
+      [](open_life &l) {
+        return first_of({lumra_fir_reset(l.fir), lumra_fir_process(l.fir, l.in.data(), l.out.data(), 5000)});
+      },
+      [](open_life &l) {
+        return first_of({lumra_fir_state_size(l.fir, &l.count), lumra_fir_save(l.fir, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_fir_free(l.loaded_fir);
+        l.loaded_fir = nullptr;
+        const lumra_status code = lumra_fir_load(l.bytes.data(), l.count, &l.loaded_fir);
+        return code != 0 ? code : lumra_fir_process(l.loaded_fir, l.in.data(), l.out.data(), 1000);
+      }}},
+    {"recursive filters",
+     {[](open_life &l) {
+        const double b[] = {0.1, 0.2, 0.1}, a[] = {1, -1.2, 0.5};
+        return lumra_iir_create(nullptr, b, 3, a, 3, &l.iir);
+      },
+      [](open_life &l) {
+        lumra_iir_free(l.iir);
+        l.iir = nullptr;
+        const double sections[] = {0.1, 0.2, 0.1, 1, -1.2, 0.5, 1, 0, 0, 2, 0.1, 0};
+        return lumra_iir_create_sections(nullptr, sections, 2, &l.iir);
+      },
+      [](open_life &l) {
+        double state[8] = {1, 2, 3, 4};
+        return first_of({lumra_iir_set_state(l.iir, state, 4),
+                         lumra_iir_process(l.iir, l.in.data(), l.out.data(), 1001),
+                         lumra_iir_get_state(l.iir, state, 4)});
+      },
+      [](open_life &l) {
+        return first_of({lumra_iir_state_size(l.iir, &l.count), lumra_iir_save(l.iir, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_iir_free(l.loaded_iir);
+        l.loaded_iir = nullptr;
+        const lumra_status code = lumra_iir_load(l.bytes.data(), l.count, &l.loaded_iir);
+        return code != 0 ? code : lumra_iir_process(l.loaded_iir, l.in.data(), l.out.data(), 1000);
+      }}},
+    {"least squares",
+     {[](open_life &l) {
+        const lumra_least_squares_options options{sizeof options, LUMRA_TYPE_CF32, 60, 40, 2};
+        return lumra_least_squares_create(&options, &l.solver);
+      },
+      [](open_life &l) {
+        return lumra_least_squares_solve(l.solver, l.in.data(), l.in.data(), 0, l.out.data(), &l.count);
+      },
+      [](open_life &l) {  // singular values are asked for
+        return lumra_least_squares_solve(l.solver, l.in.data(), l.in.data(), 0.5, l.out.data(), &l.count);
+      }}},
+    {"functions",
+     {[](open_life &l) {
+        return lumra_convolve_f32(l.in.data(), 4000, l.in.data(), 3000, 0, LUMRA_METHOD_FOURIER, l.out.data(), 6999);
+      },
+      [](open_life &l) {
+        return lumra_convolve_with_real_cf32(complex(l.in), 4000, l.taps.data(), 100, 1, LUMRA_METHOD_FOURIER,
+                                             complex(l.out), 4000);
+      },
+      [](open_life &l) {
+        return lumra_correlate_cf32(complex(l.in), 1000, complex(l.in), 50, 0, LUMRA_METHOD_DIRECT, complex(l.out),
+                                    1049);
+      },
+      [](open_life &l) { return lumra_design_kaiser_lowpass_f32(1, 0.1, 0.12, 80, l.out.data(), l.out.size()); },
+      [](open_life &l) { return lumra_design_root_raised_cosine_f32(8, 1, 0.2, 16, l.out.data(), l.out.size()); },
+      [](open_life &l) { return lumra_window_make_f32(LUMRA_WINDOW_KAISER, 9, 0, l.out.data(), 1000); },
+      [](open_life &l) { return lumra_log2_power_cf32(complex(l.in), 1, 0, l.out.data(), 1000); },
+      [](open_life &l) {
+        return lumra_lookup_cf32(complex(l.in), l.in.data(), complex(l.taps), 100, 0, 0.1F, complex(l.out), 1000);
+      }}},
+};
+
+/// Does all steps, the chosen one while fails(armed step) makes calls fail, and again where that failed. What came out
+/// in the end.
+template <class Fails>
+std::vector<float> live_with(const named_life &life, std::size_t chosen, Fails fails) {
+  open_life l;
+  for (std::size_t k = 0; k < life.steps.size(); ++k) {
+    if (k == chosen && fails([&] { return life.steps[k](l); }) == LUMRA_SUCCESS) continue;
+    EXPECT_EQ(LUMRA_SUCCESS, life.steps[k](l)) << life.name << ", step " << k << ": " << lumra_last_error();
+  }
+  return l.out;
+}
+
+}  // namespace tests
