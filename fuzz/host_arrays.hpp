@@ -101,11 +101,4 @@ inline bool check_code(std::int32_t code, std::initializer_list<std::int32_t> co
   return code != 0;
 }
 
-/// Every element differs by less than the tolerance.
-template <class Got, class Want>
-void check_near(const Got &got, const Want &want, double tolerance, int line = __builtin_LINE()) {
-  hold(got.size() == want.size(), "number of results", line);
-  for (std::size_t i = 0; i < want.size(); ++i) hold(std::abs(got[i] - want[i]) <= tolerance, "result", line);
-}
-
 }  // namespace fuzz
