@@ -1,52 +1,22 @@
 // FIR filters of streams, convolution and correlation of the open interface beside liquid-dsp and, as the limit of long
 // filters, bare MKL transforms, on one thread. Ratios within one run count; figures of different runs do not compare.
 // SPDX-License-Identifier: MIT
-#include <benchmark/benchmark.h>
-#include <lumra/lumra.h>
-#include <mkl_dfti.h>
-
-#include <cmath>
-#include <complex>
-#include <cstdlib>
-#include <vector>
 
 #ifdef LUMRA_PEER_LIQUID
 #include <liquid/liquid.h>
 #endif
 
+#include "bench.hpp"
+
 namespace {
 
-using cf32 = std::complex<float>;
-using cf64 = std::complex<double>;
-
-template <class T>
-std::vector<T> signal(std::size_t n) {
-  std::vector<T> out(n);
-  for (std::size_t i = 0; i < n; ++i) {
-    const double phase = 0.37 * static_cast<double>(i) + 1e-5 * static_cast<double>(i * i % 10007);
-    if constexpr (std::is_floating_point_v<T>)
-      out[i] = static_cast<T>(std::cos(phase));
-    else
-      out[i] = T(std::polar(1.0, phase));
-  }
-  return out;
-}
-
-void check(bool good) {
-  if (!good) std::abort();
-}
-
-template <class T>
-constexpr std::int32_t type_of = std::is_same_v<T, float>    ? LUMRA_TYPE_F32
-                                 : std::is_same_v<T, double> ? LUMRA_TYPE_F64
-                                 : std::is_same_v<T, cf32>   ? LUMRA_TYPE_CF32
-                                                             : LUMRA_TYPE_CF64;
+using namespace bench;
 
 /// Arguments: taps, samples a call.
 template <class Sample, class Tap>
 void fir(benchmark::State &state, std::int32_t method) {
-  const auto taps = signal<Tap>(static_cast<std::size_t>(state.range(0)));
-  const auto x = signal<Sample>(static_cast<std::size_t>(state.range(1)));
+  const auto taps = record<Tap>(static_cast<std::size_t>(state.range(0)));
+  const auto x = record<Sample>(static_cast<std::size_t>(state.range(1)));
   std::vector<Sample> out(x.size());
   lumra_fir_options options = LUMRA_FIR_OPTIONS;
   options.type = type_of<Sample>;
@@ -81,34 +51,29 @@ lumra_status convolve(const cf64 *x, std::uint64_t nx, const cf64 *y, std::uint6
 /// Arguments: both lengths.
 template <class T>
 void convolution(benchmark::State &state, std::int32_t method) {
-  const auto x = signal<T>(static_cast<std::size_t>(state.range(0)));
-  const auto y = signal<T>(static_cast<std::size_t>(state.range(1)));
+  const auto x = record<T>(static_cast<std::size_t>(state.range(0)));
+  const auto y = record<T>(static_cast<std::size_t>(state.range(1)));
   std::vector<T> out(x.size() + y.size() - 1);
   for (auto _ : state) check(convolve(x.data(), x.size(), y.data(), y.size(), method, out.data()) == LUMRA_SUCCESS);
   state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
 /// The two transforms of one block, bare. Argument: points.
-void transforms(benchmark::State &state, DFTI_CONFIG_VALUE precision, DFTI_CONFIG_VALUE domain) {
-  const MKL_LONG points = state.range(0);
-  std::vector<cf64> in(static_cast<std::size_t>(points) + 1), out(in.size());
-  DFTI_DESCRIPTOR_HANDLE descriptor = nullptr;
-  check(DftiCreateDescriptor(&descriptor, precision, domain, 1, points) == 0);
-  check(DftiSetValue(descriptor, DFTI_PLACEMENT, DFTI_NOT_INPLACE) == 0);
-  check(DftiSetValue(descriptor, DFTI_CONJUGATE_EVEN_STORAGE, DFTI_COMPLEX_COMPLEX) == 0);
-  check(DftiCommitDescriptor(descriptor) == 0);
+void transforms(benchmark::State &state, bool double_precision, bool complex) {
+  const auto points = static_cast<std::size_t>(state.range(0));
+  std::vector<cf64> in(points + 1), out(points + 1);
+  mkl_transform transform(points, double_precision, complex, false);
   for (auto _ : state) {
-    DftiComputeForward(descriptor, in.data(), out.data());
-    DftiComputeBackward(descriptor, out.data(), in.data());
+    transform.forward(in.data(), out.data());
+    transform.backward(out.data(), in.data());
   }
-  DftiFreeDescriptor(&descriptor);
-  state.SetItemsProcessed(state.iterations() * points);
+  rate(state, points);
 }
 
 #ifdef LUMRA_PEER_LIQUID
 void liquid_fir(benchmark::State &state) {
-  auto taps = signal<float>(static_cast<std::size_t>(state.range(0)));
-  auto x = signal<cf32>(static_cast<std::size_t>(state.range(1)));
+  auto taps = record<float>(static_cast<std::size_t>(state.range(0)));
+  auto x = record<cf32>(static_cast<std::size_t>(state.range(1)));
   std::vector<cf32> out(x.size());
   const firfilt_crcf filter = firfilt_crcf_create(taps.data(), static_cast<unsigned>(taps.size()));
   for (auto _ : state)
@@ -119,8 +84,8 @@ void liquid_fir(benchmark::State &state) {
 }
 
 void liquid_fir_real(benchmark::State &state) {
-  auto taps = signal<float>(static_cast<std::size_t>(state.range(0)));
-  auto x = signal<float>(static_cast<std::size_t>(state.range(1)));
+  auto taps = record<float>(static_cast<std::size_t>(state.range(0)));
+  auto x = record<float>(static_cast<std::size_t>(state.range(1)));
   std::vector<float> out(x.size());
   const firfilt_rrrf filter = firfilt_rrrf_create(taps.data(), static_cast<unsigned>(taps.size()));
   for (auto _ : state) firfilt_rrrf_execute_block(filter, x.data(), static_cast<unsigned>(x.size()), out.data());
@@ -130,9 +95,9 @@ void liquid_fir_real(benchmark::State &state) {
 
 /// Its filter by transforms, in blocks as long as the taps.
 void liquid_blocks(benchmark::State &state) {
-  auto taps = signal<float>(static_cast<std::size_t>(state.range(0)));
+  auto taps = record<float>(static_cast<std::size_t>(state.range(0)));
   const auto block = static_cast<unsigned>(taps.size());
-  auto x = signal<cf32>(block);
+  auto x = record<cf32>(block);
   std::vector<cf32> out(block);
   const fftfilt_crcf filter = fftfilt_crcf_create(taps.data(), block, block);
   for (auto _ : state)
@@ -184,10 +149,10 @@ CONVOLUTION(cf32);
 CONVOLUTION(cf64);
 #undef CONVOLUTION
 
-BENCHMARK_CAPTURE(transforms, real_single, DFTI_SINGLE, DFTI_REAL)->RangeMultiplier(2)->Range(256, 1 << 17);
-BENCHMARK_CAPTURE(transforms, complex_single, DFTI_SINGLE, DFTI_COMPLEX)->RangeMultiplier(2)->Range(256, 1 << 17);
-BENCHMARK_CAPTURE(transforms, real_double, DFTI_DOUBLE, DFTI_REAL)->RangeMultiplier(2)->Range(256, 1 << 17);
-BENCHMARK_CAPTURE(transforms, complex_double, DFTI_DOUBLE, DFTI_COMPLEX)->RangeMultiplier(2)->Range(256, 1 << 17);
+BENCHMARK_CAPTURE(transforms, real_single, false, false)->RangeMultiplier(2)->Range(256, 1 << 17);
+BENCHMARK_CAPTURE(transforms, complex_single, false, true)->RangeMultiplier(2)->Range(256, 1 << 17);
+BENCHMARK_CAPTURE(transforms, real_double, true, false)->RangeMultiplier(2)->Range(256, 1 << 17);
+BENCHMARK_CAPTURE(transforms, complex_double, true, true)->RangeMultiplier(2)->Range(256, 1 << 17);
 
 }  // namespace
 

@@ -1,15 +1,9 @@
 // Transforms of the open interface beside MKL alone (names: type/direction/who/points). Real spectra are halves for
 // both. SPDX-License-Identifier: MIT
-#include <benchmark/benchmark.h>
-#include <lumra/transform.h>
-#include <mkl_dfti.h>
-
-#include <cmath>
-#include <complex>
-#include <memory>
 #include <random>
 #include <sstream>
-#include <vector>
+
+#include "bench.hpp"
 
 namespace {
 
@@ -26,29 +20,14 @@ struct work {
 };
 
 /// Scaled both ways, so that transforms in place can be repeated for ever.
-struct mkl_transform {
-  mkl_transform(bool real, std::size_t points, bool in_place) {
-    const double scale = 1 / std::sqrt(static_cast<double>(points));
-    (void)DftiCreateDescriptor(&handle, DFTI_SINGLE, real ? DFTI_REAL : DFTI_COMPLEX, 1, static_cast<MKL_LONG>(points));
-    (void)DftiSetValue(handle, DFTI_PLACEMENT, in_place ? DFTI_INPLACE : DFTI_NOT_INPLACE);
-    if (real) (void)DftiSetValue(handle, DFTI_CONJUGATE_EVEN_STORAGE, DFTI_COMPLEX_COMPLEX);
-    (void)DftiSetValue(handle, DFTI_FORWARD_SCALE, scale);
-    (void)DftiSetValue(handle, DFTI_BACKWARD_SCALE, scale);
-    (void)DftiCommitDescriptor(handle);
-  }
-  mkl_transform(const mkl_transform &) = delete;
-  mkl_transform &operator=(const mkl_transform &) = delete;
-  ~mkl_transform() { (void)DftiFreeDescriptor(&handle); }
-  DFTI_DESCRIPTOR_HANDLE handle = nullptr;
-};
-
 void mkl_alone(benchmark::State &state, bool real, std::size_t points, direction d) {
-  const mkl_transform transform(real, points, d == direction::forward_in_place);
+  bench::mkl_transform transform(points, false, !real, d == direction::forward_in_place,
+                                 1 / std::sqrt(static_cast<double>(points)));
   work w(points);
   for (auto _ : state) {
-    if (d == direction::forward) (void)DftiComputeForward(transform.handle, w.record.data(), w.spectrum.data());
-    if (d == direction::forward_in_place) (void)DftiComputeForward(transform.handle, w.record.data());
-    if (d == direction::backward) (void)DftiComputeBackward(transform.handle, w.spectrum.data(), w.record.data());
+    if (d == direction::forward) transform.forward(w.record.data(), w.spectrum.data());
+    if (d == direction::forward_in_place) transform.forward(w.record.data());
+    if (d == direction::backward) transform.backward(w.spectrum.data(), w.record.data());
     benchmark::ClobberMemory();
   }
 }

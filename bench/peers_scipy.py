@@ -32,13 +32,3 @@ for name, x in (("real", record.real.copy()), ("complex", record)):
 for n in (1024, 65536, 1009):
     for name, x, transform in (("fft", samples[:n], scipy.fft.fft), ("rfft", samples.real[:n].copy(), scipy.fft.rfft)):
         print(f"scipy.fft.{name}/{n}: {n / rate(n, lambda: transform(x)):.1f} us")
-for taps in (16, 64, 1000):
-    h = np.ones(taps, np.float32)
-    one = np.ones(1, np.float32)
-    print(f"scipy.signal.lfilter, {taps} taps, complex: "
-          f"{rate(record.size, lambda: scipy.signal.lfilter(h, one, record)):.1f} Msamples/s")
-for name, x in (("real", samples.real.copy()), ("complex", samples)):
-    for longer in (1000, 10_000, 100_000, 1_000_000):
-        for shorter in (16, 50, 300, 1000, 5000):
-            convolve = rate(longer, lambda: scipy.signal.oaconvolve(x[:longer], x[:shorter]))
-            print(f"scipy.signal.oaconvolve, {name}, {longer} x {shorter}: {convolve:.1f} Msamples/s")

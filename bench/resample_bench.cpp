@@ -19,36 +19,20 @@
 #include <samplerate.h>
 #endif
 
+#include "bench.hpp"
+
 namespace {
 
-using cf32 = std::complex<float>;
-using cf64 = std::complex<double>;
+using namespace bench;
 
 constexpr float ratio = 1.37F;  // input samples per output sample
 constexpr std::size_t block = 16384;
-
-template <class T>
-std::vector<T> signal() {
-  std::vector<T> out(block);
-  for (std::size_t i = 0; i < block; ++i) {
-    const double phase = 0.37 * static_cast<double>(i) + 1e-5 * static_cast<double>(i * i % 10007);
-    if constexpr (std::is_floating_point_v<T>)
-      out[i] = static_cast<T>(std::cos(phase));
-    else
-      out[i] = T(std::polar(1.0, phase));
-  }
-  return out;
-}
-
-void rate(benchmark::State &state) {
-  state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(block));
-}
 
 template <class T, class R, auto run>
 void resample(benchmark::State &state, std::int32_t interpolation, std::int32_t stretched) {
   constexpr std::size_t length = 32 * 64;
   lumra::host_array<T> x(block), out(0), history(0);
-  const auto samples = signal<T>();
+  const auto samples = record<T>(block);
   std::copy(samples.begin(), samples.end(), x.elements().begin());
   lumra::host_array<R> h(length), taps(0);
   for (std::size_t i = 0; i < length; ++i)
@@ -62,13 +46,13 @@ void resample(benchmark::State &state, std::int32_t interpolation, std::int32_t 
                      kept.data()));
     reset = false;
   }
-  rate(state);
+  rate(state, block);
 }
 
 #ifdef LUMRA_PEER_LIQUID
 /// As many taps to either side; it does not interpolate between its 64 phases.
 void liquid(benchmark::State &state) {
-  auto x = signal<cf32>();
+  auto x = record<cf32>(block);
   std::vector<cf32> y(block + 64);
   resamp_crcf peer = resamp_crcf_create(1 / ratio, 16, 0.4F, 60, 64);
   unsigned int written = 0;
@@ -77,14 +61,14 @@ void liquid(benchmark::State &state) {
     benchmark::ClobberMemory();
   }
   resamp_crcf_destroy(peer);
-  rate(state);
+  rate(state, block);
 }
 BENCHMARK(liquid);
 #endif
 
 #ifdef LUMRA_PEER_SOXR
 void soxr(benchmark::State &state) {
-  const auto x = signal<cf32>();
+  const auto x = record<cf32>(block);
   std::vector<cf32> y(block + 64);
   const soxr_quality_spec_t quality = soxr_quality_spec(SOXR_MQ, 0);
   const soxr_io_spec_t interleaved = soxr_io_spec(SOXR_FLOAT32_I, SOXR_FLOAT32_I);
@@ -98,14 +82,14 @@ void soxr(benchmark::State &state) {
     benchmark::ClobberMemory();
   }
   soxr_delete(peer);
-  rate(state);
+  rate(state, block);
 }
 BENCHMARK(soxr);
 #endif
 
 #ifdef LUMRA_PEER_SAMPLERATE
 void libsamplerate(benchmark::State &state) {
-  const auto x = signal<cf32>();
+  const auto x = record<cf32>(block);
   std::vector<cf32> y(block + 64);
   int error = 0;
   SRC_STATE *peer = src_new(SRC_SINC_FASTEST, 2, &error);
@@ -121,7 +105,7 @@ void libsamplerate(benchmark::State &state) {
     benchmark::ClobberMemory();
   }
   src_delete(peer);
-  rate(state);
+  rate(state, block);
 }
 BENCHMARK(libsamplerate);
 #endif

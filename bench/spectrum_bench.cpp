@@ -23,19 +23,12 @@
 #include <liquid/liquid.h>
 #endif
 
+#include "bench.hpp"
+
 namespace {
 
 using sample = std::complex<float>;
 constexpr std::size_t count = 1 << 20;
-
-template <class T>
-struct aligned {
-  explicit aligned(std::size_t n) : memory(static_cast<T *>(std::aligned_alloc(64, (n * sizeof(T) + 63) / 64 * 64))) {}
-  ~aligned() { std::free(memory); }
-  aligned(const aligned &) = delete;
-  aligned &operator=(const aligned &) = delete;
-  T *memory;
-};
 
 const lumra::host_array<sample> &input() {
   static const auto array = [] {
@@ -48,7 +41,7 @@ const lumra::host_array<sample> &input() {
   return array;
 }
 
-std::vector<float> flat_top(std::size_t n) {
+[[maybe_unused]] std::vector<float> flat_top(std::size_t n) {
   std::vector<float> w(n);
   for (std::size_t k = 0; k < n; ++k) {
     const double x = 2 * std::numbers::pi * static_cast<double>(k) / static_cast<double>(n);
@@ -75,14 +68,14 @@ void lumra_windowed_fft(benchmark::State &state) {
 // The limit: nothing but the transforms, in place.
 void mkl_transforms_alone(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  const aligned<sample> work(n);
-  std::fill_n(work.memory, n, sample(0));
+  const auto work = bench::aligned<sample>(n);
+  std::fill_n(work.get(), n, sample(0));
   DFTI_DESCRIPTOR_HANDLE transform = nullptr;
   DftiCreateDescriptor(&transform, DFTI_SINGLE, DFTI_COMPLEX, 1, static_cast<MKL_LONG>(n));
   DftiCommitDescriptor(transform);
   const std::size_t segments = (count - n) / (n / 2) + 1;
   for (auto _ : state)
-    for (std::size_t s = 0; s < segments; ++s) DftiComputeForward(transform, work.memory);
+    for (std::size_t s = 0; s < segments; ++s) DftiComputeForward(transform, work.get());
   DftiFreeDescriptor(&transform);
   report(state, count);
 }
@@ -90,24 +83,24 @@ void mkl_transforms_alone(benchmark::State &state) {
 #if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 void fftw_with_volk(benchmark::State &state) {
   const auto n = static_cast<unsigned>(state.range(0));
-  const aligned<sample> work(n), spectrum(n);
-  const aligned<float> window(n), power(n), sum(n);
+  const auto work = bench::aligned<sample>(n), spectrum = bench::aligned<sample>(n);
+  const auto window = bench::aligned<float>(n), power = bench::aligned<float>(n), sum = bench::aligned<float>(n);
   const auto w = flat_top(n);
-  std::copy(w.begin(), w.end(), window.memory);
-  const auto plan = fftwf_plan_dft_1d(static_cast<int>(n), reinterpret_cast<fftwf_complex *>(work.memory),
-                                      reinterpret_cast<fftwf_complex *>(spectrum.memory), FFTW_FORWARD, FFTW_MEASURE);
+  std::copy(w.begin(), w.end(), window.get());
+  const auto plan = fftwf_plan_dft_1d(static_cast<int>(n), reinterpret_cast<fftwf_complex *>(work.get()),
+                                      reinterpret_cast<fftwf_complex *>(spectrum.get()), FFTW_FORWARD, FFTW_MEASURE);
   const std::size_t step = n / 2;
   const sample *x = input().elements().data();
   for (auto _ : state) {
-    std::fill_n(sum.memory, n, 0.F);
+    std::fill_n(sum.get(), n, 0.F);
     for (std::size_t start = 0; start + n <= count; start += step) {
-      volk_32fc_32f_multiply_32fc(work.memory, x + start, window.memory, n);
+      volk_32fc_32f_multiply_32fc(work.get(), x + start, window.get(), n);
       fftwf_execute(plan);
-      volk_32fc_magnitude_squared_32f(power.memory, spectrum.memory, n);
-      volk_32f_x2_add_32f(sum.memory, sum.memory, power.memory, n);
+      volk_32fc_magnitude_squared_32f(power.get(), spectrum.get(), n);
+      volk_32f_x2_add_32f(sum.get(), sum.get(), power.get(), n);
     }
-    volk_32f_s32f_multiply_32f(sum.memory, sum.memory, 1.F / static_cast<float>((count - n) / step + 1), n);
-    benchmark::DoNotOptimize(sum.memory[0]);
+    volk_32f_s32f_multiply_32f(sum.get(), sum.get(), 1.F / static_cast<float>((count - n) / step + 1), n);
+    benchmark::DoNotOptimize(sum.get()[0]);
   }
   fftwf_destroy_plan(plan);
   report(state, count);

@@ -17,62 +17,12 @@
 #include <numbers>
 #include <vector>
 
+#include "bench.hpp"
+
 namespace {
 
-using cf32 = std::complex<float>;
-using cf64 = std::complex<double>;
+using namespace bench;
 
-template <class T>
-lumra::host_array<T> signal(std::size_t n) {
-  lumra::host_array<T> out(n);
-  for (std::size_t i = 0; i < n; ++i) {
-    const double phase = 0.37 * static_cast<double>(i) + 1e-5 * static_cast<double>(i * i % 10007);
-    if constexpr (std::is_floating_point_v<T>)
-      out.elements()[i] = static_cast<T>(std::cos(phase));
-    else
-      out.elements()[i] = T(std::polar(1.0, phase));
-  }
-  return out;
-}
-
-template <class T>
-struct free_aligned {
-  void operator()(T *memory) const { std::free(memory); }
-};
-template <class T>
-std::unique_ptr<T[], free_aligned<T>> aligned(std::size_t n) {
-  return std::unique_ptr<T[], free_aligned<T>>(
-      static_cast<T *>(std::aligned_alloc(64, (n * sizeof(T) + 127) / 64 * 64)));
-}
-
-void rate(benchmark::State &state, std::size_t samples) {
-  state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(samples));
-}
-
-/// A committed transform, as bare as it gets.
-class bare {
- public:
-  bare(std::size_t n, bool is_double, bool complex, bool in_place) {
-    const auto precision = is_double ? DFTI_DOUBLE : DFTI_SINGLE;
-    DftiCreateDescriptor(&handle_, precision, complex ? DFTI_COMPLEX : DFTI_REAL, 1, static_cast<MKL_LONG>(n));
-    DftiSetValue(handle_, DFTI_PLACEMENT, in_place ? DFTI_INPLACE : DFTI_NOT_INPLACE);
-    DftiSetValue(handle_, DFTI_CONJUGATE_EVEN_STORAGE, DFTI_COMPLEX_COMPLEX);
-    DftiCommitDescriptor(handle_);
-  }
-  bare(const bare &) = delete;
-  ~bare() { DftiFreeDescriptor(&handle_); }
-  void forward(void *data) { DftiComputeForward(handle_, data); }
-  void forward(void *in, void *out) { DftiComputeForward(handle_, in, out); }
-  void backward(void *in, void *out) { DftiComputeBackward(handle_, in, out); }
-
- private:
-  DFTI_DESCRIPTOR_HANDLE handle_ = nullptr;
-};
-
-template <class T>
-constexpr bool is_double = sizeof(T) == (std::is_floating_point_v<T> ? 8 : 16);
-template <class T>
-constexpr bool is_complex = !std::is_floating_point_v<T>;
 template <class T>
 using bin_of = std::conditional_t<is_double<T>, cf64, cf32>;
 template <class T>
@@ -93,7 +43,7 @@ constexpr auto pick(S s, D d, C c, Z z) {
 template <class T>
 void fft(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  auto x = signal<T>(n);
+  auto x = host_record<T>(n);
   lumra::host_array<bin_of<T>> y(n);
   void *slot = nullptr;
   const auto run = pick<T>(&qsRFPELTA_s1DFFTH, &qsRFPELTA_d1DFFTH, &qsRFPELTA_c1DFFTH, &qsRFPELTA_z1DFFTH);
@@ -105,9 +55,9 @@ void fft(benchmark::State &state) {
 template <class T>
 void fft_mkl(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  auto x = signal<T>(n);
+  auto x = host_record<T>(n);
   lumra::host_array<bin_of<T>> y(n);
-  bare transform(n, is_double<T>, is_complex<T>, false);
+  mkl_transform transform(n, is_double<T>, is_complex<T>, false);
   for (auto _ : state) transform.forward(x.elements().data(), y.elements().data());
   rate(state, n);
 }
@@ -116,7 +66,7 @@ template <class T>
 void fft_mkl_in_place(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
   lumra::host_array<bin_of<T>> y(n + 2);
-  bare transform(n, is_double<T>, is_complex<T>, true);
+  mkl_transform transform(n, is_double<T>, is_complex<T>, true);
   for (auto _ : state) transform.forward(y.elements().data());
   rate(state, n);
 }
@@ -125,7 +75,7 @@ void fft_mkl_in_place(benchmark::State &state) {
 template <class T>
 void fft_fftw(benchmark::State &state) {
   const auto size = static_cast<int>(state.range(0));
-  auto x = signal<T>(static_cast<std::size_t>(size));
+  auto x = host_record<T>(static_cast<std::size_t>(size));
   lumra::host_array<bin_of<T>> y(static_cast<std::size_t>(size) + 1);
   auto *in = x.elements().data();
   auto *out = y.elements().data();
@@ -156,7 +106,7 @@ void fft_fftw(benchmark::State &state) {
 template <class T>
 void power_spectrum(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  auto x = signal<T>(n);
+  auto x = host_record<T>(n);
   lumra::host_array<part_of<T>> p(n);
   lumra::host_array<T> scratch(0);
   void *slot = nullptr;
@@ -194,8 +144,8 @@ void window_limit(benchmark::State &state) {
 template <class T>
 void convolution(benchmark::State &state) {
   const auto nx = static_cast<std::size_t>(state.range(0)), ny = static_cast<std::size_t>(state.range(1));
-  auto x = signal<T>(nx);
-  auto y = signal<T>(ny);
+  auto x = host_record<T>(nx);
+  auto y = host_record<T>(ny);
   lumra::host_array<T> out(nx + ny - 1), room(0);
   void *slot = nullptr;
   const auto run = pick<T>(&qsRFPELTA_s1DConvolutionH, &qsRFPELTA_d1DConvolutionH, &qsRFPELTA_c1DConvolutionH,
@@ -209,7 +159,7 @@ void convolution(benchmark::State &state) {
 
 void bare_axpy(benchmark::State &state) {
   const auto nx = static_cast<std::size_t>(state.range(0)), ny = static_cast<std::size_t>(state.range(1));
-  auto x = signal<float>(nx);
+  auto x = host_record<float>(nx);
   lumra::host_array<float> out(nx + ny - 1);
   float *const to = out.elements().data();
   for (auto _ : state) {
@@ -224,7 +174,7 @@ void three_transforms(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(2)), nx = static_cast<std::size_t>(state.range(0));
   auto time = aligned<float>(n + 2), one = aligned<float>(n + 2), two = aligned<float>(n + 2);
   std::fill_n(time.get(), n + 2, 0.5F);
-  bare transform(n, false, false, false);
+  mkl_transform transform(n, false, false, false);
   for (auto _ : state) {
     transform.forward(time.get(), one.get());
     transform.forward(time.get(), two.get());

@@ -13,23 +13,11 @@
 #include <numbers>
 #include <vector>
 
+#include "bench.hpp"
+
 namespace {
 
-using cf32 = std::complex<float>;
-using cf64 = std::complex<double>;
-
-template <class T>
-lumra::host_array<T> signal(std::size_t n) {
-  lumra::host_array<T> out(n);
-  for (std::size_t i = 0; i < n; ++i) {
-    const double phase = 0.37 * static_cast<double>(i) + 1e-5 * static_cast<double>(i * i % 10007);
-    if constexpr (std::is_floating_point_v<T>)
-      out.elements()[i] = static_cast<T>(std::cos(phase));
-    else
-      out.elements()[i] = T(std::polar(1.0, phase));
-  }
-  return out;
-}
+using namespace bench;
 
 template <class T>
 lumra::host_array<T> array(std::initializer_list<double> from) {
@@ -38,17 +26,10 @@ lumra::host_array<T> array(std::initializer_list<double> from) {
   return out;
 }
 
-void rate(benchmark::State &state, std::size_t samples, std::size_t width = 0) {
-  state.SetItemsProcessed(state.iterations() * static_cast<std::int64_t>(samples));
-  if (width) state.SetBytesProcessed(state.iterations() * static_cast<std::int64_t>(samples * width));
-}
-
-// ---- reading: the limit of decimation with averaging and of RMS
-
 template <class T>
 void read(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  const auto x = signal<T>(n);
+  const auto x = host_record<T>(n);
   const auto *words = reinterpret_cast<const std::uint64_t *>(x.elements().data());
   for (auto _ : state) {
     std::uint64_t sum[16] = {};
@@ -62,7 +43,7 @@ void read(benchmark::State &state) {
 template <class T, auto decimate>
 void average(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  const auto x = signal<T>(n);
+  const auto x = host_record<T>(n);
   lumra::host_array<T> out(n / static_cast<std::size_t>(state.range(1)));
   for (auto _ : state) lumra::check(decimate(x.get(), out.get(), static_cast<std::int32_t>(state.range(1)), 1));
   rate(state, n, sizeof(T));
@@ -71,7 +52,7 @@ void average(benchmark::State &state) {
 template <class T, class R, auto rms>
 void root_mean_square(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
-  const auto x = signal<T>(n);
+  const auto x = host_record<T>(n);
   R result = 0;
   for (auto _ : state) {
     lumra::check(rms(x.get(), &result));
@@ -89,8 +70,8 @@ constexpr std::initializer_list<double> reverse = {1, -0.7820951980, 0.679978526
 /// Data of which only the first samples are not zero when `tail` is set: all others are what rings on.
 template <class T, class R, auto run>
 void iir(benchmark::State &state, std::size_t n, bool tail, std::initializer_list<double> a) {
-  auto data = signal<T>(n);
-  const auto original = signal<T>(n);
+  auto data = host_record<T>(n);
+  const auto original = host_record<T>(n);
   const auto b = array<R>(forward), reversed = array<R>(a);
   lumra::host_array<T> forward_state(0), reverse_state(0), saved(0);
   lumra::host_array<R> first(0), second(0);
@@ -113,7 +94,7 @@ void iir(benchmark::State &state, std::size_t n, bool tail, std::initializer_lis
 /// The difference equation as one would write it.
 template <class T, class R>
 void iir_loop(benchmark::State &state, std::size_t n, bool tail, std::initializer_list<double> a_list) {
-  auto x = signal<T>(n);
+  auto x = host_record<T>(n);
   if (tail) {
     std::fill(x.elements().begin(), x.elements().end(), T{});
     x.elements()[0] = static_cast<R>(20 * std::numeric_limits<R>::min());
@@ -163,10 +144,17 @@ void product(benchmark::State &state, bool bare) {
   for (auto **array : {&a, &b, &c}) qsHost_ArrayFree(array);
 }
 
-void least_squares(benchmark::State &state, bool bare) {
+enum class solver { mkl, toolkit, open };
+
+void least_squares(benchmark::State &state, solver who) {
   constexpr std::int32_t m = 200, n = 50;
   auto *a = matrix<lumra_f32_matrix_block>(LUMRA_TYPE_F32, m, n);
-  const auto b = signal<float>(m);
+  std::uint32_t noise = 1;  // a matrix of full rank
+  for (float &v : std::span((*a)->elements, std::size_t{m} * n)) {
+    noise = noise * 1664525U + 1013904223U;
+    v = static_cast<float>(noise >> 8) / 8388608.F - 1;
+  }
+  const auto b = host_record<float>(m);
   lumra::host_array<float> x(n), first(0), second(0), third(0);
   std::vector<float> copy(m * n), rhs(m), s(n), work(1);
   std::vector<MKL_INT> integers(1);
@@ -178,12 +166,16 @@ void least_squares(benchmark::State &state, bool bare) {
   size = static_cast<MKL_INT>(work[0]);
   work.resize(static_cast<std::size_t>(size));
   integers.resize(static_cast<std::size_t>(integers[0]));
+  lumra::least_squares_solver<float> open_solver(m, n);
+  const std::span<const float> rows((*a)->elements, copy.size());
   for (auto _ : state) {
-    if (bare) {  // it destroys its matrix
+    if (who == solver::mkl) {  // it destroys its matrix
       std::memcpy(copy.data(), (*a)->elements, copy.size() * sizeof(float));
       std::memcpy(rhs.data(), b.elements().data(), rhs.size() * sizeof(float));
       sgelsd(&m, &n, &one, copy.data(), &m, rhs.data(), &m, s.data(), &tolerance, &rank, work.data(), &size,
              integers.data(), &info);
+    } else if (who == solver::open) {
+      benchmark::DoNotOptimize(open_solver(rows, b.elements()));
     } else {
       lumra::check(qsRFPELTA_sLSEqH(a, b.get(), tolerance, x.get(), first.get(), second.get(), third.get()));
     }
@@ -222,8 +214,9 @@ IIR(zd, cf64, double);
 
 BENCHMARK_CAPTURE(product, mkl, true);
 BENCHMARK_CAPTURE(product, lumra, false);
-BENCHMARK_CAPTURE(least_squares, mkl, true);
-BENCHMARK_CAPTURE(least_squares, lumra, false);
+BENCHMARK_CAPTURE(least_squares, mkl, solver::mkl);
+BENCHMARK_CAPTURE(least_squares, toolkit, solver::toolkit);
+BENCHMARK_CAPTURE(least_squares, open, solver::open);
 
 }  // namespace
 
