@@ -15,9 +15,9 @@ extern "C" {
 
 /* A solver for problems of one size: the x that make |a x - b| least, column by column of b, and of those the shortest.
  *
- * A problem of full rank is solved by a QR decomposition with column pivoting (of the conjugated transpose where there
- * are fewer rows than columns). Where an estimate of the matrix's condition leaves its rank in doubt, singular values
- * decide: those up to rcond times the largest count as zero, at about six times the cost. */
+ * A problem of full rank is solved by a QR decomposition (of the conjugated transpose where there are fewer rows than
+ * columns). Where an estimate of the matrix's condition leaves its rank in doubt, singular values decide: those up to
+ * rcond times the largest count as zero, at several times the cost. */
 typedef struct lumra_least_squares lumra_least_squares;
 
 typedef struct lumra_least_squares_options {

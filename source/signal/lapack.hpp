@@ -13,7 +13,7 @@ struct lapack;
 template <>
 struct lapack<float> {
   using element = float;
-  static constexpr auto geqp3 = &sgeqp3;
+  static constexpr auto geqrf = &sgeqrf;
   static constexpr auto multiply_by_q = &sormqr;
   static constexpr auto trtrs = &strtrs;
   static constexpr auto trcon = &strcon;
@@ -22,7 +22,7 @@ struct lapack<float> {
 template <>
 struct lapack<double> {
   using element = double;
-  static constexpr auto geqp3 = &dgeqp3;
+  static constexpr auto geqrf = &dgeqrf;
   static constexpr auto multiply_by_q = &dormqr;
   static constexpr auto trtrs = &dtrtrs;
   static constexpr auto trcon = &dtrcon;
@@ -31,7 +31,7 @@ struct lapack<double> {
 template <>
 struct lapack<std::complex<float>> {
   using element = MKL_Complex8;
-  static constexpr auto geqp3 = &cgeqp3;
+  static constexpr auto geqrf = &cgeqrf;
   static constexpr auto multiply_by_q = &cunmqr;
   static constexpr auto trtrs = &ctrtrs;
   static constexpr auto trcon = &ctrcon;
@@ -40,7 +40,7 @@ struct lapack<std::complex<float>> {
 template <>
 struct lapack<std::complex<double>> {
   using element = MKL_Complex16;
-  static constexpr auto geqp3 = &zgeqp3;
+  static constexpr auto geqrf = &zgeqrf;
   static constexpr auto multiply_by_q = &zunmqr;
   static constexpr auto trtrs = &ztrtrs;
   static constexpr auto trcon = &ztrcon;

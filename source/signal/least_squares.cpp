@@ -48,25 +48,21 @@ least_squares<T>::least_squares(MKL_INT rows, MKL_INT columns, MKL_INT right_sid
       matrix_(product(tall_, narrow_)),
       sides_(product(tall_, right_sides)),
       factors_(static_cast<std::size_t>(narrow_)),
-      singular_(static_cast<std::size_t>(narrow_)),
-      pivots_(static_cast<std::size_t>(narrow_)) {
+      singular_(static_cast<std::size_t>(narrow_)) {
   // The best sizes of the workspaces, asked of each routine.
   const MKL_INT ask = -1;
   MKL_INT info = 0, rank = 0, integers = 0;
   std::array<T, 3> best{};
-  std::array<real, 2> reals{};
+  real reals = 0;
   const real cut = 0;
   if constexpr (is_complex<T>) {
-    lapack<T>::geqp3(&tall_, &narrow_, raw(matrix_.data()), &tall_, pivots_.data(), raw(factors_.data()),
-                     raw(best.data()), &ask, reals.data(), &info);
     lapack<T>::gelsd(&rows_, &columns_, &right_sides_, raw(matrix_.data()), &rows_, raw(sides_.data()), &tall_,
-                     singular_.data(), &cut, &rank, raw(&best[1]), &ask, &reals[1], &integers, &info);
+                     singular_.data(), &cut, &rank, raw(&best[1]), &ask, &reals, &integers, &info);
   } else {
-    lapack<T>::geqp3(&tall_, &narrow_, matrix_.data(), &tall_, pivots_.data(), factors_.data(), best.data(), &ask,
-                     &info);
     lapack<T>::gelsd(&rows_, &columns_, &right_sides_, matrix_.data(), &rows_, sides_.data(), &tall_, singular_.data(),
                      &cut, &rank, &best[1], &ask, &integers, &info);
   }
+  lapack<T>::geqrf(&tall_, &narrow_, raw(matrix_.data()), &tall_, raw(factors_.data()), raw(best.data()), &ask, &info);
   lapack<T>::multiply_by_q("L", adjoint<T>, &tall_, &right_sides_, &narrow_, raw(matrix_.data()), &tall_,
                            raw(factors_.data()), raw(sides_.data()), &tall_, raw(&best[2]), &ask, &info);
   // Single precision rounds large sizes, down as well as up.
@@ -74,7 +70,7 @@ least_squares<T>::least_squares(MKL_INT rows, MKL_INT columns, MKL_INT right_sid
   const double wanted = std::ceil(static_cast<double>(largest) * (1 + std::numeric_limits<real>::epsilon()));
   work_count_ = static_cast<MKL_INT>(std::max(wanted, 3.0 * narrow_ + 1));
   work_ = qsrfhs::aligned_buffer<T>(static_cast<std::size_t>(work_count_));
-  real_work_ = qsrfhs::aligned_buffer<real>(static_cast<std::size_t>(std::max(reals[1], real(2) * real(tall_) + 2)));
+  real_work_ = qsrfhs::aligned_buffer<real>(static_cast<std::size_t>(std::max(reals, real(2) * real(tall_) + 2)));
   integer_work_ = qsrfhs::aligned_buffer<MKL_INT>(static_cast<std::size_t>(std::max(integers, narrow_)));
 }
 
@@ -103,7 +99,7 @@ bool least_squares<T>::has_full_rank(real rcond) {
   return info == 0 && estimate > doubt;
 }
 
-/// A P = Q R where there are at least as many rows as columns, A^H P = Q R otherwise; x is left in the right sides.
+/// A = Q R where there are at least as many rows as columns, A^H = Q R otherwise; x is left in the right sides.
 template <class T>
 bool least_squares<T>::solve_by_qr(std::span<const T> a, std::span<const T> b, real rcond) {
   const bool wide = rows_ < columns_;
@@ -115,14 +111,9 @@ bool least_squares<T>::solve_by_qr(std::span<const T> a, std::span<const T> b, r
       for (MKL_INT j = 0; j < columns_; ++j) matrix_.data()[product(j, tall_) + static_cast<std::size_t>(i)] = row[j];
     }
   }
-  std::fill_n(pivots_.data(), pivots_.size(), 0);
   MKL_INT info = 0;
-  if constexpr (is_complex<T>)
-    lapack<T>::geqp3(&tall_, &narrow_, raw(matrix_.data()), &tall_, pivots_.data(), raw(factors_.data()),
-                     raw(work_.data()), &work_count_, real_work_.data(), &info);
-  else
-    lapack<T>::geqp3(&tall_, &narrow_, matrix_.data(), &tall_, pivots_.data(), factors_.data(), work_.data(),
-                     &work_count_, &info);
+  lapack<T>::geqrf(&tall_, &narrow_, raw(matrix_.data()), &tall_, raw(factors_.data()), raw(work_.data()), &work_count_,
+                   &info);
   if (info != 0 || !has_full_rank(rcond)) return false;
 
   load_right_sides(b);
@@ -134,22 +125,12 @@ bool least_squares<T>::solve_by_qr(std::span<const T> a, std::span<const T> b, r
     lapack<T>::trtrs("U", how, "N", &narrow_, &right_sides_, raw(matrix_.data()), &tall_, raw(sides_.data()), &tall_,
                      &info);
   };
-  // The pivots move what belongs to R's columns: the solution's elements, or those of b.
-  const auto permute = [&](auto move) {
-    for (MKL_INT k = 0; k < right_sides_; ++k) {
-      T *const column = sides_.data() + product(k, tall_);
-      for (MKL_INT i = 0; i < narrow_; ++i) move(work_.data(), column, i, pivots_.data()[i] - 1);
-      std::copy_n(work_.data(), narrow_, column);
-    }
-  };
   if (wide) {
-    permute([](T *to, const T *from, MKL_INT i, MKL_INT pivot) { to[i] = from[pivot]; });
     solve_triangle(adjoint<T>);
     multiply_by_q("N");
   } else {
     multiply_by_q(adjoint<T>);
     solve_triangle("N");
-    permute([](T *to, const T *from, MKL_INT i, MKL_INT pivot) { to[pivot] = from[i]; });
   }
   return info == 0;
 }

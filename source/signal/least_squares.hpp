@@ -1,4 +1,4 @@
-// Least squares by QR with column pivoting, and by singular values where the rank is in doubt.
+// Least squares by QR, and by singular values where the rank is in doubt.
 // SPDX-License-Identifier: MIT
 #pragma once
 
@@ -43,7 +43,7 @@ class least_squares {
   qsrfhs::aligned_buffer<T> sides_;   // tall_ x right_sides_, b and then x
   qsrfhs::aligned_buffer<T> factors_, work_;
   qsrfhs::aligned_buffer<real> singular_, real_work_;
-  qsrfhs::aligned_buffer<MKL_INT> pivots_, integer_work_;
+  qsrfhs::aligned_buffer<MKL_INT> integer_work_;
 };
 
 }  // namespace dsp
