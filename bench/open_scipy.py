@@ -3,7 +3,6 @@
 
 LUMRA_LIBRARY names the library; scripts/bench runs it. Times are the processor's, the best of several turns.
 """
-import ctypes
 import pathlib
 import sys
 import time
@@ -13,14 +12,6 @@ import scipy.signal
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[1] / "tests" / "open"))
 import open as lumra  # noqa: E402
-
-C = lumra.constants
-random = np.random.default_rng(1)
-
-
-def noise(n, kind):
-    x = random.standard_normal(n)
-    return x.astype(np.float32) if kind == "f32" else (x + 1j * random.standard_normal(n)).astype(np.complex64)
 
 
 def best(works, seconds=0.4):
@@ -44,17 +35,11 @@ def report(name, samples, ours, scipys):
     print(f"{name}: {samples * repeat / a / 1e6:.0f} Msamples/s, {b / a:.1f} of SciPy", flush=True)
 
 
-def filter_object(kind, *arguments, type):
-    handle = ctypes.c_void_p()
-    lumra.call(f"{kind}_create", lumra.record(kind, type=C[f"LUMRA_TYPE_{type.upper()}"]), *arguments, handle)
-    return lumra.Object(kind, handle.value)
-
-
 def convolutions():
     for kind in ("f32", "cf32"):
         for nx in (1000, 10_000, 100_000, 1_000_000):
             for ny in (16, 50, 300, 1000, 5000):
-                x, y = noise(nx, kind), noise(ny, kind)
+                x, y = lumra.noise(nx, lumra.types[kind]), lumra.noise(ny, lumra.types[kind])
                 out = np.empty(nx + ny - 1, x.dtype)
                 ours = lambda: lumra.call(f"convolve_{kind}", x, nx, y, ny, 0, 0, out, len(out))
                 report(f"convolve {kind} {nx} x {ny}", nx, ours, lambda: scipy.signal.oaconvolve(x, y))
@@ -63,15 +48,16 @@ def convolutions():
 def filters():
     b, a = scipy.signal.butter(4, 0.4)
     for kind in ("f32", "cf32"):
-        x = noise(16384, kind)
+        x = lumra.noise(16384, lumra.types[kind])
         out = np.empty_like(x)
         narrow = b.astype(np.float32), a.astype(np.float32)
-        iir = filter_object("iir", b, len(b), a, len(a), type=kind)
+        options = lumra.record("iir", type=lumra.type_code(kind))
+        iir = lumra.make("iir_create", options, b, len(b), a, len(a))
         ours = lambda: lumra.call("iir_process", iir, x, out, len(x))
         report(f"IIR of order 4, {kind}", len(x), ours, lambda: scipy.signal.lfilter(*narrow, x))
         for count in (16, 64, 1000):
-            h = noise(count, "f32")
-            fir = filter_object("fir", h, count, type=kind)
+            h = lumra.noise(count, lumra.types["f32"])
+            fir = lumra.make("fir_create", lumra.record("fir", type=lumra.type_code(kind)), h, count)
             ours = lambda: lumra.call("fir_process", fir, x, out, len(x))
             report(f"FIR of {count} taps, {kind}", len(x), ours, lambda: scipy.signal.lfilter(h, np.float32(1), x))
 

@@ -1,5 +1,5 @@
-// The open interface with any arguments: no crash, no word outside of the arrays, and failures that leave a sentence and
-// nothing else behind. SPDX-License-Identifier: MIT
+// The open interface with any arguments: no crash, no word outside of the arrays, and failures that leave a sentence
+// and nothing else behind. SPDX-License-Identifier: MIT
 #include <lumra/lumra.h>
 
 #include <tuple>

@@ -5,13 +5,13 @@ import unittest
 import numpy as np
 import open as lumra
 
-TYPES = {"f32": np.dtype("f4"), "f64": np.dtype("f8"), "cf32": np.dtype("c8"), "cf64": np.dtype("c16")}
-random = np.random.default_rng(2)
+TYPES = lumra.types
 
 
 def noise(n, dtype):
-    x = random.standard_normal(n) * 10.0 ** random.uniform(-4, 4, n)
-    return (x + 1j * random.standard_normal(n) if dtype.kind == "c" else x).astype(dtype)
+    x = lumra.noise(n, dtype)
+    x.real *= 10.0 ** lumra.random.uniform(-4, 4, n)
+    return x
 
 
 def wide(x):
@@ -99,7 +99,7 @@ class Elementwise(lumra.Test):
             dtype, real = TYPES[suffix], real_type(TYPES[suffix]).type
             for m, start, step in ((1, 0.5, 1.0), (7, -2.0, 0.3), (200, 1.0, -0.01)):
                 table, x = noise(m, dtype), noise(n, dtype)
-                keys = (start + step * random.uniform(-3, m + 3, n)).astype(real)
+                keys = (start + step * lumra.random.uniform(-3, m + 3, n)).astype(real)
                 keys[: n // 4] = np.resize([np.nan, np.inf, -np.inf, 1e30, start - 0.5 * step, start], n // 4)
                 with np.errstate(all="ignore"):
                     t = (keys - real(start)) * (real(1) / real(step))

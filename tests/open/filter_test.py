@@ -9,26 +9,14 @@ import open as lumra
 import scipy.signal
 
 C = lumra.constants
-TYPES = {
-    "f32": (np.float32, 2e-6), "f64": (np.float64, 1e-14), "cf32": (np.complex64, 2e-6), "cf64": (np.complex128, 1e-14),
-}  # fmt: skip
+ERRORS = {"f32": 2e-6, "f64": 1e-14, "cf32": 2e-6, "cf64": 1e-14}
 MODES = ("full", "same", "valid")
+noise = lumra.noise
 METHODS = {name: C[f"LUMRA_METHOD_{name.upper()}"] for name in ("auto", "direct", "fourier")}
-random = np.random.default_rng(7)
-
-
-def noise(n, dtype):
-    x = random.standard_normal(n)
-    return (x + 1j * random.standard_normal(n) if np.issubdtype(dtype, np.complexfloating) else x).astype(dtype)
-
-
-def fir(taps, kind="f32", method="auto", taps_type=None):
-    options = lumra.record("fir", type=C[f"LUMRA_TYPE_{kind.upper()}"], method=METHODS[method])
-    if taps_type:
-        options.taps_type = C[f"LUMRA_TYPE_{taps_type.upper()}"]
-    handle = ctypes.c_void_p()
-    lumra.call("fir_create", options, taps, len(taps), handle)
-    return lumra.Object("fir", handle.value)
+def fir(taps, kind="f32", method="auto", taps_kind="f32"):
+    code, taps_code = lumra.type_code(kind), lumra.type_code(taps_kind)
+    options = lumra.record("fir", type=code, method=METHODS[method], taps_type=taps_code)
+    return lumra.make("fir_create", options, taps, len(taps))
 
 
 def process(filter, x):
@@ -37,35 +25,22 @@ def process(filter, x):
     return out
 
 
-def save(filter):
-    size = ctypes.c_uint64()
-    lumra.call("fir_state_size", filter, size)
-    state = np.zeros(size.value, np.uint8)
-    lumra.call("fir_save", filter, state, len(state))
-    return state
-
-
 def cut(x, longest):
     """Pieces of random lengths, none and one among them."""
     done = 0
     while done < len(x):
-        n = int(random.integers(0, longest + 1))
+        n = int(lumra.random.integers(0, longest + 1))
         yield x[done : done + n]
         done += n
 
 
 class Fir(lumra.Test):
-    def loaded(self, state):
-        handle = ctypes.c_void_p()
-        lumra.call("fir_load", state, len(state), handle)
-        return lumra.Object("fir", handle.value)
-
     def test_streams_in_pieces(self):
         # Up to 64 taps pieces give the bits of the whole; a filter that is loaded in the middle goes on with them, too.
         kinds = [("f32", "f32"), ("f64", "f64")] + [(s, t) for s, r in (("cf32", "f32"), ("cf64", "f64")) for t in (r, s)]
         for (kind, taps_kind), count in itertools.product(kinds, (1, 2, 3, 9, 64, 65, 300, 2000)):
-            dtype, tolerance = TYPES[kind]
-            h, x = noise(count, TYPES[taps_kind][0]), noise(12345, dtype)
+            tolerance = ERRORS[kind]
+            h, x = noise(count, lumra.types[taps_kind]), noise(12345, lumra.types[kind])
             exact = scipy.signal.lfilter(h.astype(np.complex128), 1, x)
             expected = exact if np.iscomplexobj(x) else exact.real
             for method in ("auto", "direct", "fourier"):
@@ -79,7 +54,7 @@ class Fir(lumra.Test):
                     for piece in cut(x if longest > 3 else x[:1500], longest):
                         pieces.append(process(one, piece))
                         if len(pieces) == 3:
-                            one = self.loaded(save(one))
+                            one = lumra.load("fir", lumra.save(one))
                     pieces = np.concatenate(pieces)
                     if method == "direct" or (method == "auto" and count <= 64):
                         self.assertEqual(whole[: len(pieces)].tobytes(), pieces.tobytes(), what)
@@ -99,20 +74,12 @@ class Fir(lumra.Test):
         process(long, np.ones(1 << 17, np.float32))
         self.assertTrue(np.isfinite(process(long, np.ones(100, np.float32))).all())
 
-    def test_damaged_states(self):
+    def test_states(self):
         filter, x = fir(noise(4, np.float32)), noise(9, np.float32)
         process(filter, x)
-        state = save(filter)
-        self.assertEqual(56 + 4 * 4 + 3 * 4, len(state))
-        none = ctypes.c_void_p()
-        for k, bit in itertools.product(range(len(state)), (0, 7)):
-            damaged = state.copy()
-            damaged[k] ^= 1 << bit
-            self.refused("LUMRA_BAD_STATE", "fir_load", damaged, len(damaged), none)
-        for n in range(len(state)):
-            self.refused("LUMRA_BAD_STATE", "fir_load", state, n, none)
-        self.assertIsNone(none.value)
-        self.assertEqual(process(filter, x).tobytes(), process(self.loaded(state), x).tobytes())
+        self.state_is_checked(filter)
+        loaded = lumra.load("fir", lumra.save(filter))
+        self.assertEqual(process(filter, x).tobytes(), process(loaded, x).tobytes())
 
     def test_refusals(self):
         h, x, handle = noise(4, np.float32), noise(64, np.float32), ctypes.c_void_p()
@@ -139,13 +106,6 @@ class Fir(lumra.Test):
         ):
             self.refused(code, "fir_process", *arguments)
         lumra.call("fir_process", filter, None, None, 0)
-        state = save(filter)
-        self.refused("LUMRA_TOO_LITTLE_ROOM", "fir_save", filter, state, len(state) - 1)
-        self.refused("LUMRA_NULL_ARGUMENT", "fir_save", filter, None, len(state))
-        self.refused("LUMRA_NULL_ARGUMENT", "fir_load", None, len(state), handle)
-        self.refused("LUMRA_NULL_ARGUMENT", "fir_load", state, len(state), None)
-        self.refused("LUMRA_NULL_ARGUMENT", "fir_get_type", filter, None)
-        self.refused("LUMRA_NULL_ARGUMENT", "fir_state_size", filter, None)
 
 
 class Convolution(lumra.Test):
@@ -159,7 +119,7 @@ class Convolution(lumra.Test):
 
     def test_every_mode_and_method(self):
         lengths = [*itertools.product((1, 2, 7, 8, 9, 40), repeat=2), (1000, 64), (64, 1000), (3000, 2900), (20000, 300)]
-        for kind, (dtype, tolerance) in TYPES.items():
+        for kind, dtype in lumra.types.items():
             for nx, ny in lengths:
                 x, y = lumra.odd(noise(nx, dtype)), lumra.odd(noise(ny, dtype))
                 functions = ["convolve", "correlate"] + ["convolve_with_real"] * np.iscomplexobj(x)
@@ -170,7 +130,7 @@ class Convolution(lumra.Test):
                     for method in METHODS if nx + ny < 10000 else ("auto", "fourier"):
                         out = self.combine(function, kind, x, y, mode, method)
                         what = function, kind, nx, ny, mode, method
-                        self.close(expected if np.iscomplexobj(x) else expected.real, out, 20 * tolerance, what)
+                        self.close(expected if np.iscomplexobj(x) else expected.real, out, 20 * ERRORS[kind], what)
 
     def test_refusals(self):
         x, out, count = noise(8, np.float32), np.zeros(16, np.float32), ctypes.c_uint64()
@@ -200,7 +160,7 @@ class Design(lumra.Test):
     def design(self, name, *arguments, suffix="f64"):
         count = ctypes.c_uint64()
         lumra.call(f"design_{name}_count", *map(float, arguments), count)
-        taps = np.full(count.value + 1, 7, TYPES[suffix][0])
+        taps = np.full(count.value + 1, 7, lumra.types[suffix])
         lumra.call(f"design_{name}_{suffix}", *map(float, arguments), taps, count.value)
         self.assertEqual(7, taps[-1])
         return taps[:-1]

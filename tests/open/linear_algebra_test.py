@@ -7,21 +7,16 @@ import numpy as np
 import open as lumra
 import scipy.linalg
 
-TYPES = {"F32": np.float32, "F64": np.float64, "CF32": np.complex64, "CF64": np.complex128}
-
 
 def solver(kind, rows, columns, right_sides=1):
-    code = lumra.constants[f"LUMRA_TYPE_{kind}"]
-    return lumra.create("least_squares", type=code, rows=rows, columns=columns, right_sides=right_sides)
+    return lumra.create("least_squares", type=lumra.type_code(kind), rows=rows, columns=columns, right_sides=right_sides)
 
 
 class LeastSquares(lumra.Test):
     def test_values_and_rank(self):
-        rng = np.random.default_rng(2)
-        for kind, dtype in TYPES.items():
+        for kind, dtype in lumra.types.items():
             epsilon = np.finfo(dtype).eps
-            noise = lambda *shape: (rng.standard_normal(shape) + 1j * rng.standard_normal(shape)).astype(dtype) \
-                if np.issubdtype(dtype, np.complexfloating) else rng.standard_normal(shape).astype(dtype)
+            noise = lambda *shape: lumra.noise(shape, dtype)
             for m, n, k, missing in [(1, 1, 1, 0), (20, 5, 3, 0), (5, 20, 2, 0), (7, 7, 1, 0), (30, 8, 2, 3),
                                      (8, 30, 2, 1), (200, 50, 1, 0), (6, 4, 1, 4)]:
                 rank = min(m, n) - missing

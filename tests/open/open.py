@@ -100,11 +100,27 @@ def call(function, *arguments):
     assert status == 0, f"{last_error()} ({status})"
 
 
-def create(kind, **changes):
-    """An object, freed with the interpreter's last reference to it."""
+def make(function, *arguments):
+    """The object that the function makes, freed with the interpreter's last reference to it."""
     handle = ctypes.c_void_p()
-    call(f"{kind}_create", record(kind, **changes), handle)
-    return Object(kind, handle.value)
+    call(function, *arguments, handle)
+    return Object(re.sub("_(create|load).*", "", function), handle.value)
+
+
+def create(kind, **changes):
+    return make(f"{kind}_create", record(kind, **changes))
+
+
+def save(saved):
+    size = ctypes.c_uint64()
+    call(f"{saved.kind}_state_size", saved, size)
+    state = np.zeros(size.value, np.uint8)
+    call(f"{saved.kind}_save", saved, state, len(state))
+    return state
+
+
+def load(kind, state):
+    return make(f"{kind}_load", state, len(state))
 
 
 class Object(ctypes.c_void_p):
@@ -114,6 +130,19 @@ class Object(ctypes.c_void_p):
 
     def __del__(self):
         run(f"{self.kind}_free", self.value)
+
+
+types = {"f32": np.dtype("f4"), "f64": np.dtype("f8"), "cf32": np.dtype("c8"), "cf64": np.dtype("c16")}
+random = np.random.default_rng(7)
+
+
+def type_code(kind):
+    return constants[f"LUMRA_TYPE_{kind.upper()}"]
+
+
+def noise(shape, dtype):
+    x = random.standard_normal(shape)
+    return (x + 1j * random.standard_normal(shape) if np.dtype(dtype).kind == "c" else x).astype(dtype)
 
 
 def odd(x):
@@ -144,3 +173,19 @@ class Test(unittest.TestCase):
         if expected.size:
             largest = np.abs(expected).max()
             np.testing.assert_allclose(actual, expected, rtol=0, atol=tolerance * largest, err_msg=str(what))
+
+    def state_is_checked(self, saved):
+        """States that were cut or changed are refused, rooms that are too small, and what is null."""
+        kind, state, none = saved.kind, save(saved), ctypes.c_void_p()
+        for k in range(len(state)):
+            damaged = state.copy()
+            damaged[k] ^= 1 << k % 8
+            self.refused("LUMRA_BAD_STATE", f"{kind}_load", damaged, len(state), none)
+            self.refused("LUMRA_BAD_STATE", f"{kind}_load", state, k, none)
+        self.assertIsNone(none.value)
+        self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_load", None, len(state), none, says="bytes is null")
+        self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_load", state, len(state), None)
+        self.refused("LUMRA_TOO_LITTLE_ROOM", f"{kind}_save", saved, state, len(state) - 1, says="the state needs")
+        self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_save", saved, None, len(state), says="bytes is null")
+        self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_state_size", saved, None, says="size is null")
+        self.refused("LUMRA_NULL_ARGUMENT", f"{kind}_get_type", saved, None, says="type is null")

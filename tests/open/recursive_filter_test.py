@@ -8,25 +8,15 @@ from scipy import signal
 
 import open as lumra
 
-TYPES = {"F32": np.float32, "F64": np.float64, "CF32": np.complex64, "CF64": np.complex128}
-rng = np.random.default_rng(5)
-
-
-def noise(n, dtype):
-    x = rng.standard_normal(n) + (1j * rng.standard_normal(n) if np.issubdtype(dtype, np.complexfloating) else 0)
-    return x.astype(dtype)
+noise = lumra.noise
 
 
 def filter_of(kind, method="AUTO", b=None, a=None, sos=None):
-    options = lumra.record("iir", type=lumra.constants[f"LUMRA_TYPE_{kind}"], method=lumra.constants[f"LUMRA_IIR_{method}"])
-    handle = ctypes.c_void_p()
+    method = lumra.constants[f"LUMRA_IIR_{method}"]
+    options = lumra.record("iir", type=lumra.type_code(kind), method=method)
     if sos is not None:
-        sos = np.array(sos, float)
-        lumra.call("iir_create_sections", options, sos, len(sos), ctypes.byref(handle))
-    else:
-        b, a = np.array(b, float), np.array(a, float)
-        lumra.call("iir_create", options, b, len(b), a, len(a), ctypes.byref(handle))
-    return lumra.Object("iir", handle.value)
+        return lumra.make("iir_create_sections", options, np.array(sos, float), len(sos))
+    return lumra.make("iir_create", options, np.array(b, float), len(b), np.array(a, float), len(a))
 
 
 def process(iir, x, cuts=()):
@@ -34,20 +24,6 @@ def process(iir, x, cuts=()):
     for first, last in zip([0, *cuts], [*cuts, len(x)]):
         lumra.call("iir_process", iir, x[first:last], y[first:last], last - first)
     return y
-
-
-def saved(iir):
-    size = ctypes.c_uint64()
-    lumra.call("iir_state_size", iir, size)
-    bytes_ = np.empty(size.value, np.uint8)
-    lumra.call("iir_save", iir, bytes_, bytes_.size)
-    return bytes_
-
-
-def loaded(bytes_):
-    handle = ctypes.c_void_p()
-    lumra.call("iir_load", bytes_, bytes_.size, ctypes.byref(handle))
-    return lumra.Object("iir", handle.value)
 
 
 DIRECT = {
@@ -64,8 +40,8 @@ DIRECT = {
 
 class RecursiveFilter(lumra.Test):
     def test_values_states_and_cuts(self):
-        for kind, dtype in TYPES.items():
-            single = dtype in (np.float32, np.complex64)
+        for kind, dtype in lumra.types.items():
+            single = kind in ("f32", "cf32")
             for name, (b, a) in DIRECT.items():
                 x = noise(1500, dtype)
                 order = max(len(b), len(a)) - 1
@@ -87,13 +63,13 @@ class RecursiveFilter(lumra.Test):
                     # The same bits by pieces, in place, with a save and a load between any two of them.
                     lumra.call("iir_set_state", iir, zi, order)
                     pieces = x.copy()
-                    for first, last in zip(*(lambda c: (c[:-1], c[1:]))([0, *np.sort(rng.integers(0, 1500, 40)), 1500])):
+                    for first, last in zip(*(lambda c: (c[:-1], c[1:]))([0, *np.sort(lumra.random.integers(0, 1500, 40)), 1500])):
                         lumra.call("iir_process", iir, pieces[first:last], pieces[first:last], last - first)
-                        iir = loaded(saved(iir))
+                        iir = lumra.load("iir", lumra.save(iir))
                     self.assertEqual(y.tobytes(), pieces.tobytes(), (kind, name, method))
 
     def test_sections(self):
-        for kind, dtype in TYPES.items():
+        for kind, dtype in lumra.types.items():
             for sos in (signal.butter(1, 0.3, output="sos"), signal.cheby1(9, 1, [0.1, 0.102], "band", output="sos")):
                 x = noise(4000, dtype)
                 wide = x.astype(np.complex128 if np.iscomplexobj(x) else np.float64)
@@ -102,7 +78,7 @@ class RecursiveFilter(lumra.Test):
                 iir = filter_of(kind, sos=sos)
                 lumra.call("iir_set_state", iir, zi, zi.size)
                 y = process(iir, x, [1, 8, 9, 1000])
-                self.close(expected, y, 1e-7 if dtype in (np.float32, np.complex64) else 1e-11, kind)
+                self.close(expected, y, 1e-7 if kind in ("f32", "cf32") else 1e-11, kind)
                 state = np.empty_like(zi)
                 lumra.call("iir_get_state", iir, state, zi.size)
                 self.close(zf.ravel(), state, 1e-10, kind)
@@ -184,17 +160,7 @@ class RecursiveFilter(lumra.Test):
         self.refused("LUMRA_NULL_ARGUMENT", "iir_get_state", iir, None, 1, says="state is null")
         self.refused("LUMRA_NULL_ARGUMENT", "iir_get_method", iir, None, says="method is null")
         self.refused("LUMRA_NULL_ARGUMENT", "iir_order", iir, None, says="order is null")
-        self.refused("LUMRA_NULL_ARGUMENT", "iir_state_size", iir, None, says="size is null")
-
-        bytes_ = saved(iir)
-        self.refused("LUMRA_TOO_LITTLE_ROOM", "iir_save", iir, bytes_, bytes_.size - 1, says="the state needs")
-        self.refused("LUMRA_NULL_ARGUMENT", "iir_save", iir, None, bytes_.size, says="bytes is null")
-        for k in range(bytes_.size):
-            self.refused("LUMRA_BAD_STATE", "iir_load", bytes_[:k].copy(), k, out)
-            damaged = bytes_.copy()
-            damaged[k] ^= 1 << k % 8
-            self.refused("LUMRA_BAD_STATE", "iir_load", damaged, damaged.size, out)
-        self.assertIsNone(room.value)
+        self.state_is_checked(iir)
         lumra.run("iir_free", iir.value)
         self.refused("LUMRA_WRONG_OBJECT", "iir_process", iir, x, x, 8, says="was freed")
         iir.value = None

@@ -7,18 +7,10 @@ import numpy as np
 import open as lumra
 import scipy.fft
 
-TYPES = {
-    np.dtype(dtype): lumra.constants[f"LUMRA_TYPE_{code}"]
-    for dtype, code in (("f4", "F32"), ("f8", "F64"), ("c8", "CF32"), ("c16", "CF64"))
-}
+TYPES = {dtype: lumra.type_code(kind) for kind, dtype in lumra.types.items()}
 NORMS = {"LUMRA_FFT_SCALE_BACKWARD": "backward", "LUMRA_FFT_SCALE_FORWARD": "forward", "LUMRA_FFT_SCALE_BOTH": "ortho"}
 PLACES = ("record_step", "record_distance", "spectrum_step", "spectrum_distance")
-random = np.random.default_rng(1)
-
-
-def noise(shape, dtype):
-    x = random.standard_normal(shape)
-    return (x + 1j * random.standard_normal(shape) if np.dtype(dtype).kind == "c" else x).astype(dtype)
+noise = lumra.noise
 
 
 def bins_type(dtype):
