@@ -356,7 +356,7 @@ void inspect_filter(bench &b) {
   auto *const f = static_cast<lumra_fir *>(one.address);
   auto *const r = static_cast<lumra_iir *>(one.address);
   const std::uint64_t count = b.in.one_in(16) ? any_count(b.in) : one.sizes[0];
-  const std::uint64_t bytes = std::max(held(count), one.sizes[0]) * sizeof(lumra_cf64);
+  const std::uint64_t bytes = held(count) * (is_real(one.type) ? sizeof(double) : sizeof(lumra_cf64));
   auto *const number = static_cast<std::int32_t *>(with.give(sizeof(std::int32_t), sizeof(std::int32_t), true));
   const unsigned what = b.in.choice(wanted == iir ? 5 : 2);
   if (what == 0) bench::check(with, one, wanted, wanted == iir ? lumra_iir_reset(r) : lumra_fir_reset(f));
