@@ -20,11 +20,11 @@ dfti_failure::dfti_failure(dfti_step step, MKL_LONG status) noexcept
       step_(step),
       status_(status) {}
 
-std::optional<dfti_failure> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
-                                            const qsrfhs::mkl_memory::watch &watched) noexcept {
-  std::optional<dfti_failure> failure;
+std::optional<failed_step> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
+                                           const qsrfhs::mkl_memory::watch &watched) noexcept {
+  std::optional<failed_step> failure;
   const auto passes = [&failure](dfti_step step, MKL_LONG status) {
-    if (qsrfhs::failed(status)) failure.emplace(step, status);
+    if (qsrfhs::failed(status)) failure = {step, status};
     return !failure;
   };
   const auto create = [&] {
@@ -55,7 +55,7 @@ dfti_descriptor::dfti_descriptor(const dfti_settings &settings) {
   DFTI_DESCRIPTOR_HANDLE handle = nullptr;
   const auto failure = make_descriptor(handle, settings, watched);
   owned made(handle);
-  if (failure) throw dfti_failure(*failure);
+  if (failure) throw dfti_failure(failure->step, failure->status);
   handle_ = std::move(made);
 }
 

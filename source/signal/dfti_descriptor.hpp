@@ -41,10 +41,16 @@ struct dfti_settings {
   friend bool operator==(const dfti_settings &, const dfti_settings &) = default;
 };
 
+/// A step that failed, without MKL's text, which would take memory.
+struct failed_step {
+  dfti_step step;
+  MKL_LONG status;
+};
+
 /// Creates, sets up and commits a descriptor, inside of an mkl_section. The step that failed, if any: what was created
 /// so far is the caller's to free while `watched` lasts.
-std::optional<dfti_failure> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
-                                            const qsrfhs::mkl_memory::watch &watched) noexcept;
+std::optional<failed_step> make_descriptor(DFTI_DESCRIPTOR_HANDLE &made, const dfti_settings &settings,
+                                           const qsrfhs::mkl_memory::watch &watched) noexcept;
 
 /// A committed descriptor, or none. All throw dfti_failure.
 class dfti_descriptor {

@@ -62,7 +62,7 @@ std::int32_t set_up(resampler_descriptor &descriptor, std::uint32_t length, dire
   const auto failure = dsp::make_descriptor(
       made, {.lengths = {length, 0}, .in_place = inverse, .backward_scale = inverse ? 1.0 / length : 1.0}, watched);
   descriptor.transform = made;
-  return failure ? code_of(failure->step(), towards) : LUMRA_SUCCESS;
+  return failure ? code_of(failure->step, towards) : LUMRA_SUCCESS;
 }
 
 /// Frees a transform of another length.
