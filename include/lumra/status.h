@@ -30,6 +30,7 @@ enum lumra_status {
   LUMRA_NO_MEMORY = -390010,        /* no memory */
   LUMRA_TRANSFORM_FAILED = -390011, /* the Fourier transform could not be made or computed */
   LUMRA_NO_CONVERGENCE = -390012,   /* the algorithm did not converge */
+  LUMRA_TOO_FEW_SAMPLES = -390013,  /* fewer samples, or complete segments, than the result needs */
   LUMRA_UNEXPECTED = -390099,       /* a failure that none of the codes describes */
 
   /* Sessions. */

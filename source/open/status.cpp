@@ -32,6 +32,7 @@ constexpr entry entries[] = {
     LUMRA_TEXT(LUMRA_NO_MEMORY, "not enough memory"),
     LUMRA_TEXT(LUMRA_TRANSFORM_FAILED, "a Fourier transform could not be made or computed"),
     LUMRA_TEXT(LUMRA_NO_CONVERGENCE, "the algorithm did not converge"),
+    LUMRA_TEXT(LUMRA_TOO_FEW_SAMPLES, "there are fewer samples, or complete segments, than the result needs"),
     LUMRA_TEXT(LUMRA_UNEXPECTED, "a failure that none of the codes describes"),
     LUMRA_TEXT(LUMRA_UNKNOWN_CODE, "a code that has no message"),
     LUMRA_TEXT(LUMRA_INVALID_SESSION, "the handle names no open session"),
