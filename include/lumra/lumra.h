@@ -57,6 +57,7 @@
 #include <lumra/library_info.h>
 #include <lumra/linear_algebra.h>
 #include <lumra/session.h>
+#include <lumra/spectrum.h>
 #include <lumra/status.h>
 #include <lumra/toolkit.h>
 #include <lumra/transform.h>

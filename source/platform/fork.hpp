@@ -22,6 +22,7 @@ enum class fork_rank : std::size_t {
   lookup_batches,
   object_handles,
   idle_transforms,
+  shared_workers,
   error_list,
   mkl,
   count

@@ -205,6 +205,18 @@ void add_transform_loops(std::vector<operation> &all) {
                    t.order_power(out, n);
                  },
                  twice_the_power, false});
+  // The order of the powers is its own inverse, so that sums can be taken out of memory and put back.
+  all.push_back({"power of the passes with apply_window", 2, 1, 1,
+                 [](auto &t, auto x, auto w, auto out, auto n) {
+                   std::vector<float> work(x, x + 2 * n), stored(n);
+                   t.store_power_then_apply_window(work.data(), out, x, w, x, n, n);
+                   t.store_power(x, stored.data(), n);
+                   t.order_power(stored.data(), n);
+                   t.order_power(stored.data(), n);
+                   t.add(stored.data(), out, n);
+                   t.order_power(out, n);
+                 },
+                 twice_the_power, false});
   all.push_back({"power of accumulate_power_then_apply_window", 2, 1, 1,
                  [](auto &t, auto x, auto w, auto out, auto n) {
                    std::vector<float> work(x, x + 2 * n);

@@ -18,9 +18,12 @@
 static constexpr kernel_table table = {
     .copy = &copy,
     .apply_window = &apply_window,
+    .store_power = &store_power,
     .accumulate_power = &accumulate_power,
+    .store_power_then_apply_window = &store_power_then_apply_window,
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
     .order_power = &order_power,
+    .add = &add,
     .reverse_conjugate = &reverse_conjugate,
     .scaled_power = &scaled_power,
     .multiply = &multiply,

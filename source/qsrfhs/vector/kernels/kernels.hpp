@@ -56,15 +56,20 @@ struct kernel_table {
   void (*copy)(const float *x, float *out, std::size_t n);
   /// out[k] = x[k] * w[k], n complex by real.
   void (*apply_window)(const float *x, const float *w, float *out, std::size_t n);
-  /// power[k] += re(x[k])^2 + im(x[k])^2, n complex. Until order_power, the powers stand in an order of the build's
-  /// own.
+  /// power[k] = re(x[k])^2 + im(x[k])^2, or is increased by it, n complex. Until order_power, the powers stand in an
+  /// order of the build's own.
+  void (*store_power)(const float *x, float *power, std::size_t n);
   void (*accumulate_power)(const float *x, float *power, std::size_t n);
-  /// accumulate_power of what `work` holds, then apply_window of `next` into `work`, in one pass over `work`. Meanwhile
-  /// asks the caches for the ahead_count samples at `ahead`.
+  /// store_power or accumulate_power of what `work` holds, then apply_window of `next` into `work`, in one pass over
+  /// `work`. Meanwhile asks the caches for the ahead_count samples at `ahead`.
+  void (*store_power_then_apply_window)(float *work, float *power, const float *next, const float *w,
+                                        const float *ahead, std::size_t ahead_count, std::size_t n);
   void (*accumulate_power_then_apply_window)(float *work, float *power, const float *next, const float *w,
                                              const float *ahead, std::size_t ahead_count, std::size_t n);
-  /// Puts accumulated powers into their order, n real.
+  /// Puts powers into their order, or out of it again, n real.
   void (*order_power)(float *power, std::size_t n);
+  /// sum[k] += x[k], n real.
+  void (*add)(const float *x, float *sum, std::size_t n);
 
   /// out[k] = conj(x[n - 1 - k]), n complex. x and out share no memory.
   void (*reverse_conjugate)(const float *x, float *out, std::size_t n);

@@ -2,14 +2,18 @@
 
 // Groups of eight powers stay in the order of split_in_lanes until order_power: that saves two shuffles in each group
 // of each segment.
-static inline void accumulate_8(const float *x, float *power) {
+template <bool Add>
+static inline void power_8(const float *x, float *power) {
   f8 re, im;
   split_in_lanes(load(x), load(x + 8), re, im);
-  store(power, load(power) + (re * re + im * im));
+  const f8 squares = re * re + im * im;
+  store(power, Add ? load(power) + squares : squares);
 }
 
-static inline void accumulate_1(const float *x, float *power) {
-  *power += x[0] * x[0] + x[1] * x[1];
+template <bool Add>
+static inline void power_1(const float *x, float *power) {
+  const float squares = x[0] * x[0] + x[1] * x[1];
+  *power = Add ? *power + squares : squares;
 }
 
 static inline void window_8(const float *x, const float *w, float *out) {
@@ -37,33 +41,60 @@ static void apply_window(const float *x, const float *w, float *out, std::size_t
   for (; k < n; ++k) window_1(x + 2 * k, w + k, out + 2 * k);
 }
 
-static void accumulate_power(const float *x, float *power, std::size_t n) {
+template <bool Add>
+static inline void all_powers(const float *x, float *power, std::size_t n) {
   std::size_t k = 0;
-  for (; k + 8 <= n; k += 8) accumulate_8(x + 2 * k, power + k);
-  for (; k < n; ++k) accumulate_1(x + 2 * k, power + k);
+  for (; k + 8 <= n; k += 8) power_8<Add>(x + 2 * k, power + k);
+  for (; k < n; ++k) power_1<Add>(x + 2 * k, power + k);
 }
 
-static inline void accumulate_then_window_8(float *work, float *power, const float *next, const float *w) {
-  accumulate_8(work, power);
+static void store_power(const float *x, float *power, std::size_t n) {
+  all_powers<false>(x, power, n);
+}
+
+static void accumulate_power(const float *x, float *power, std::size_t n) {
+  all_powers<true>(x, power, n);
+}
+
+template <bool Add>
+static inline void power_then_window_8(float *work, float *power, const float *next, const float *w) {
+  power_8<Add>(work, power);
   window_8(next, w, work);
 }
 
-static void accumulate_power_then_apply_window(float *work, float *power, const float *next, const float *w,
-                                               const float *ahead, std::size_t ahead_count, std::size_t n) {
+template <bool Add>
+static inline void power_then_window(float *work, float *power, const float *next, const float *w, const float *ahead,
+                                     std::size_t ahead_count, std::size_t n) {
   std::size_t k = 0;
   for (; k + 8 <= n && k < ahead_count; k += 8) {
     _mm_prefetch(reinterpret_cast<const char *>(ahead + 2 * k), _MM_HINT_T1);
-    accumulate_then_window_8(work + 2 * k, power + k, next + 2 * k, w + k);
+    power_then_window_8<Add>(work + 2 * k, power + k, next + 2 * k, w + k);
   }
-  for (; k + 8 <= n; k += 8) accumulate_then_window_8(work + 2 * k, power + k, next + 2 * k, w + k);
+  for (; k + 8 <= n; k += 8) power_then_window_8<Add>(work + 2 * k, power + k, next + 2 * k, w + k);
   for (; k < n; ++k) {
-    accumulate_1(work + 2 * k, power + k);
+    power_1<Add>(work + 2 * k, power + k);
     window_1(next + 2 * k, w + k, work + 2 * k);
   }
 }
 
+static void store_power_then_apply_window(float *work, float *power, const float *next, const float *w,
+                                          const float *ahead, std::size_t ahead_count, std::size_t n) {
+  power_then_window<false>(work, power, next, w, ahead, ahead_count, n);
+}
+
+static void accumulate_power_then_apply_window(float *work, float *power, const float *next, const float *w,
+                                               const float *ahead, std::size_t ahead_count, std::size_t n) {
+  power_then_window<true>(work, power, next, w, ahead, ahead_count, n);
+}
+
 static void order_power(float *power, std::size_t n) {
   for (std::size_t k = 0; k + 8 <= n; k += 8) store(power + k, order_lanes(load(power + k)));
+}
+
+static void add(const float *x, float *sum, std::size_t n) {
+  std::size_t k = 0;
+  for (; k + 8 <= n; k += 8) store(sum + k, load(sum + k) + load(x + k));
+  for (; k < n; ++k) sum[k] += x[k];
 }
 
 static void scale(float *x, float factor, std::size_t n) {

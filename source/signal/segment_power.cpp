@@ -1,0 +1,89 @@
+// SPDX-License-Identifier: MIT
+#include "signal/segment_power.hpp"
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
+
+namespace dsp {
+namespace {
+
+using cf32 = std::complex<float>;
+
+const float *floats(const cf32 *x) noexcept {
+  return reinterpret_cast<const float *>(x);
+}
+float *floats(cf32 *x) noexcept {
+  return reinterpret_cast<float *>(x);
+}
+
+template <class Sample, class Real>
+void apply_window(const Sample *x, const Real *w, Sample *out, std::size_t n) noexcept {
+  if constexpr (std::is_same_v<Sample, cf32>) {
+    qsrfhs::kernels::active().apply_window(floats(x), w, floats(out), n);
+  } else if constexpr (std::is_same_v<Sample, float>) {
+    qsrfhs::kernels::active().weigh(x, w, out, n / 2);  // pairs
+    if (n % 2 != 0) out[n - 1] = x[n - 1] * w[n - 1];
+  } else {
+    for (std::size_t k = 0; k < n; ++k) out[k] = x[k] * w[k];
+  }
+}
+
+template <class Real>
+void write_power(const std::complex<Real> *x, Real *power, bool add, std::size_t n) noexcept {
+  if constexpr (std::is_same_v<Real, float>) {
+    const auto &kernels = qsrfhs::kernels::active();
+    (add ? kernels.accumulate_power : kernels.store_power)(floats(x), power, n);
+  } else {
+    if (!add) std::fill_n(power, n, Real{});
+    for (std::size_t k = 0; k < n; ++k) power[k] += x[k].real() * x[k].real() + x[k].imag() * x[k].imag();
+  }
+}
+
+}  // namespace
+
+template <class Sample>
+segment_power<Sample>::segment_power(std::span<const real> window)
+    : window_(window),
+      work_(window.size()),
+      spectrum_(is_complex<Sample> ? 0 : bins(window.size())),
+      transform_(dfti_settings{.precision = sizeof(real) == sizeof(double) ? DFTI_DOUBLE : DFTI_SINGLE,
+                               .domain = is_complex<Sample> ? DFTI_COMPLEX : DFTI_REAL,
+                               .lengths = {static_cast<MKL_LONG>(window.size()), 0},
+                               .in_place = is_complex<Sample>}) {}
+
+template <class Sample>
+void segment_power<Sample>::begin(const Sample *x) noexcept {
+  apply_window(x, window_.data(), work_.data(), window_.size());
+}
+
+template <class Sample>
+void segment_power<Sample>::finish(real *power, bool add, const Sample *next, std::size_t ahead) {
+  const std::size_t n = window_.size();
+  if constexpr (std::is_same_v<Sample, cf32>) {
+    transform_.forward(work_.data());
+    const auto &kernels = qsrfhs::kernels::active();
+    float *const work = floats(work_.data());
+    if (!next) return write_power(work_.data(), power, add, n);
+    (add ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
+        work, power, floats(next), window_.data(), floats(next + n), ahead, n);
+  } else if constexpr (is_complex<Sample>) {
+    transform_.forward(work_.data());
+    write_power(work_.data(), power, add, n);
+    if (next) begin(next);
+  } else {
+    transform_.forward(work_.data(), spectrum_.data());
+    write_power(spectrum_.data(), power, add, spectrum_.size());
+    if (next) begin(next);
+  }
+}
+
+template <class Sample>
+void segment_power<Sample>::order(std::span<real> power) noexcept {
+  if constexpr (std::is_same_v<real, float>) qsrfhs::kernels::active().order_power(power.data(), power.size());
+}
+
+template class segment_power<float>;
+template class segment_power<double>;
+template class segment_power<std::complex<float>>;
+template class segment_power<std::complex<double>>;
+
+}  // namespace dsp
