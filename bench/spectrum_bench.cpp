@@ -65,6 +65,19 @@ void lumra_windowed_fft(benchmark::State &state) {
   report(state, count);
 }
 
+// The accumulator, which is read once.
+void lumra_accumulator(benchmark::State &state) {
+  const auto n = static_cast<std::uint64_t>(state.range(0));
+  for (auto _ : state) {
+    state.PauseTiming();
+    lumra::spectrum_average<sample> average({.points = n, .threads = static_cast<std::uint32_t>(state.range(1))});
+    average.add(input().elements().first(3 * n));  // its memory and its threads are there
+    state.ResumeTiming();
+    average.add(input().elements());
+  }
+  report(state, count);
+}
+
 // The limit: nothing but the transforms, in place.
 void mkl_transforms_alone(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
@@ -140,6 +153,11 @@ double best(const std::vector<double> &times) {
 #define SIZES \
   ->Arg(256)->Arg(1024)->Arg(4096)->Arg(65536)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best)
 BENCHMARK(lumra_windowed_fft) SIZES;
+BENCHMARK(lumra_accumulator)
+    ->ArgsProduct({{256, 1024, 4096, 65536}, {1, 2}})
+    ->Unit(benchmark::kMicrosecond)
+    ->UseRealTime()
+    ->ComputeStatistics("best", best);
 BENCHMARK(mkl_transforms_alone) SIZES;
 #if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 BENCHMARK(fftw_with_volk) SIZES;

@@ -13,6 +13,7 @@
 #include <lumra/linear_algebra.hpp>
 #include <lumra/services.hpp>
 #include <lumra/session.hpp>
+#include <lumra/spectrum.hpp>
 #include <lumra/toolkit.hpp>
 #include <lumra/transform.hpp>
 #include <lumra/vector_utilities.hpp>

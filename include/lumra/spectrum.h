@@ -123,6 +123,16 @@ typedef struct lumra_spectrum_extent {
  * extent. */
 LUMRA_EXPORT lumra_status lumra_spectrum_where(const lumra_spectrum_average *spectrum, lumra_spectrum_extent *extent);
 
+/* The options that the object has: those it was made or saved with, start and origin of its present first sample, and
+ * threads as they are.
+ *
+ * options  written; its size is set by the caller
+ *
+ * Returns 0, or in the order of the checks: LUMRA_NULL_ARGUMENT spectrum; LUMRA_WRONG_OBJECT; LUMRA_NULL_ARGUMENT
+ * options; LUMRA_BAD_SIZE_FIELD options. */
+LUMRA_EXPORT lumra_status lumra_spectrum_get_options(const lumra_spectrum_average *spectrum,
+                                                     lumra_spectrum_options *options);
+
 /* Reads the spectrum of the segments that are complete; the accumulator goes on unchanged.
  *
  * info     written; its size is set by the caller

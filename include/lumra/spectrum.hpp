@@ -7,6 +7,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <span>
+#include <utility>
 #include <vector>
 
 namespace lumra {
@@ -24,7 +25,7 @@ struct spectrum_settings {
 };
 
 /// Powers in ascending frequency, and what the bins stand for.
-struct power_spectrum {
+struct averaged_spectrum {
   lumra_spectrum_info info{};
   std::vector<double> power;
   std::vector<double> maximum, minimum;  // empty where they were not held
@@ -39,7 +40,7 @@ template <sample T>
 class spectrum_average {
  public:
   explicit spectrum_average(const spectrum_settings &settings = {})
-      : hold_(settings.hold), average_(detail::make<owned>([&](lumra_spectrum_average **out) {
+      : average_(detail::make<owned>([&](lumra_spectrum_average **out) {
           lumra_spectrum_options options = LUMRA_SPECTRUM_OPTIONS;
           options.type = detail::type_code<T>;
           options.sample_rate_hz = settings.sample_rate_hz;
@@ -74,14 +75,15 @@ class spectrum_average {
     check_open(lumra_spectrum_where(average_.get(), &extent));
     return extent;
   }
-  [[nodiscard]] power_spectrum read() const {
-    power_spectrum result;
+  [[nodiscard]] averaged_spectrum read() const {
+    averaged_spectrum result;
     const std::size_t bins = static_cast<std::size_t>(where().bins);
     result.power.resize(bins);
-    if (hold_) result.maximum.resize(bins), result.minimum.resize(bins);
+    const bool held = options().hold == LUMRA_HOLD_EXTREMES;
+    if (held) result.maximum.resize(bins), result.minimum.resize(bins);
     result.info.size = sizeof result.info;
     check_open(lumra_spectrum_read(average_.get(), &result.info, result.power.data(),
-                                   hold_ ? result.maximum.data() : nullptr, hold_ ? result.minimum.data() : nullptr,
+                                   held ? result.maximum.data() : nullptr, held ? result.minimum.data() : nullptr,
                                    bins));
     return result;
   }
@@ -89,19 +91,25 @@ class spectrum_average {
   [[nodiscard]] std::vector<std::byte> save() const {
     return detail::save(average_.get(), lumra_spectrum_state_size, lumra_spectrum_save);
   }
-  /// What save() gave for the same type of samples, with or without extremes as they were held.
-  [[nodiscard]] static spectrum_average load(std::span<const std::byte> state, bool hold = false,
-                                             std::uint32_t threads = 0) {
-    return spectrum_average(hold, detail::make<owned>([&](lumra_spectrum_average **out) {
-                              return lumra_spectrum_load(state.data(), state.size(), threads, out);
-                            }));
+  /// What save() gave for the same type of samples.
+  [[nodiscard]] static spectrum_average load(std::span<const std::byte> state, std::uint32_t threads = 0) {
+    spectrum_average loaded(detail::make<owned>(
+        [&](lumra_spectrum_average **out) { return lumra_spectrum_load(state.data(), state.size(), threads, out); }));
+    if (loaded.options().type != detail::type_code<T>)
+      throw error(status(LUMRA_WRONG_TYPE), "the spectrum was saved for another type of samples");
+    return loaded;
+  }
+
+  [[nodiscard]] lumra_spectrum_options options() const {
+    lumra_spectrum_options options = LUMRA_SPECTRUM_OPTIONS;
+    check_open(lumra_spectrum_get_options(average_.get(), &options));
+    return options;
   }
 
  private:
   using owned = detail::owned<lumra_spectrum_average, &lumra_spectrum_free>;
-  spectrum_average(bool hold, owned average) : hold_(hold), average_(std::move(average)) {}
+  explicit spectrum_average(owned average) : average_(std::move(average)) {}
 
-  bool hold_;
   owned average_;
 };
 

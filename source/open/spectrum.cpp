@@ -125,19 +125,20 @@ lumra_spectrum_info info_of(const spectrum_object &object, std::uint32_t size) n
       object.average);
 }
 
+lumra_spectrum_options options_of(const spectrum_object &object) noexcept {
+  lumra_spectrum_options options = object.options;
+  options.size = sizeof options;
+  std::visit([&](const auto &average) { options.start = average.start(), options.origin = average.first_origin(); },
+             object.average);
+  return options;
+}
+
 auto payload_of(const spectrum_object &object) {
   return [&object](state_writer &to) {
-    lumra_spectrum_options options = object.options;
-    options.size = sizeof options;
+    lumra_spectrum_options options = options_of(object);
     options.threads = 0;
-    std::visit(
-        [&](const auto &average) {
-          options.start = average.start();
-          options.origin = average.first_origin();
-          to.add(options);
-          average.save(to);
-        },
-        object.average);
+    to.add(options);
+    std::visit([&](const auto &average) { average.save(to); }, object.average);
   };
 }
 
@@ -203,6 +204,16 @@ lumra_status lumra_spectrum_where(const lumra_spectrum_average *spectrum, lumra_
                      average.bins()};
         },
         object.average);
+  });
+}
+
+lumra_status lumra_spectrum_get_options(const lumra_spectrum_average *spectrum, lumra_spectrum_options *options) {
+  return enter(__func__, [&] {
+    const spectrum_object &object = spectra::get(spectrum, "spectrum");
+    require_present(options, "options");
+    require(options->size == sizeof *options, LUMRA_BAD_SIZE_FIELD, "options->size is ", options->size, "; it is ",
+            std::uint64_t{sizeof *options});
+    *options = options_of(object);
   });
 }
 
