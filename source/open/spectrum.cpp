@@ -105,7 +105,8 @@ lumra_spectrum_info info_of(const spectrum_object &object, std::uint32_t size) n
   const auto points = static_cast<double>(options.points);
   const bool two_sided = is_complex(options.type);
   const double spacing = options.sample_rate_hz / points;
-  const double first = options.centre_hz - (two_sided ? spacing * static_cast<double>(options.points / 2) : 0);
+  const std::uint64_t below = two_sided ? options.points / 2 : 0;  // bins below the centre
+  const double first = options.centre_hz - spacing * static_cast<double>(below);
   return std::visit(
       [&](const auto &average) {
         return lumra_spectrum_info{.size = size,
