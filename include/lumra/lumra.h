@@ -56,6 +56,7 @@
 #include <lumra/host_array.h>
 #include <lumra/library_info.h>
 #include <lumra/linear_algebra.h>
+#include <lumra/measure.h>
 #include <lumra/session.h>
 #include <lumra/spectrum.h>
 #include <lumra/status.h>

@@ -11,6 +11,7 @@
 #include <lumra/host_array.hpp>
 #include <lumra/library.hpp>
 #include <lumra/linear_algebra.hpp>
+#include <lumra/measure.hpp>
 #include <lumra/services.hpp>
 #include <lumra/session.hpp>
 #include <lumra/spectrum.hpp>
