@@ -32,11 +32,23 @@ bool open_interface_is_right() {
   const std::vector<double> matrix{1, 0, 0, 1, 0, 0};
   const auto solution = solver(matrix, step);
   const bool figures = lumra::make_window("hann", 4)[2] == 1 && lumra::window_figures("hann", 64).coherent_gain == 0.5;
+  std::vector<double> power(16);
+  power[12] = 1;
+  lumra_spectrum_info info{};
+  info.size = sizeof info;
+  info.sides = 2;
+  info.points = 16;
+  info.sample_rate_hz = info.noise_bandwidth_bins = 1;
+  const std::vector<double> beside{0.25};
+  const bool measures =
+      lumra::channel_power(power, info, 0.25, 0.125) == 1 && lumra::occupied_bandwidth(power, info).low_hz > 0.2 &&
+      lumra::adjacent_power(power, info, 0.25, 0.125, beside)[0].lower_dbc < -300 &&
+      lumra::find_peaks(power, info, 5).size() == 1 && lumra::measure_tone(power, info, 0.2).frequency_hz == 0.25;
   try {
     fir(ones, std::span<cf32>());
     return false;
   } catch (const lumra::error &e) {
-    return transforms && streams && recurs && levelled && figures && solution.rank == 2 &&
+    return transforms && streams && recurs && levelled && figures && measures && solution.rank == 2 &&
            e.status().code() == LUMRA_TOO_LITTLE_ROOM;
   }
 }
