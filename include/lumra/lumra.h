@@ -54,6 +54,7 @@
 #include <lumra/error_vector.h>
 #include <lumra/filter.h>
 #include <lumra/host_array.h>
+#include <lumra/level.h>
 #include <lumra/library_info.h>
 #include <lumra/linear_algebra.h>
 #include <lumra/measure.h>
