@@ -52,6 +52,7 @@
 #include <lumra/core_services.h>
 #include <lumra/elementwise.h>
 #include <lumra/error_vector.h>
+#include <lumra/evm.h>
 #include <lumra/filter.h>
 #include <lumra/host_array.h>
 #include <lumra/level.h>
