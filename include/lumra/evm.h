@@ -10,7 +10,8 @@
  * stream is late. Frequencies are found in the whole band, from minus to plus half the rate. First comes a search over
  * all delays, all frequencies, or both at once, on the part of the record with the most energy: 131072 samples, and
  * 8192 for both at once, which must hold enough of the signal to tell one delay from another (with 30 dB of noise, some
- * tens of symbols). Then the model's parameters are refined together on longer and longer parts, up to the whole record.
+ * tens of symbols). Then the model's parameters are refined together on longer and longer parts: the delay on 2^18 samples at most, the others up to the
+ * whole record.
  *
  * What limits the parameters is noise. At a signal-to-noise ratio S (as a power), with n samples of a signal that fills
  * a fraction B of the band, their standard deviations are about 0.55 / (B sqrt(n S)) samples, 0.4 sample_rate / (n
@@ -88,7 +89,7 @@ typedef struct lumra_evm_result {
  * LUMRA_OVERLAP; LUMRA_TOO_FEW_SAMPLES; LUMRA_OUT_OF_RANGE a reference of zeros; LUMRA_NO_CONVERGENCE where gain, delay
  * or frequency is asked for and the recordings seem unrelated (the best alignment leaves errors of ten times the
  * reference, or no less than unrelated noise of this length would), or where what is asked for cannot be told from each
- * other (delay, phase and frequency of a reference that is a tone); LUMRA_TRANSFORM_FAILED. Any thread. */
+ * other (delay and phase of a reference that is a tone); LUMRA_TRANSFORM_FAILED. Any thread. */
 LUMRA_EXPORT lumra_status lumra_evm_measure_cf32(const lumra_cf32 *reference, const lumra_cf32 *measured, uint64_t n,
                                                  const lumra_evm_options *options, lumra_evm_result *result,
                                                  lumra_cf32 *error, float *magnitude, float *phase);

@@ -7,8 +7,10 @@
 #include <lumra/elementwise.hpp>
 #include <lumra/error.hpp>
 #include <lumra/error_vector.hpp>
+#include <lumra/evm.hpp>
 #include <lumra/filter.hpp>
 #include <lumra/host_array.hpp>
+#include <lumra/level.hpp>
 #include <lumra/library.hpp>
 #include <lumra/linear_algebra.hpp>
 #include <lumra/measure.hpp>

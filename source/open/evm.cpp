@@ -48,7 +48,7 @@ lumra_evm_result result_of(const dsp::error_figures &figures, double sample_rate
 
 void require_measured(dsp::error_outcome outcome) {
   require(outcome != dsp::error_outcome::silent_reference, LUMRA_OUT_OF_RANGE,
-          "the reference is zero; errors are fractions of its RMS");
+          "the reference is zero, or its power is; errors are fractions of its RMS");
   require(outcome != dsp::error_outcome::unrelated, LUMRA_NO_CONVERGENCE,
           "the recordings seem unrelated: no alignment within 500 samples makes them alike; check that they are of the "
           "same signal and finite");

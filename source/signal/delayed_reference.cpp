@@ -60,6 +60,7 @@ void delayed_reference<Sample>::load(std::size_t first, std::size_t count) {
     transform_->forward(delayed_.data(), spectrum_.data());
   }
   window_ = wanted;
+  shifted_ = std::numeric_limits<double>::quiet_NaN();
 }
 
 template <class Sample>
@@ -69,19 +70,18 @@ void delayed_reference<Sample>::shift(double delay, bool with_slopes) {
   const double turn = -delay / static_cast<double>(points), scale = 1 / static_cast<double>(points);
   const std::span<const std::complex<double>> bins(spectrum_.data(), points);
   const std::span<std::complex<double>> turned(turned_.data(), points);
-  // Bins 0 to half - 1, then the negative ones; between them, with an even count, half the rate, which is both.
+  // Bins from 0 up, then the negative ones; half the rate is one of these.
+  const std::size_t negative = points - half;
   rotate(bins.first(half), turn, 0, scale, turned.first(half));
-  rotate(bins.last(half - 1), turn, -static_cast<double>(half - 1), scale, turned.last(half - 1));
-  const bool even = points % 2 == 0;
-  if (even) turned[half] = bins[half] * (std::cos(std::numbers::pi * delay) * scale);
+  rotate(bins.last(negative), turn, -static_cast<double>(negative), scale, turned.last(negative));
   transform_->backward(turned.data(), delayed_.data());
+  shifted_ = delay;
   if (!with_slopes) return;
   const double step = -2 * std::numbers::pi / static_cast<double>(points);
   for (std::size_t k = 0; k < points; ++k) {
     const double bin = k < half ? static_cast<double>(k) : -static_cast<double>(points - k);
     turned[k] = {-turned[k].imag() * step * bin, turned[k].real() * step * bin};
   }
-  if (even) turned[half] = 0;
   transform_->backward(turned.data(), slopes_.data());
 }
 

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <complex>
 #include <cstddef>
+#include <limits>
 #include <memory>
 #include <span>
 
@@ -46,11 +47,12 @@ class delayed_reference {
       if (as_is) {
         prepare(delayed_, count);
         std::copy_n(reference_.data() + first, count, delayed_.data());
+        shifted_ = std::numeric_limits<double>::quiet_NaN();
         visit(first, values(delayed_.data(), count), values());
         continue;
       }
       load(first, count);
-      shift(delay, with_slopes);
+      if (with_slopes || delay != shifted_) shift(delay, with_slopes);
       const std::size_t inside = first - window_.first;
       visit(first, values(delayed_.data() + inside, count),
             with_slopes ? values(slopes_.data() + inside, count) : values());
@@ -67,11 +69,12 @@ class delayed_reference {
   }
   /// The spectrum of a block with its margins, unless it is there.
   void load(std::size_t first, std::size_t count);
-  /// delayed_ and slopes_ of the window.
+  /// Computes delayed_, and slopes_ if asked for, of the window.
   void shift(double delay, bool with_slopes);
 
   std::span<const Sample> reference_;
   stretch window_{0, 0};
+  double shifted_ = std::numeric_limits<double>::quiet_NaN();  // the delay by which delayed_ is
   std::unique_ptr<block_transform<std::complex<double>>> transform_;
   buffer spectrum_, turned_, delayed_, slopes_;
 };

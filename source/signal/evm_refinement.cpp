@@ -32,10 +32,10 @@ struct normal_equations {
     }
   }
 
-  /// By Cholesky's method on columns of length 1; unknowns that are not free stay 0. False where a column is, to ten
+  /// By Cholesky's method on columns of length 1; unknowns that are not free stay 0. False where a column is, to eight
   /// digits, a combination of the others.
   bool solve(const std::array<bool, unknown_count> &is_free, unknowns &x) const noexcept {
-    constexpr double smallest_pivot = 1e-10;
+    constexpr double smallest_pivot = 1e-8;
     std::array<std::array<double, unknown_count>, unknown_count> l{};
     unknowns scale{}, y{};
     x = {};
@@ -68,21 +68,24 @@ struct normal_equations {
 }  // namespace
 
 template <class Sample>
-bool refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured, const alignment &wanted,
-            const stretch &part, bool fully, stream_model &model) {
+alignment_outcome refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured, const alignment &wanted,
+                         const stretch &part, bool fully, stream_model &model) {
   constexpr int most_rounds = 12;
-  const double enough = fully ? 1e-8 : 1e-3;
+  constexpr double least_correlation = 0.005;
+  const double enough = fully ? 1e-5 : 1e-2;  // of the last step, whose square is what is left
+  const bool short_enough = part.count() <= longest_for_delay;
   const double half = static_cast<double>(part.count()) / 2, middle = static_cast<double>(part.first) + half;
   wide gain = 0, dc = 0;
   for (int round = 0; round < most_rounds; ++round) {
     // Gain and dc first: the columns of the others are made with them.
     const bool first_round = round == 0;
-    const bool with_delay = wanted.delay && !first_round, with_turns = wanted.frequency && !first_round;
+    const bool with_delay = wanted.delay && short_enough && !first_round, with_turns = wanted.frequency && !first_round;
     const std::array<bool, unknown_count> is_free{true, true, wanted.dc, wanted.dc, with_delay, with_turns};
     const stretch known = wanted.delay ? delayed.known(model.delay) : stretch{0, measured.size()};
     const stretch compared{std::max(part.first, known.first), std::min(part.last, known.last)};
-    if (compared.first >= compared.last) return false;
+    if (compared.first >= compared.last) return alignment_outcome::unrelated;
     normal_equations equations;
+    double fitted_power = 0, error_power = 0;
     delayed.walk(compared, model.delay, with_delay, [&](std::size_t first, auto values, auto slopes) {
       constexpr std::size_t run = 256;
       std::array<wide, run> carried, sloped;
@@ -95,6 +98,8 @@ bool refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured
           const wide u = carried[k], fitted = times(gain, u);
           const double turn = 2 * std::numbers::pi * (from_middle + static_cast<double>(k)) / half;
           const wide error = wide(measured[first + begin + k]) - fitted - dc;
+          fitted_power += fitted.real() * fitted.real() + fitted.imag() * fitted.imag();
+          error_power += error.real() * error.real() + error.imag() * error.imag();
           equations.add({u, wide(-u.imag(), u.real()), 1, wide(0, 1), with_delay ? times(gain, sloped[k]) : 0,
                          turn * wide(-fitted.imag(), fitted.real())},
                         error);
@@ -102,19 +107,21 @@ bool refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured
       }
     });
     unknowns change;
-    if (!equations.solve(is_free, change)) return false;
+    if (!equations.solve(is_free, change)) return alignment_outcome::undetermined;
+    if (!first_round && !(fitted_power >= least_correlation * (fitted_power + error_power)))
+      return alignment_outcome::unrelated;
     gain += wide(change[gain_re], change[gain_im]);
     dc += wide(change[dc_re], change[dc_im]);
     model.delay += std::clamp(change[delay], -1.0, 1.0);
     model.frequency += change[turns] / half;
     if (!first_round && std::abs(change[delay]) < enough && std::abs(change[turns]) < enough) break;
   }
-  return true;
+  return alignment_outcome::found;
 }
 
-template bool refine(delayed_reference<std::complex<float>> &, std::span<const std::complex<float>>, const alignment &,
-                     const stretch &, bool, stream_model &);
-template bool refine(delayed_reference<std::complex<double>> &, std::span<const std::complex<double>>,
-                     const alignment &, const stretch &, bool, stream_model &);
+template alignment_outcome refine(delayed_reference<std::complex<float>> &, std::span<const std::complex<float>>,
+                                  const alignment &, const stretch &, bool, stream_model &);
+template alignment_outcome refine(delayed_reference<std::complex<double>> &, std::span<const std::complex<double>>,
+                                  const alignment &, const stretch &, bool, stream_model &);
 
 }  // namespace dsp

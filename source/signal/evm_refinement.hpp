@@ -1,6 +1,7 @@
 // Delay and frequency between two streams, by least squares. SPDX-License-Identifier: MIT
 #pragma once
 
+#include <cstddef>
 #include <span>
 
 #include "signal/evm_alignment.hpp"
@@ -8,11 +9,14 @@
 namespace dsp {
 
 /// Improves the delay and the frequency that are wanted on a part of the record, together with the gain and, where
-/// wanted, the dc that fit it, by Gauss's and Newton's method: until they stand still to a hundred millionth of a sample
-/// and of a turn along the part with `fully`, else to what a longer part can start from. False where the parameters
-/// cannot be told from each other. Throws std::bad_alloc, dfti_failure.
+/// wanted, the dc that fit it, by Gauss's and Newton's method: with `fully` until what is left is below rounding, else
+/// until a longer part can go on. Long parts leave the delay as it is: it is better known by then than noise shows.
+/// Throws std::bad_alloc, dfti_failure.
 template <class Sample>
-bool refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured, const alignment &wanted,
-            const stretch &part, bool fully, stream_model &model);
+alignment_outcome refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured, const alignment &wanted,
+                         const stretch &part, bool fully, stream_model &model);
+
+/// The longest part on which the delay is refined.
+inline constexpr std::size_t longest_for_delay = std::size_t{1} << 18;
 
 }  // namespace dsp
