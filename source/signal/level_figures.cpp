@@ -9,22 +9,23 @@
 namespace dsp {
 namespace {
 
+// Lanes are only indexed by constants, so that they stay in registers; the last few values go beside them.
 constexpr std::size_t lanes = 8;
 using lane_values = std::array<double, lanes>;
-
-double sum(const lane_values &v) noexcept {
-  return ((v[0] + v[4]) + (v[2] + v[6])) + ((v[1] + v[5]) + (v[3] + v[7]));
-}
 
 /// The sums of the numbers at even and at odd places.
 template <class Real>
 std::array<double, 2> alternating_sums(const Real *x, std::size_t n) noexcept {
-  lane_values sums{};
+  lane_values v{};
   std::size_t k = 0;
   for (; k + lanes <= n; k += lanes)
-    for (std::size_t j = 0; j < lanes; ++j) sums[j] += static_cast<double>(x[k + j]);
-  for (std::size_t j = 0; k < n; ++j, ++k) sums[j] += static_cast<double>(x[k]);
-  return {(sums[0] + sums[4]) + (sums[2] + sums[6]), (sums[1] + sums[5]) + (sums[3] + sums[7])};
+    for (std::size_t j = 0; j < lanes; ++j) v[j] += static_cast<double>(x[k + j]);
+  double even = 0, odd = 0;
+  for (; k < n; k += 2) {
+    even += static_cast<double>(x[k]);
+    if (k + 1 < n) odd += static_cast<double>(x[k + 1]);
+  }
+  return {((v[0] + v[4]) + (v[2] + v[6])) + even, ((v[1] + v[5]) + (v[3] + v[7])) + odd};
 }
 
 }  // namespace
@@ -47,21 +48,32 @@ run_figures measure_run(const Sample *x, std::size_t n, double *__restrict power
     const auto dc = alternating_sums(parts, n);
     figures.dc_re = dc[0] + dc[1];
   }
-  lane_values sums{}, smallest, largest;
-  smallest.fill(power[0]);
-  largest.fill(power[0]);
-  const auto take = [&](std::size_t j, double p) {
-    sums[j] += p;
-    smallest[j] = p < smallest[j] ? p : smallest[j];
-    largest[j] = p > largest[j] ? p : largest[j];
-  };
+  // Pairs of lanes as compilers' vectors: they do not see minima and maxima of arrays as such.
+  using pair = double __attribute__((vector_size(16)));
+  constexpr std::size_t pairs = lanes / 2;
+  const pair first = {power[0], power[0]};
+  pair sums[pairs] = {}, smallest[pairs] = {first, first, first, first}, largest[pairs] = {first, first, first, first};
   std::size_t k = 0;
   for (; k + lanes <= n; k += lanes)
-    for (std::size_t j = 0; j < lanes; ++j) take(j, power[k + j]);
-  for (std::size_t j = 0; k < n; ++j, ++k) take(j, power[k]);
-  figures.power = sum(sums);
-  figures.smallest = *std::min_element(smallest.begin(), smallest.end());
-  figures.largest = *std::max_element(largest.begin(), largest.end());
+    for (std::size_t j = 0; j < pairs; ++j) {
+      const pair p = {power[k + 2 * j], power[k + 2 * j + 1]};
+      sums[j] += p;
+      smallest[j] = p < smallest[j] ? p : smallest[j];
+      largest[j] = p > largest[j] ? p : largest[j];
+    }
+  figures.smallest = figures.largest = power[0];
+  for (std::size_t j = 0; j < lanes; ++j) {
+    figures.smallest = std::min(figures.smallest, smallest[j / 2][j % 2]);
+    figures.largest = std::max(figures.largest, largest[j / 2][j % 2]);
+  }
+  double rest = 0;
+  for (; k < n; ++k) {
+    rest += power[k];
+    figures.smallest = std::min(figures.smallest, power[k]);
+    figures.largest = std::max(figures.largest, power[k]);
+  }
+  const pair all = (sums[0] + sums[2]) + (sums[1] + sums[3]);
+  figures.power = (all[0] + all[1]) + rest;
   return figures;
 }
 
