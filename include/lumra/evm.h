@@ -3,8 +3,9 @@
  *   measured[n] = gain reference[n - delay] exp(2 pi j frequency n / sample_rate) + dc + noise
  *   error[n] = ((measured[n] - dc) exp(-2 pi j frequency n / sample_rate) / gain - reference[n - delay]) / rms
  *
- * where rms is that of reference[n - delay] over the samples that are compared. What of gain, delay, frequency and dc is
- * asked for is found by least squares; the rest is 1, 0, 0 and 0. With nothing asked for, these are the plain formulas.
+ * where rms is that of reference[n - delay] over the samples that are compared. What of gain, delay, frequency and dc
+ * is asked for is found by least squares; the rest is 1, 0, 0 and 0. With nothing asked for, these are the plain
+ * formulas.
  *
  * Delays are found between -500 and 500 samples, and at most half the record; a positive one means that the measured
  * stream is late. Frequencies are found in the whole band, from minus to plus half the rate. First comes a search over

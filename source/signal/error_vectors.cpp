@@ -97,7 +97,6 @@ void find_angles(std::span<const wide> products, double *angles) noexcept {
     re[k] = none ? 1 : products[k].real();
     im[k] = none ? 0 : products[k].imag();
   }
-  const qsrfhs::mkl_runtime::use in_use;
   vmdAtan2(static_cast<MKL_INT>(products.size()), im.data(), re.data(), angles, VML_HA);
 }
 
@@ -166,6 +165,7 @@ error_outcome measure_errors(std::span<const std::complex<Real>> reference,
   using sample = std::complex<Real>;
   if (std::all_of(reference.begin(), reference.end(), [](const sample &v) { return v == Real(0); }))
     return error_outcome::silent_reference;
+  const qsrfhs::mkl_runtime::use in_use;
   delayed_reference<sample> delayed(reference);
   if (wanted.searched()) {
     const alignment_outcome outcome = find_delay_and_frequency(reference, measured, wanted, delayed, figures.model);

@@ -89,6 +89,7 @@ class Evm(lumra.Test):
             (symbols, 100_000, -500, -0.25, everything, 0.01, 0.02j, 30),
             (symbols, 300_000, 499.5, 1e-6, everything, -1, 3 + 3j, 30),
             (white, 100_000, 250.5, -0.0123, everything, 1j, 0.1, 30),
+            (white, 1_100_000, -300.5, 0.2, everything, 1j, 0.1, 30),  # in blocks
             (symbols, 100_000, 0.5, 0.5 - 1e-5, DELAY | FREQUENCY | GAIN, 1, 0, 40),
             (symbols, 100_000, -17.2, 0, GAIN | DELAY, 3, 0, 40),
             (symbols, 100_000, 123.456, 0, DELAY, 1, 0, 40),
