@@ -10,7 +10,7 @@
  * Power statistics (CCDF): the share of samples whose power is more than some decibels above the mean. An accumulator
  * counts powers in 512 bins an octave, at most 0.0085 dB wide: its shares lie between the exact ones at thresholds
  * 0.0085 dB above and below. lumra_ccdf, which has all samples at hand, is exact. The counting takes about half of the
- * accumulator's time, which is 2 ns a complex sample in single precision on a core of 2 GHz.
+ * accumulator's time, which is 2.5 ns a complex sample in single precision on a core of 2 GHz.
  *
  * Conventions of the open interface: lumra/lumra.h. */
 #ifndef LUMRA_LEVEL_H
