@@ -3,7 +3,6 @@
 #include <benchmark/benchmark.h>
 
 #include <lumra/level.h>
-#include <lumra/lumra.hpp>
 
 #include <complex>
 #include <cstdint>
