@@ -194,7 +194,7 @@ class fifos {
   std::vector<std::uint64_t *> cells_;
 };
 
-/// Filters by specification; records may be stale or forged.
+/// Filters by key; records may be stale or forged.
 class filters {
  public:
   filters() = default;

@@ -17,7 +17,7 @@ extern "C" {
 enum lumra_status {
   LUMRA_SUCCESS = 0,
 
-  /* The open interface (window.h, transform.h, elementwise.h, filter.h, linear_algebra.h). */
+  /* The open interface, whose functions are named lumra_. */
   LUMRA_NULL_ARGUMENT = -390001,    /* a pointer is null that must not be */
   LUMRA_BAD_SIZE_FIELD = -390002,   /* an options record whose size is none of this library's */
   LUMRA_OUT_OF_RANGE = -390003,     /* a count, number or option outside of its range, or not a number */

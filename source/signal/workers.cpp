@@ -27,7 +27,11 @@ class workers {
 
   void before_fork() noexcept { pool_.before_fork(); }
   void after_fork_in_parent() noexcept { pool_.after_fork_in_parent(); }
-  void after_fork_in_child() noexcept { pool_.after_fork_in_child(); }
+  /// Tasks refer to the stacks of threads that are not there.
+  void after_fork_in_child() noexcept {
+    pool_.after_fork_in_child();
+    pool_.forget_tasks();
+  }
 
  private:
   ctpl::thread_pool pool_;  // no thread before the first task

@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <vector>
 
 namespace lifetime {
 namespace {
@@ -55,17 +56,10 @@ caller::~caller() {
 }
 
 bool caller::call(int family) {
-  constexpr bool (caller::*families[family_count])() = {&caller::host_arrays,
-                                                        &caller::own_session,
-                                                        &caller::shared_session,
-                                                        &caller::session_log,
-                                                        &caller::stored_arrays,
-                                                        &caller::filters,
-                                                        &caller::fifos,
-                                                        &caller::resampler,
-                                                        &caller::toolkit_transforms,
-                                                        &caller::toolkit_matrices,
-                                                        &caller::lookup_and_errors};
+  constexpr bool (caller::*families[family_count])() = {
+      &caller::host_arrays,        &caller::own_session,      &caller::shared_session, &caller::session_log,
+      &caller::stored_arrays,      &caller::filters,          &caller::fifos,          &caller::resampler,
+      &caller::toolkit_transforms, &caller::toolkit_matrices, &caller::open_objects,   &caller::lookup_and_errors};
   ++round_;
   return (this->*families[family])();
 }
@@ -195,6 +189,32 @@ bool caller::toolkit_matrices() {
   const std::int32_t status = qsRFPELTA_sLSEqH(matrix_, power_, 0, x_, work_[0], work_[1], work_[2]);
   (*power_)->count = samples;
   return status == 0 && is_near((*x_)->elements[0], 1) && is_near((*x_)->elements[1], 2);
+}
+
+/// The spectrum of a constant, by the library's own threads now and then, and through saved bytes.
+bool caller::open_objects() {
+  lumra_spectrum_options options = LUMRA_SPECTRUM_OPTIONS;
+  options.points = round_ % 8 == 0 ? 16384 : 64;
+  options.window = LUMRA_WINDOW_RECTANGULAR;
+  options.threads = 2;
+  const std::uint64_t count = 4 * options.points;
+  lumra_spectrum_average *spectrum = nullptr, *loaded = nullptr;
+  std::uint64_t size = 0;
+  bool good = lumra_spectrum_create(&options, &spectrum) == 0 &&
+              lumra_spectrum_add(spectrum, (*long_in_)->elements, count) == 0 &&
+              lumra_spectrum_state_size(spectrum, &size) == 0;
+  std::vector<unsigned char> bytes(size);
+  good = good && lumra_spectrum_save(spectrum, bytes.data(), size) == 0 &&
+         lumra_spectrum_load(bytes.data(), size, 1, &loaded) == 0;
+  std::vector<double> power(options.points);
+  lumra_spectrum_info info{};
+  info.size = sizeof info;
+  good = good && lumra_spectrum_read(loaded, &info, power.data(), nullptr, nullptr, power.size()) == 0 &&
+         info.segments == 7 && is_near(static_cast<float>(power[power.size() / 2]), 5) &&
+         is_near(static_cast<float>(power[0]), 0);
+  lumra_spectrum_free(loaded);
+  lumra_spectrum_free(spectrum);
+  return good;
 }
 
 /// Each looked-up sample is thrice the input.

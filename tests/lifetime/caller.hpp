@@ -8,7 +8,7 @@
 
 namespace lifetime {
 
-inline constexpr int family_count = 11;
+inline constexpr int family_count = 12;
 
 /// What threads may use together: a session, and a FIFO of a kilobyte.
 struct shared_objects {
@@ -44,6 +44,7 @@ class caller {
   bool resampler();
   bool toolkit_transforms();
   bool toolkit_matrices();
+  bool open_objects();
   bool lookup_and_errors();
 
   shared_objects &shared_;

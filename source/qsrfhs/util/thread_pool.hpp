@@ -44,6 +44,8 @@ class thread_pool {
   void before_fork() noexcept;
   void after_fork_in_parent() noexcept;
   void after_fork_in_child() noexcept;
+  /// Forgets the tasks that were queued: for the child of a fork, where who waits for them is not there.
+  void forget_tasks() noexcept;
 
  private:
   struct state;
