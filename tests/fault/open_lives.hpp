@@ -20,6 +20,8 @@ struct open_life {
   lumra_fir *fir = nullptr, *loaded_fir = nullptr;
   lumra_iir *iir = nullptr, *loaded_iir = nullptr;
   lumra_least_squares *solver = nullptr;
+  lumra_spectrum_average *spectrum = nullptr;
+  lumra_level *level = nullptr;
 
   open_life() : in(8192), out(16384), taps(300), bytes(1 << 16) {
     for (std::size_t k = 0; k < in.size(); ++k) in[k] = static_cast<float>(k * k % 97) / 97 - 0.5F;
@@ -34,6 +36,8 @@ struct open_life {
     lumra_iir_free(iir);
     lumra_iir_free(loaded_iir);
     lumra_least_squares_free(solver);
+    lumra_spectrum_free(spectrum);
+    lumra_level_free(level);
   }
 };
 
@@ -44,6 +48,30 @@ inline lumra_status first_of(std::initializer_list<lumra_status> codes) {
   for (const lumra_status code : codes)
     if (code != LUMRA_SUCCESS) return code;
   return LUMRA_SUCCESS;
+}
+
+/// An average of other samples, which a failed transform leaves unusable; the one before is freed.
+inline lumra_status fresh_spectrum(lumra_spectrum_average *&spectrum, std::uint64_t start, const float *x) {
+  lumra_spectrum_free(spectrum);
+  spectrum = nullptr;
+  lumra_spectrum_options options = LUMRA_SPECTRUM_OPTIONS;
+  options.type = LUMRA_TYPE_F32;
+  options.points = 101;
+  options.hold = LUMRA_HOLD_EXTREMES;
+  options.threads = 1;
+  options.start = start;
+  const lumra_status code = lumra_spectrum_create(&options, &spectrum);
+  return code != 0 ? code : lumra_spectrum_add(spectrum, x, 1000);
+}
+
+/// What it reads becomes the life's result.
+inline lumra_status read_spectrum(const lumra_spectrum_average *spectrum, std::vector<float> &out) {
+  double rows[3][51];
+  lumra_spectrum_info info{};
+  info.size = sizeof info;
+  const lumra_status code = lumra_spectrum_read(spectrum, &info, rows[0], rows[1], rows[2], 51);
+  if (code == 0) std::copy_n(rows[0], 3 * 51, out.begin());
+  return code;
 }
 
 template <class Samples>
@@ -122,6 +150,50 @@ inline const named_life open_lives[] = {
       [](open_life &l) {  // singular values are asked for
         return lumra_least_squares_solve(l.solver, l.in.data(), l.in.data(), 0.5, l.out.data(), &l.count);
       }}},
+    {"averaged spectra",
+     {[](open_life &l) {
+        const lumra_status code = fresh_spectrum(l.spectrum, 0, l.in.data());
+        return code != 0 ? code : read_spectrum(l.spectrum, l.out);
+      },
+      [](open_life &l) {
+        lumra_spectrum_average *next = nullptr;
+        lumra_status code = fresh_spectrum(l.spectrum, 0, l.in.data());
+        if (code == 0) code = fresh_spectrum(next, 1000, l.in.data() + 1000);
+        if (code == 0) code = lumra_spectrum_merge(l.spectrum, next);
+        lumra_spectrum_free(next);
+        return code;
+      },
+      [](open_life &l) {
+        return first_of({lumra_spectrum_state_size(l.spectrum, &l.count),
+                         lumra_spectrum_save(l.spectrum, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_spectrum_average *loaded = nullptr;
+        lumra_status code = lumra_spectrum_load(l.bytes.data(), l.count, 1, &loaded);
+        if (code == 0) code = read_spectrum(loaded, l.out);
+        lumra_spectrum_free(loaded);
+        return code;
+      }}},
+    {"levels",
+     {[](open_life &l) { return lumra_level_create(nullptr, &l.level); },
+      [](open_life &l) {
+        lumra_level_result result{};
+        result.size = sizeof result;
+        const lumra_status code = lumra_level_add(l.level, l.in.data(), 3000);
+        return code != 0 ? code : lumra_level_read(l.level, &result);
+      },
+      [](open_life &l) {
+        return first_of(
+            {lumra_level_state_size(l.level, &l.count), lumra_level_save(l.level, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_level *loaded = nullptr;
+        lumra_status code = lumra_level_load(l.bytes.data(), l.count, &loaded);
+        if (code == 0)
+          code = lumra_level_merge(l.level, loaded) == LUMRA_OUT_OF_RANGE ? LUMRA_SUCCESS : LUMRA_UNEXPECTED;
+        lumra_level_free(loaded);
+        return code;
+      }}},
     {"functions",
      {[](open_life &l) {
         return lumra_convolve_f32(l.in.data(), 4000, l.in.data(), 3000, 0, LUMRA_METHOD_FOURIER, l.out.data(), 6999);
@@ -133,6 +205,16 @@ inline const named_life open_lives[] = {
       [](open_life &l) {
         return lumra_correlate_cf32(complex(l.in), 1000, complex(l.in), 50, 0, LUMRA_METHOD_DIRECT, complex(l.out),
                                     1049);
+      },
+      [](open_life &l) {
+        const lumra_evm_options options{sizeof options, LUMRA_ALIGN_GAIN | LUMRA_ALIGN_DELAY | LUMRA_ALIGN_FREQUENCY,
+                                        1};
+        lumra_evm_result result{};
+        result.size = sizeof result;
+        const lumra_status code =
+            lumra_evm_measure_cf32(complex(l.in), complex(l.in), 2000, &options, &result, nullptr, nullptr, nullptr);
+        l.out.back() = static_cast<float>(result.gain_re);
+        return code;
       },
       [](open_life &l) { return lumra_design_kaiser_lowpass_f32(1, 0.1, 0.12, 80, l.out.data(), l.out.size()); },
       [](open_life &l) { return lumra_design_root_raised_cosine_f32(8, 1, 0.2, 16, l.out.data(), l.out.size()); },
