@@ -6,10 +6,10 @@
 #include <vector>
 
 #include "program_scratch.hpp"
+#include "recording/derived_metadata.hpp"
 #include "recording/failure.hpp"
-#include "recording/metadata_file.hpp"
+#include "recording/metadata_text.hpp"
 #include "recording/open.hpp"
-#include "recording/resampled_metadata.hpp"
 #include "recording/sample_reader.hpp"
 #include "recording/sigmf_writer.hpp"
 #include "terminal/printable.hpp"
@@ -21,21 +21,27 @@ constexpr std::size_t data_bytes = 3000;
 constexpr double ratio = 2.5;
 
 void require_in_file(const recording::source &source, std::uint64_t size) {
+  const std::size_t frame = source.channels * source.format.bytes();
   std::uint64_t end = 0;
   for (const recording::extent &e : source.extents) {
     fuzz::require(e.offset >= end && e.offset <= size, "extents follow each other");
-    fuzz::require(e.samples <= (size - e.offset) / source.format.bytes(), "extents end in the file");
-    end = e.offset + e.samples * source.format.bytes();
+    fuzz::require(e.samples <= (size - e.offset) / frame, "extents end in the file");
+    end = e.offset + e.samples * frame;
   }
 }
 
 void read_all(const recording::source &source) {
-  recording::sample_reader reader(source);
   std::vector<std::complex<float>> piece(97);
-  for (std::uint64_t left = source.samples(); left > 0; left -= piece.size()) {
-    piece.resize(std::min<std::uint64_t>(piece.size(), left));
-    reader.read(piece);
+  std::uint64_t end = source.chosen_first;
+  for (const recording::stretch &each : source.stretches) {
+    fuzz::require(each.first >= end && each.samples > 0, "stretches follow each other");
+    end = each.first + each.samples;
+    recording::sample_reader reader(source, each);
+    std::uint64_t read = 0;
+    while (const std::size_t count = reader.read(piece)) read += count;
+    fuzz::require(read == each.samples, "all of a stretch is read");
   }
+  fuzz::require(end <= source.chosen_first + source.chosen_samples, "stretches lie in what was chosen");
 }
 
 }  // namespace
@@ -48,14 +54,21 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t *data, std::size_t size
   try {
     const recording::source source = recording::open(folder.path() / "x", {});
     require_in_file(source, std::filesystem::file_size(source.data));
-    if (source.samples() == 0) return 0;
+    if (source.stretches.empty()) return 0;
     // Zeros are samples of every type; the metadata may name themselves as data.
     if (source.data.filename() == "x.sigmf-data") read_all(source);
-    const auto samples = static_cast<std::uint64_t>(static_cast<double>(source.samples()) / ratio) + 1;
+    const auto samples = static_cast<std::uint64_t>(static_cast<double>(source.chosen_samples) / ratio) + 1;
     tool::results given(source.files);
     const recording::sigmf_files files = recording::sigmf_files_of(folder.path() / "y");
     recording::sigmf_writer writer(given.add_file(files.data), given.add_file(files.metadata));
-    writer.write(recording::resampled_metadata(source, ratio, source.rate / ratio, samples, "resampled"));
+    writer.write(recording::derived_metadata(source, {.first = source.chosen_first,
+                                                      .samples_in = source.chosen_samples,
+                                                      .ratio = ratio,
+                                                      .samples = samples,
+                                                      .rate = source.rate / ratio,
+                                                      .frequency = {},
+                                                      .datatype = "cf32_le",
+                                                      .description = "resampled"}));
     given.deliver();
   } catch (const recording::failure &failure) {
     fuzz::require_one_line(tool::printable(failure.what()));

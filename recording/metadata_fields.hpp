@@ -37,11 +37,16 @@ class fields {
       throw failure("{}: {} must be a whole number from 0 to 2^52", where_, key);
     return value->get<std::uint64_t>();
   }
+  /// A field that must be there.
+  template <class Value>
+  Value required(std::optional<Value> value, const char *key) const {
+    if (!value) throw failure("{}: {} is missing", where_, key);
+    return *std::move(value);
+  }
   [[nodiscard]] bool is_true(const char *key) const {
     const nlohmann::json *value = find(key);
     return value && value->is_boolean() && value->get<bool>();
   }
-  [[nodiscard]] const std::string &where() const noexcept { return where_; }
 
  private:
   [[nodiscard]] const nlohmann::json *find(const char *key) const {

@@ -1,4 +1,4 @@
-// Files that hold nothing but samples. SPDX-License-Identifier: MIT
+// Bytes that are samples and nothing else. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <filesystem>
@@ -10,5 +10,8 @@ namespace recording {
 
 /// The sample type comes from the options, or else from the suffix. Throws failure.
 source open_raw(const std::filesystem::path &path, const options &said);
+
+/// The standard input, of any length. Throws failure.
+source open_standard_input(const options &said);
 
 }  // namespace recording

@@ -2,11 +2,7 @@
 #include "recording/sample_format.hpp"
 
 #include <algorithm>
-#include <bit>
-#include <cstdint>
-#include <cstring>
-#include <limits>
-#include <type_traits>
+#include <iterator>
 
 #include "recording/failure.hpp"
 
@@ -15,12 +11,13 @@ namespace {
 
 struct component_entry {
   component type;
-  const char *name;
+  const char *name;  // behind the letter for complex or real
   std::size_t bytes;
 };
 constexpr component_entry components[] = {
-    {component::f32, "cf32", 4}, {component::f64, "cf64", 8}, {component::i8, "ci8", 1},   {component::i16, "ci16", 2},
-    {component::i32, "ci32", 4}, {component::u8, "cu8", 1},   {component::u16, "cu16", 2}, {component::u32, "cu32", 4},
+    {component::f32, "f32", 4}, {component::f64, "f64", 8}, {component::i8, "i8", 1},
+    {component::i16, "i16", 2}, {component::i24, "i24", 3}, {component::i32, "i32", 4},
+    {component::u8, "u8", 1},   {component::u16, "u16", 2}, {component::u32, "u32", 4},
 };
 
 constexpr const component_entry &entry_of(component type) {
@@ -33,100 +30,39 @@ constexpr struct {
 } suffixes[] = {{"cfile", "cf32"}, {"fc32", "cf32"}, {"cs8", "ci8"},
                 {"cs16", "ci16"},  {"sc8", "ci8"},   {"sc16", "ci16"}};
 
-template <std::size_t Size>
-using bits = std::conditional_t<
-    Size == 1, std::uint8_t,
-    std::conditional_t<Size == 2, std::uint16_t, std::conditional_t<Size == 4, std::uint32_t, std::uint64_t>>>;
-
-template <class Bits>
-Bits swapped(Bits value) noexcept {
-  if constexpr (sizeof(Bits) == 2) return __builtin_bswap16(value);
-  if constexpr (sizeof(Bits) == 4) return __builtin_bswap32(value);
-  if constexpr (sizeof(Bits) == 8) return __builtin_bswap64(value);
-  return value;
-}
-
-template <class T>
-float scaled(T value) noexcept {
-  if constexpr (std::is_floating_point_v<T>) return static_cast<float>(value);
-  constexpr double largest = static_cast<double>(std::numeric_limits<T>::max());
-  if constexpr (std::is_signed_v<T>) return static_cast<float>(static_cast<double>(value) * (1.0 / (largest + 1.0)));
-  constexpr double middle = largest / 2;
-  return static_cast<float>((static_cast<double>(value) - middle) * (1.0 / middle));
-}
-
-template <class T, bool Swap>
-void decode_components(const std::byte *in, float *out, std::size_t count) noexcept {
-  for (std::size_t i = 0; i < count; ++i) {
-    bits<sizeof(T)> value;
-    std::memcpy(&value, in + i * sizeof(T), sizeof(T));
-    out[i] = scaled(std::bit_cast<T>(Swap ? swapped(value) : value));
-  }
-}
-
-template <class T>
-void decode_components(bool swap, const std::byte *in, float *out, std::size_t count) noexcept {
-  swap ? decode_components<T, true>(in, out, count) : decode_components<T, false>(in, out, count);
+std::optional<sample_format> known_format(std::string_view name) {
+  const bool big = name.ends_with("_be");
+  if (big || name.ends_with("_le")) name.remove_suffix(3);
+  if (!name.starts_with('c') && !name.starts_with('r')) return std::nullopt;
+  for (const component_entry &entry : components)
+    if (name.substr(1) == entry.name && entry.type != component::i24)
+      return sample_format{entry.type, name.front() == 'c', big};
+  return std::nullopt;
 }
 
 }  // namespace
 
 std::size_t sample_format::bytes() const noexcept {
-  return 2 * entry_of(type).bytes;
+  return components() * entry_of(type).bytes;
 }
 
 std::string sample_format::name() const {
   const component_entry &entry = entry_of(type);
-  if (entry.bytes == 1) return entry.name;
-  return std::string(entry.name) + (big_endian ? "_be" : "_le");
+  const char *order = entry.bytes == 1 ? "" : big_endian ? "_be" : "_le";
+  return fmt::format("{}{}{}", is_complex ? 'c' : 'r', entry.name, order);
 }
 
 sample_format parse_format(std::string_view name) {
-  std::string_view stem = name;
-  const bool big = stem.ends_with("_be");
-  if (big || stem.ends_with("_le")) stem.remove_suffix(3);
-  for (const component_entry &entry : components)
-    if (stem == entry.name) return {entry.type, big};
-  if (name.starts_with('r'))
-    throw failure("samples of type {} are real; only complex ones are analysed: {}", name, known_formats);
+  if (const auto known = known_format(name)) return *known;
   throw failure("unknown sample type '{}': use {}", name, known_formats);
 }
 
 std::optional<sample_format> format_of_suffix(const std::filesystem::path &file) {
-  std::string suffix = file.extension().string();
-  if (suffix.empty()) return std::nullopt;
-  suffix.erase(0, 1);
+  const std::string suffix = file.extension().string();
+  const std::string_view name = std::string_view(suffix).substr(suffix.empty() ? 0 : 1);
   for (const auto &[known, format] : suffixes)
-    if (suffix == known) return parse_format(format);
-  const std::string stem = suffix.substr(0, suffix.find('_'));
-  for (const component_entry &entry : components)
-    if (stem == entry.name) return parse_format(suffix);
-  return std::nullopt;
-}
-
-void decode(sample_format format, std::span<const std::byte> bytes, std::span<std::complex<float>> out) {
-  const std::byte *in = bytes.data();
-  auto *to = reinterpret_cast<float *>(out.data());
-  const std::size_t count = 2 * out.size();
-  const bool swap = format.big_endian != (std::endian::native == std::endian::big);
-  switch (format.type) {
-    case component::f32:
-      return decode_components<float>(swap, in, to, count);
-    case component::f64:
-      return decode_components<double>(swap, in, to, count);
-    case component::i8:
-      return decode_components<std::int8_t>(swap, in, to, count);
-    case component::i16:
-      return decode_components<std::int16_t>(swap, in, to, count);
-    case component::i32:
-      return decode_components<std::int32_t>(swap, in, to, count);
-    case component::u8:
-      return decode_components<std::uint8_t>(swap, in, to, count);
-    case component::u16:
-      return decode_components<std::uint16_t>(swap, in, to, count);
-    case component::u32:
-      return decode_components<std::uint32_t>(swap, in, to, count);
-  }
+    if (name == known) return known_format(format);
+  return known_format(name);
 }
 
 }  // namespace recording

@@ -35,12 +35,13 @@ double decibels(double power) noexcept {
   return 10 * std::log10(std::max(power, 1e-30));
 }
 
-averaged_spectrum average_spectrum(const recording::source &source, const spectrum_settings &settings) {
+averaged_spectrum average_spectrum(const recording::source &source, const recording::stretch &over,
+                                   const spectrum_settings &settings) {
   const auto n = static_cast<std::uint64_t>(settings.fft_size);
   // The same expression and truncation as the library's, so that the segments start at the same samples.
   const auto overlap = static_cast<std::uint64_t>(settings.overlap_percent / 100.0 * settings.fft_size);
   const std::uint64_t step = n - overlap;
-  const std::uint64_t samples = source.samples();
+  const std::uint64_t samples = over.samples;
   if (samples < n)
     throw failure("{}: {} samples are fewer than N = {}; use a smaller --fft", source.data.string(), samples, n);
   const std::uint64_t segments = (samples - n) / step + 1;
@@ -60,7 +61,7 @@ averaged_spectrum average_spectrum(const recording::source &source, const spectr
   result.noise_bandwidth = figures.noise_bandwidth;
   result.segments = segments;
 
-  recording::sample_reader reader(source);
+  recording::sample_reader reader(source, over);
   progress bar("Analysing");
   lumra::host_array<std::complex<float>> block(n + (per_call - 1) * step);
   lumra::spectrum part;

@@ -34,6 +34,7 @@ double decibels(double power) noexcept;
 
 /// The segments are those of one library call on the whole recording; their powers are averaged over the blocks in
 /// double precision. Throws failure, or lumra::error when the library refuses.
-averaged_spectrum average_spectrum(const recording::source &source, const spectrum_settings &settings);
+averaged_spectrum average_spectrum(const recording::source &source, const recording::stretch &over,
+                                   const spectrum_settings &settings);
 
 }  // namespace tool

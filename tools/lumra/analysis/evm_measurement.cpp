@@ -25,8 +25,8 @@ struct relation {
 };
 
 /// Sums over both recordings; the measured samples are read for an alignment only.
-relation relate(const recording::source &reference, const recording::source &measured, const evm_settings &settings) {
-  recording::sample_reader from(reference), to(measured);
+relation relate(const evm_input &reference, const evm_input &measured, const evm_settings &settings) {
+  recording::sample_reader from(reference.source, reference.over), to(measured.source, measured.over);
   progress bar(settings.align ? "Aligning" : "Levelling");
   std::vector<sample> r(std::min(settings.block, settings.samples));
   std::vector<sample> m(settings.align ? r.size() : 0);
@@ -53,12 +53,12 @@ relation relate(const recording::source &reference, const recording::source &mea
 }
 
 /// The gain g that minimises the sum of |measured - g * reference|^2.
-std::complex<double> fitted_gain(const relation &sums, const recording::source &measured) {
+std::complex<double> fitted_gain(const relation &sums, const evm_input &measured) {
   // Below, the sums agree within their rounding with those of recordings that have nothing in common.
   const double rounding = 1e-13 * std::sqrt(sums.reference_power) * std::sqrt(sums.measured_power);
   if (std::abs(sums.product) <= rounding)
     throw failure("{}: holds nothing of the reference, so there is no gain to align by; leave out --align",
-                  measured.data.string());
+                  measured.source.data.string());
   return sums.product / sums.reference_power;
 }
 
@@ -101,12 +101,12 @@ bool has_phase(sample reference, sample measured) noexcept {
   return reference != sample() && measured != sample();
 }
 
-evm_result measure_evm(const recording::source &reference, const recording::source &measured,
-                       const evm_settings &settings, const std::function<void(const evm_block &)> &see) {
+evm_result measure_evm(const evm_input &reference, const evm_input &measured, const evm_settings &settings,
+                       const std::function<void(const evm_block &)> &see) {
   const relation sums = relate(reference, measured, settings);
   if (sums.reference_power == 0)
     throw failure("{}: all samples are zero, which no error can be related to; give a reference with a signal",
-                  reference.data.string());
+                  reference.source.data.string());
   evm_result result;
   result.reference_rms = std::sqrt(sums.reference_power / static_cast<double>(settings.samples));
   if (settings.align) result.gain = fitted_gain(sums, measured);
@@ -114,7 +114,7 @@ evm_result measure_evm(const recording::source &reference, const recording::sour
   const double scale = std::scalbn(1.0, -std::ilogb(result.reference_rms));
   const double unit = result.reference_rms * scale;
 
-  recording::sample_reader from(reference), to(measured);
+  recording::sample_reader from(reference.source, reference.over), to(measured.source, measured.over);
   progress bar("Comparing");
   const auto block = std::min(settings.block, settings.samples);
   lumra::host_matrix<sample> r(1, block), m(1, block);
@@ -144,7 +144,8 @@ evm_result measure_evm(const recording::source &reference, const recording::sour
         ++result.without_phase;
     }
     if (!(errors.in(unit).rms < largest_error))
-      throw failure("{}: samples are too large beside the reference; scale the recording down", measured.data.string());
+      throw failure("{}: samples are too large beside the reference; scale the recording down",
+                    measured.source.data.string());
     see(seen);
     done += count;
     bar.update(done, settings.samples);

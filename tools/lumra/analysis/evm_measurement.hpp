@@ -11,6 +11,12 @@
 
 namespace tool {
 
+/// Samples of a recording.
+struct evm_input {
+  const recording::source &source;
+  const recording::stretch &over;
+};
+
 struct evm_settings {
   bool align = false;
   std::uint64_t samples = 0;                     // from the start, not more than either recording has
@@ -45,7 +51,7 @@ struct evm_block {
 
 /// Reads the recordings twice: for the level of the reference, and the gain where that is asked for; then for the
 /// errors, which `see` is shown block by block. Throws failure, or lumra::error when the library refuses.
-evm_result measure_evm(const recording::source &reference, const recording::source &measured,
-                       const evm_settings &settings, const std::function<void(const evm_block &)> &see);
+evm_result measure_evm(const evm_input &reference, const evm_input &measured, const evm_settings &settings,
+                       const std::function<void(const evm_block &)> &see);
 
 }  // namespace tool

@@ -66,8 +66,9 @@ resampling_filter design() {
 
 }  // namespace
 
-resampling::resampling(const recording::source &source, double wanted_rate)
+resampling::resampling(const recording::source &source, const recording::stretch &over, double wanted_rate)
     : source_(source),
+      over_(over),
       ratio_(ratio_between(source, wanted_rate)),
       rate_(source.rate / wanted_rate == ratio() ? wanted_rate : source.rate / ratio()),
       filter_(design()) {}
@@ -76,11 +77,11 @@ std::uint64_t resampling::samples() const noexcept {
   // This is exact up to 2^39 outputs: the ratio has 24 bits, a quotient that is not whole is 2^-24 or more away from
   // a whole one.
   return static_cast<std::uint64_t>(
-      std::ceil(static_cast<long double>(source_.samples()) / static_cast<long double>(ratio_)));
+      std::ceil(static_cast<long double>(over_.samples) / static_cast<long double>(ratio_)));
 }
 
 void resampling::run(std::uint64_t block, const std::function<void(std::span<const sample>)> &write) const {
-  const std::uint64_t available = source_.samples();
+  const std::uint64_t available = over_.samples;
   const std::uint64_t wanted = samples();
   const auto fitting = static_cast<std::uint64_t>(static_cast<double>(outputs_per_call) * ratio());
   const std::uint64_t per_call = std::clamp<std::uint64_t>(fitting, 1, block);
@@ -90,7 +91,7 @@ void resampling::run(std::uint64_t block, const std::function<void(std::span<con
   const auto behind = static_cast<std::uint64_t>(reach * std::max(ratio(), 1.0)) + 1;
 
   lumra::resampler<sample> resampler(filter_.coefficients, filter_.phases, {.ratio = ratio_});
-  recording::sample_reader reader(source_);
+  recording::sample_reader reader(source_, over_);
   progress bar("Resampling");
   std::vector<sample> in;
   std::uint64_t read = 0, written = 0;

@@ -24,14 +24,16 @@ struct resampling_filter {
 /// Output k lies at input sample k * ratio, as far as the recording reaches; the recording has zeros around it.
 class resampling {
  public:
-  /// The source must outlive this. Throws failure where the rates are further apart than a factor of 65536, at which
+  /// Source and stretch must outlive this. Throws failure where the rates are further apart than a factor of 65536, at which
   /// the filter takes 100 MB.
-  resampling(const recording::source &source, double wanted_rate);
+  resampling(const recording::source &source, const recording::stretch &over, double wanted_rate);
 
   /// How many input samples one output stands for; the library's resamplers take it in single precision.
   [[nodiscard]] double ratio() const noexcept { return static_cast<double>(ratio_); }
   /// The rate of the outputs in hertz: the one wanted, unless that is another ratio in single precision.
   [[nodiscard]] double rate() const noexcept { return rate_; }
+  /// How many inputs there are.
+  [[nodiscard]] std::uint64_t samples_in() const noexcept { return over_.samples; }
   /// How many outputs there are.
   [[nodiscard]] std::uint64_t samples() const noexcept;
   [[nodiscard]] const resampling_filter &filter() const noexcept { return filter_; }
@@ -42,6 +44,7 @@ class resampling {
 
  private:
   const recording::source &source_;
+  const recording::stretch &over_;
   float ratio_;
   double rate_;
   resampling_filter filter_;

@@ -46,22 +46,20 @@ std::string deviation_text(const deviation &of, double factor, const char *unit,
 }
 
 /// How many samples are compared.
-std::uint64_t common_samples(const recording::source &reference, const recording::source &measured,
-                             std::uint64_t wanted) {
+std::uint64_t common_samples(const evm_input &first, const evm_input &second, std::uint64_t wanted) {
+  const recording::source &reference = first.source, &measured = second.source;
   if (reference.rate != measured.rate)
     throw failure("{} was sampled at {}, {} at {}; resample one of them, or say --rate if the metadata are wrong",
                   reference.data.string(), exact_text(reference.rate), measured.data.string(),
                   exact_text(measured.rate));
-  for (const recording::source *source : {&reference, &measured}) {
-    if (source->samples() == 0) throw failure("{}: holds no samples", source->data.string());
-    if (source->samples() < wanted)
-      throw failure("{}: {} samples are fewer than {}; use a smaller --samples", source->data.string(),
-                    source->samples(), wanted);
-  }
-  if (wanted == 0 && reference.samples() != measured.samples())
+  for (const evm_input *input : {&first, &second})
+    if (input->over.samples < wanted)
+      throw failure("{}: {} samples are fewer than {}; use a smaller --samples", input->source.data.string(),
+                    input->over.samples, wanted);
+  if (wanted == 0 && first.over.samples != second.over.samples)
     throw failure("{} has {} samples, {} has {}; cut them to the same part, or compare the first N with --samples N",
-                  reference.data.string(), reference.samples(), measured.data.string(), measured.samples());
-  return wanted > 0 ? wanted : reference.samples();
+                  reference.data.string(), first.over.samples, measured.data.string(), second.over.samples);
+  return wanted > 0 ? wanted : first.over.samples;
 }
 
 void write_rows(output_file &csv, const evm_block &block) {
@@ -88,16 +86,17 @@ std::string gain_text(std::complex<double> gain, int decimals, const char *unit)
                      unit);
 }
 
-void summarise(results &shown, const evm_command &command, const recording::source &reference,
-               const recording::source &measured, const evm_result &result) {
+void summarise(results &shown, const evm_command &command, const evm_input &first, const evm_input &second,
+               const evm_result &result) {
+  const recording::source &reference = first.source, &measured = second.source;
   const double rate = reference.rate;
   const std::uint64_t samples = command.settings.samples;
   const auto name = [](const recording::source &r) { return fmt::format("{} ({})", r.data.string(), r.format.name()); };
   shown.add_line("Reference", name(reference));
   shown.add_line("Measured", name(measured));
   std::string length = fmt::format("{} ({:.6g} s)", samples, static_cast<double>(samples) / rate);
-  if (samples < reference.samples() || samples < measured.samples())
-    length += fmt::format(", the first of {} and {}", reference.samples(), measured.samples());
+  if (samples < first.over.samples || samples < second.over.samples)
+    length += fmt::format(", the first of {} and {}", first.over.samples, second.over.samples);
   shown.add_line("Samples", length);
   shown.add_line("Sample rate", exact_text(rate));
   shown.add_line("Reference level", fmt::format("{:.2f} dBFS RMS, which is 100 %", level(result.reference_rms)));
@@ -122,7 +121,9 @@ results run(evm_command &command) {
   command.reference_options.format = command.measured_options.format;
   const recording::source reference = recording::open(command.reference, command.reference_options);
   const recording::source measured = recording::open(command.measured, command.measured_options);
-  command.settings.samples = common_samples(reference, measured, command.settings.samples);
+  const evm_input first{reference, recording::only_stretch(reference, command.reference_options.names)};
+  const evm_input second{measured, recording::only_stretch(measured, command.measured_options.names)};
+  command.settings.samples = common_samples(first, second, command.settings.samples);
   std::vector<std::filesystem::path> inputs = reference.files;
   inputs.insert(inputs.end(), measured.files.begin(), measured.files.end());
 
@@ -134,7 +135,7 @@ results run(evm_command &command) {
 
   constellation points(command.settings.samples);
   if (csv) csv->print("sample,evm_percent,magnitude_error_percent,phase_error_deg\n");
-  const evm_result result = measure_evm(reference, measured, command.settings, [&](const evm_block &block) {
+  const evm_result result = measure_evm(first, second, command.settings, [&](const evm_block &block) {
     if (csv) write_rows(*csv, block);
     if (plot) collect(points, block);
   });
@@ -144,7 +145,7 @@ results run(evm_command &command) {
     if (command.settings.align) figures += "  ·  gain " + gain_text(result.gain, 2, "°") + " removed";
     draw(constellation_script(points, measured.name + " against " + reference.name, figures, type), type, *plot);
   }
-  summarise(given, command, reference, measured, result);
+  summarise(given, command, first, second, result);
   return given;
 }
 

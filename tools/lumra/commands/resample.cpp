@@ -9,8 +9,8 @@
 #include "analysis/resampling.hpp"
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
+#include "recording/derived_metadata.hpp"
 #include "recording/open.hpp"
-#include "recording/resampled_metadata.hpp"
 #include "recording/sigmf_writer.hpp"
 #include "terminal/failure.hpp"
 #include "terminal/results.hpp"
@@ -48,7 +48,7 @@ void summarise(results &shown, const resample_command &command, const recording:
   const resampling_filter &filter = work.filter();
   const double lower = std::min(source.rate, work.rate());
   shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
-  shown.add_line("Input samples", length_text(source.samples(), source.rate));
+  shown.add_line("Input samples", length_text(work.samples_in(), source.rate));
   shown.add_line("Output samples", length_text(work.samples(), work.rate()));
   shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
   shown.add_line("Ratio", fmt::format("{:.17g} input samples per output sample", work.ratio()));
@@ -68,16 +68,22 @@ void summarise(results &shown, const resample_command &command, const recording:
 
 results run(const resample_command &command) {
   const recording::source source = recording::open(command.path, command.options);
-  if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
-  const resampling work(source, command.rate);
+  const recording::stretch &over = recording::only_stretch(source, command.options.names);
+  const resampling work(source, over, command.rate);
   const recording::sigmf_files files = recording::sigmf_files_of(output_base(command, source));
   results given(source.files);
   output_file &data = given.add_file(files.data);
   recording::sigmf_writer output(data, given.add_file(files.metadata));
-  const nlohmann::json metadata =
-      recording::resampled_metadata(source, work.ratio(), work.rate(), work.samples(),
-                                    fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate),
-                                                short_text(work.rate()), lumra::library().version_text));
+  const nlohmann::json metadata = recording::derived_metadata(
+      source, {.first = over.first,
+               .samples_in = over.samples,
+               .ratio = work.ratio(),
+               .samples = work.samples(),
+               .rate = work.rate(),
+               .frequency = {},
+               .datatype = "cf32_le",
+               .description = fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate),
+                                          short_text(work.rate()), lumra::library().version_text)});
   work.run(command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
   output.write(metadata);
   summarise(given, command, source, work, files);

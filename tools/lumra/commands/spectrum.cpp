@@ -52,11 +52,11 @@ void write_csv(output_file &csv, const averaged_spectrum &spectrum, double centr
 }
 
 void summarise(results &shown, const spectrum_command &command, const recording::source &source,
-               const averaged_spectrum &spectrum, std::size_t peak) {
+               const recording::stretch &over, const averaged_spectrum &spectrum, std::size_t peak) {
   const double rbw = spectrum.resolution_bandwidth();
   shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
   shown.add_line("Samples",
-                 fmt::format("{} ({:.6g} s)", source.samples(), static_cast<double>(source.samples()) / source.rate));
+                 fmt::format("{} ({:.6g} s)", over.samples, static_cast<double>(over.samples) / source.rate));
   shown.add_line("Sample rate", exact_text(source.rate));
   shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
   shown.add_line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
@@ -81,8 +81,8 @@ void summarise(results &shown, const spectrum_command &command, const recording:
 
 results run(spectrum_command &command) {
   const recording::source source = recording::open(command.path, command.options);
-  if (source.samples() == 0) throw failure("{}: holds no samples", source.data.string());
-  if (command.settings.fft_size == 0) command.settings.fft_size = fitting_size(source.samples());
+  const recording::stretch &over = recording::only_stretch(source, command.options.names);
+  if (command.settings.fft_size == 0) command.settings.fft_size = fitting_size(over.samples);
 
   // Made first, so that an output that cannot be written is known before the work.
   results given(source.files);
@@ -90,7 +90,7 @@ results run(spectrum_command &command) {
   const picture_type type = command.plot.empty() ? picture_type::png : picture_type_of(command.plot);
   output_file *const plot = command.plot.empty() ? nullptr : &given.add_file(command.plot);
 
-  const averaged_spectrum spectrum = average_spectrum(source, command.settings);
+  const averaged_spectrum spectrum = average_spectrum(source, over, command.settings);
   const auto peak =
       static_cast<std::size_t>(std::max_element(spectrum.power.begin(), spectrum.power.end()) - spectrum.power.begin());
   if (csv) write_csv(*csv, spectrum, source.frequency.value_or(0));
@@ -102,7 +102,7 @@ results run(spectrum_command &command) {
                     unit_for(spectrum.resolution_bandwidth()).name);
     draw(spectrum_script(source, spectrum, peak, settings, type), type, *plot);
   }
-  summarise(given, command, source, spectrum, peak);
+  summarise(given, command, source, over, spectrum, peak);
   return given;
 }
 

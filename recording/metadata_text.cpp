@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include "recording/metadata_file.hpp"
+#include "recording/metadata_text.hpp"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -39,7 +39,7 @@ std::string text_of(const fs::path &file) {
     text.resize(size);
     return text;
   }
-  throw failure("{}: metadata of more than 64 MiB are not read; take out what is not needed", file.string());
+  refuse_size(file.string());
 }
 
 /// Counts arrays and objects; gives at least what a parser would see up to the first error.
@@ -63,18 +63,26 @@ std::size_t depth_of(const std::string &text) noexcept {
 
 }  // namespace
 
-nlohmann::json read_metadata(const fs::path &file) {
-  const std::string text = text_of(file);
+void refuse_size(const std::string &where) {
+  throw failure("{}: metadata of more than 64 MiB are not read; take out what is not needed", where);
+}
+
+nlohmann::json parse_metadata(const std::string &text, const std::string &where) {
+  if (text.size() > largest_metadata) refuse_size(where);
   if (depth_of(text) > deepest_metadata)
-    throw failure("{}: metadata nested deeper than {} are not read; take out what is nested so deep", file.string(),
+    throw failure("{}: metadata nested deeper than {} are not read; take out what is nested so deep", where,
                   deepest_metadata);
   try {
     return nlohmann::json::parse(text);
   } catch (const nlohmann::json::parse_error &error) {
-    throw failure("{}: not valid JSON near byte {}; is this the metadata file?", file.string(), error.byte);
+    throw failure("{}: not valid JSON near byte {}; is this the metadata file?", where, error.byte);
   } catch (const nlohmann::json::exception &) {
-    throw failure("{}: a number is out of range; correct the metadata", file.string());
+    throw failure("{}: a number is out of range; correct the metadata", where);
   }
+}
+
+nlohmann::json read_metadata(const fs::path &file) {
+  return parse_metadata(text_of(file), file.string());
 }
 
 }  // namespace recording
