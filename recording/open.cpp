@@ -2,7 +2,9 @@
 #include "recording/open.hpp"
 
 #include "recording/raw.hpp"
+#include "recording/sigmf_archive.hpp"
 #include "recording/sigmf_pair.hpp"
+#include "recording/wav.hpp"
 
 namespace recording {
 namespace {
@@ -11,6 +13,8 @@ namespace {
 source open_any(const std::filesystem::path &path, const options &said) {
   if (path == "-") return open_standard_input(said);
   if (auto opened = open_sigmf_pair(path, said)) return *std::move(opened);
+  if (auto opened = open_sigmf_archive(path, said)) return *std::move(opened);
+  if (auto opened = open_wav(path, said)) return *std::move(opened);
   return open_raw(path, said);
 }
 

@@ -3,14 +3,11 @@
 
 #include <fmt/format.h>
 
-#include <bit>
 #include <iterator>
 #include <nlohmann/json.hpp>
 
 namespace recording {
 namespace {
-
-static_assert(std::endian::native == std::endian::little, "samples are written as they lie in memory");
 
 std::filesystem::path with_suffix(std::filesystem::path base, const char *suffix) {
   return base += suffix;
@@ -26,11 +23,7 @@ sigmf_files sigmf_files_of(const std::filesystem::path &base) {
   return {with_suffix(base, ".sigmf-data"), with_suffix(base, ".sigmf-meta")};
 }
 
-void sigmf_writer::write(std::span<const std::complex<float>> samples) {
-  data_.write(std::as_bytes(samples));
-}
-
-void sigmf_writer::write(const nlohmann::json &metadata) {
+std::string metadata_text(const nlohmann::json &metadata) {
   std::string text;
   const auto to = std::back_inserter(text);
   const char *before = "{";
@@ -46,6 +39,11 @@ void sigmf_writer::write(const nlohmann::json &metadata) {
     before = ",";
   }
   text += "\n}\n";
+  return text;
+}
+
+void sigmf_writer::write(const nlohmann::json &metadata) {
+  const std::string text = metadata_text(metadata);
   metadata_.write(std::as_bytes(std::span(text)));
 }
 

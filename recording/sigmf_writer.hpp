@@ -1,12 +1,14 @@
-// Writes a SigMF recording of complex single-precision samples. SPDX-License-Identifier: MIT
+// Writes a SigMF recording of complex samples. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <complex>
 #include <filesystem>
 #include <nlohmann/json_fwd.hpp>
 #include <span>
+#include <string>
 
 #include "recording/byte_sink.hpp"
+#include "recording/sample_encoder.hpp"
 
 namespace recording {
 
@@ -18,18 +20,24 @@ struct sigmf_files {
 /// BASE.sigmf-data and BASE.sigmf-meta.
 sigmf_files sigmf_files_of(const std::filesystem::path &base);
 
+/// The text of metadata, an object of objects and lists, each item of which becomes one line: its size does not depend on
+/// how deep it is nested. Texts may hold anything; what is not UTF-8 is replaced.
+std::string metadata_text(const nlohmann::json &metadata);
+
 /// Samples may be written piece by piece, metadata once; the sinks must outlive the writer.
 class sigmf_writer {
  public:
-  sigmf_writer(byte_sink &data, byte_sink &metadata) noexcept : data_(data), metadata_(metadata) {}
+  sigmf_writer(byte_sink &data, byte_sink &metadata, const sample_format &format = {}) noexcept
+      : samples_(data, format), metadata_(metadata) {}
 
-  void write(std::span<const std::complex<float>> samples);
-  /// Writes an object of objects and lists, each item of which becomes one line: the size of the text does not depend
-  /// on how deep it is nested. Texts may hold anything; what is not UTF-8 is replaced.
+  void write(std::span<const std::complex<float>> samples) { samples_.write(samples); }
   void write(const nlohmann::json &metadata);
+  /// How many samples were beyond the type's full scale.
+  [[nodiscard]] std::uint64_t clipped() const noexcept { return samples_.clipped(); }
 
  private:
-  byte_sink &data_, &metadata_;
+  sample_encoder samples_;
+  byte_sink &metadata_;
 };
 
 }  // namespace recording
