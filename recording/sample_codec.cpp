@@ -87,20 +87,16 @@ void decode_all(std::span<const std::byte> bytes, std::span<Real> out) noexcept 
     to[i] = scaled<Component, Real>(Component::load(from + i * Component::bytes));
 }
 
-/// Stores the nearest value and tells whether there is one near.
+/// Stores the nearest value and tells whether it is in the type's range.
 template <class Component>
 bool store_nearest(double x, std::byte *to) noexcept {
   using value = typename Component::value;
-  if constexpr (is_floating<Component>) {
-    const auto y = static_cast<value>(x);
-    Component::store(y, to);
-    return std::isfinite(y);
-  } else {
-    constexpr auto lowest = static_cast<double>(Component::lowest), highest = static_cast<double>(Component::highest);
-    const double y = std::rint(is_signed<Component> ? x * -lowest : x * (highest / 2) + highest / 2);
-    Component::store(y < lowest ? Component::lowest : y > highest ? Component::highest : static_cast<value>(y), to);
-    return y >= lowest && y <= highest;
-  }
+  constexpr auto lowest = static_cast<double>(Component::lowest), highest = static_cast<double>(Component::highest);
+  double y = x;
+  if constexpr (!is_floating<Component>)
+    y = std::rint(is_signed<Component> ? x * -lowest : x * (highest / 2) + highest / 2);
+  Component::store(y < lowest ? Component::lowest : y > highest ? Component::highest : static_cast<value>(y), to);
+  return y >= lowest && y <= highest;
 }
 
 template <class Component>

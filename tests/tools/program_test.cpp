@@ -9,41 +9,6 @@ namespace {
 
 using Program = ProgramTest;
 
-TEST_F(Program, RefusesBadMetadataInOneLine) {
-  write("y.sigmf-data", bytes_of(noise(100)));
-  std::filesystem::create_directory(folder_ / "folder.sigmf-meta");
-  refuse(1, "not a regular file", "spectrum folder.sigmf-meta");
-  const std::pair<const char *, std::string> refusals[] = {
-      {"not valid JSON near byte 1", ""},
-      {"not valid JSON", "{\"global\": "},
-      {"no global", "[]"},
-      {"out of range", R"({"global": {"core:sample_rate": 1e999}})"},
-      {"say --format", R"({"global": {"core:sample_rate": 1}})"},
-      {"are real", R"({"global": {"core:datatype": "rf32_le"}})"},
-      {"'\\x1B[2J\\x0A'", R"({"global": {"core:datatype": "\u001B[2J\n"}})"},
-      {"is missing; say --rate HZ", R"({"global": {"core:datatype": "cf32_le"}})"},
-      {"must be a number", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": "fast"}})"},
-      {"not positive; say --rate HZ", R"({"global": {"core:datatype": "cf32_le", "core:sample_rate": -1}})"},
-      {"several channels", metadata(R"(, "core:num_channels": 2)")},
-      {"samples are missing", metadata("", R"({"core:sample_start": 0, "core:global_index": 0},
-                                              {"core:sample_start": 9, "core:global_index": 10})")},
-      {"ends before capture 0", metadata("", R"({"core:sample_start": 101})")},
-      {"core:sample_start", metadata("", R"({"core:sample_start": 10}, {"core:sample_start": 9})")},
-      {"core:header_bytes", metadata("", R"({"core:header_bytes": -1})")},
-      {"same folder", metadata(R"(, "core:dataset": "../x.cf32")")},
-      {"same folder", metadata(R"(, "core:dataset": "x.cf32\u0000")")},
-      {"deeper than 64", metadata(R"(, "x": )" + std::string(63, '[') + std::string(63, ']'))},
-      {"deeper than 64", metadata(R"(, "x": )" + std::string(100000, '['))},
-      {"64 MiB", std::string((std::size_t{64} << 20) + 1, ' ')},
-  };
-  for (const auto &[says, meta] : refusals) {
-    write("y.sigmf-meta", meta);
-    refuse(1, says, "spectrum y");
-  }
-  write("y.sigmf-meta", metadata(R"(, "x": )" + std::string(62, '[') + std::string(62, ']')));
-  succeed("spectrum y");
-}
-
 TEST_F(Program, RefusesBadInputInOneLine) {
   const std::string bytes = bytes_of(noise(100));
   const std::vector huge(32, 1e300);
