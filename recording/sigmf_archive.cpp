@@ -193,6 +193,8 @@ struct entry_closer {
 }  // namespace
 
 struct sigmf_archive_writer::state {
+  explicit state(byte_sink &sink) noexcept : to(sink) {}
+
   byte_sink &to;
   std::exception_ptr refused;  // what the sink threw: it must not pass through the other library
   std::unique_ptr<archive, write_closer> file{archive_write_new()};
