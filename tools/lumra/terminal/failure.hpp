@@ -8,4 +8,10 @@ namespace tool {
 using recording::failure;
 using recording::system_reason;
 
+/// What stands on the command line makes no sense; the sentence names the word.
+class wrong_usage : public failure {
+ public:
+  using failure::failure;
+};
+
 }  // namespace tool

@@ -82,7 +82,10 @@ void report_current_exception() {
   } catch (const std::length_error &) {
     report(no_memory);
   } catch (const std::system_error &error) {
-    report(error.code() == std::errc::not_enough_memory ? no_memory : error.what());
+    // A thread that cannot be started has no room for its stack.
+    const bool lacks_room =
+        error.code() == std::errc::not_enough_memory || error.code() == std::errc::resource_unavailable_try_again;
+    report(lacks_room ? no_memory : error.what());
   } catch (const std::exception &error) {
     report(error.what());
   }

@@ -16,11 +16,14 @@
 
 namespace tool {
 
+/// The name of the standard output as a target.
+inline constexpr const char *standard_output = "-";
+
 /// Written under a temporary name in the same folder, and removed unless it came to stay. Something that is not a
-/// regular file (a pipe, a terminal) is written in place.
+/// regular file (a pipe, a terminal) and the standard output are written in place.
 class output_file final : public recording::byte_sink {
  public:
-  /// Throws failure, also when the file is one of those that are read.
+  /// Throws failure, also when the file is one of those that are read, or stands there and may not be written.
   output_file(std::filesystem::path target, const std::vector<std::filesystem::path> &inputs);
 
   template <class... Args>
@@ -30,6 +33,9 @@ class output_file final : public recording::byte_sink {
     write(std::as_bytes(std::span(text_.data(), text_.size())));
   }
   void write(std::span<const std::byte> bytes) override;
+  /// Hands on what was written so far, for whoever reads while the work goes on.
+  void flush();
+  [[nodiscard]] bool is_standard_output() const noexcept { return target_ == standard_output; }
   [[nodiscard]] int descriptor() const noexcept { return ::fileno(file_.get()); }
 
   /// Closes the file; throws failure when not all could be written. Nothing is written afterwards.

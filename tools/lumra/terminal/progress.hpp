@@ -15,7 +15,7 @@ class progress {
   progress &operator=(const progress &) = delete;
   ~progress();
 
-  /// Cheap enough for an inner loop over blocks.
+  /// Cheap enough for an inner loop over blocks; total is 0 where nobody knows the end.
   void update(std::uint64_t done, std::uint64_t total);
 
  private:

@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <iterator>
 
+#include "terminal/console.hpp"
 #include "terminal/failure.hpp"
 #include "terminal/interruption.hpp"
 #include "terminal/printable.hpp"
@@ -25,15 +26,26 @@ output_file &results::add_file(const std::filesystem::path &target) {
   return *files_.emplace_back(std::make_unique<output_file>(target, inputs_));
 }
 
-void results::add_line(const char *label, std::string_view text) {
-  const bool styled = ::isatty(STDOUT_FILENO) == 1;
-  fmt::format_to(std::back_inserter(summary_), "{}{:<22}{}{}\n", styled ? "\033[1m" : "", label,
-                 styled ? "\033[0m" : "", printable(text));
+void results::add_line(std::string_view label, std::string_view text) {
+  constexpr std::size_t indent = 22;
+  const bool terminal = ::isatty(STDOUT_FILENO) == 1;
+  const std::size_t width = terminal ? columns_of(STDOUT_FILENO) : std::string_view::npos;
+  const bool styled = is_styled(STDOUT_FILENO);
+  fmt::format_to(std::back_inserter(summary_), "{}{:<{}}{}{}\n", styled ? "\033[1m" : "", label, indent,
+                 styled ? "\033[0m" : "", wrapped(printable(text), width, indent));
+}
+
+void results::add_gap() {
+  if (!summary_.empty()) summary_ += '\n';
 }
 
 void results::deliver() {
-  for (const auto &file : files_) file->finish();
-  print(summary_);
+  bool shows_summary = true;
+  for (const auto &file : files_) {
+    shows_summary &= !file->is_standard_output();
+    file->finish();
+  }
+  if (shows_summary) print(summary_);
   const output_file *refused = nullptr;
   int code = 0;
   {
