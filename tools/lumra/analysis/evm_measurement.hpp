@@ -2,6 +2,8 @@
 // SPDX-License-Identifier: MIT
 #pragma once
 
+#include <lumra/evm.h>
+
 #include <complex>
 #include <cstdint>
 #include <functional>
@@ -18,7 +20,7 @@ struct evm_input {
 };
 
 struct evm_settings {
-  bool align = false;
+  std::uint32_t align = LUMRA_ALIGN_NONE;        // sum of enum lumra_align
   std::uint64_t samples = 0;                     // from the start, not more than either recording has
   std::uint64_t block = std::uint64_t{1} << 16;  // samples to read at a time; the result does not depend on it
 };
@@ -33,7 +35,10 @@ struct deviation {
 /// Error and magnitude error are relative to the RMS of the reference, the phase error is in radians.
 struct evm_result {
   double reference_rms = 0;
-  std::complex<double> gain{1, 0};  // by which the measured samples were divided
+  std::uint64_t first = 0, samples = 0;  // measured samples that were compared
+  // What was found of the alignment, and removed from the measured samples.
+  std::complex<double> gain{1, 0}, dc;
+  double delay_samples = 0, frequency_hz = 0;
   deviation error, magnitude, phase;
   std::uint64_t without_phase = 0;  // samples that are zero in one of the recordings: no part of the phase error
 };
@@ -41,6 +46,7 @@ struct evm_result {
 /// A block of samples after the alignment, and its errors.
 struct evm_block {
   std::uint64_t first;  // index of the first sample
+  std::uint64_t place;  // the same, counted from the first that is compared
   double unit;          // RMS of the reference in which samples, errors and magnitude errors are to be expressed
   std::span<const std::complex<float>> reference, measured;
   std::span<const float> error, magnitude, phase;
@@ -49,8 +55,9 @@ struct evm_block {
 /// A sample that is zero has no phase.
 [[nodiscard]] bool has_phase(std::complex<float> reference, std::complex<float> measured) noexcept;
 
-/// Reads the recordings twice: for the level of the reference, and the gain where that is asked for; then for the
-/// errors, which `see` is shown block by block. Throws failure, or lumra::error when the library refuses.
+/// Compares sample by sample, and shows `see` the errors block by block. Without an alignment, or with the gain alone,
+/// the recordings are read twice in constant memory: for the levels, then for the errors. Any other alignment has all
+/// samples in memory, 32 bytes for each pair. Throws failure, or lumra::error when the library refuses.
 evm_result measure_evm(const evm_input &reference, const evm_input &measured, const evm_settings &settings,
                        const std::function<void(const evm_block &)> &see);
 

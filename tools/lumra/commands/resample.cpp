@@ -24,7 +24,8 @@ namespace fs = std::filesystem;
 struct resample_command {
   std::string path, output;
   recording::options options;
-  double rate = 0;
+  output_arguments outputs;
+  double rate = 0;  // 0: not said
   std::uint64_t block = std::uint64_t{1} << 16;
 };
 
@@ -47,7 +48,7 @@ void summarise(results &shown, const resample_command &command, const recording:
                const recording::sigmf_files &files) {
   const resampling_filter &filter = work.filter();
   const double lower = std::min(source.rate, work.rate());
-  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
+  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.datatype));
   shown.add_line("Input samples", length_text(work.samples_in(), source.rate));
   shown.add_line("Output samples", length_text(work.samples(), work.rate()));
   shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
@@ -66,12 +67,23 @@ void summarise(results &shown, const resample_command &command, const recording:
   shown.add_line("Metadata", files.metadata.string());
 }
 
+nlohmann::ordered_json json_of(const recording::source &source, const resampling &work) {
+  const resampling_filter &filter = work.filter();
+  return {{"samples_in", work.samples_in()},
+          {"samples_out", work.samples()},
+          {"rate_hz", work.rate()},
+          {"passband_hz", filter.pass_edge * std::min(source.rate, work.rate())},
+          {"rejection_db", -20 * std::log10(filter.rejection)},
+          {"ripple_db", 20 * std::log10(1 + filter.ripple)}};
+}
+
 results run(const resample_command &command) {
   const recording::source source = recording::open(command.path, command.options);
   const recording::stretch &over = recording::only_stretch(source, command.options.names);
   const resampling work(source, over, command.rate);
   const recording::sigmf_files files = recording::sigmf_files_of(output_base(command, source));
   results given(source.files);
+  const output_files reports = begin_outputs(given, command.outputs);
   output_file &data = given.add_file(files.data);
   recording::sigmf_writer output(data, given.add_file(files.metadata));
   const nlohmann::json metadata = recording::derived_metadata(
@@ -87,6 +99,8 @@ results run(const resample_command &command) {
   work.run(command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
   output.write(metadata);
   summarise(given, command, source, work, files);
+  if (reports.json) write_json(*reports.json, json_of(source, work));
+  add_output_lines(given, command.outputs);
   return given;
 }
 
@@ -96,23 +110,28 @@ void add_resample(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<resample_command>();
   CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
   app->footer(
-      "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass\n"
-      "band is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower\n"
-      "rate is rejected. Samples are written as cf32_le. Metadata are carried over where they are still true.");
-  app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
-      ->required();
-  app->add_option("--rate", command->rate, "The new sample rate")
+      "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass "
+      "band "
+      "is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower rate is "
+      "rejected. Samples are written as cf32_le. Metadata are carried over where they are still true.");
+  app->add_option("RECORDING", command->path, recording_help)->required();
+  app->add_option("--to", command->rate, "The new sample rate (required)")
       ->option_text("HZ")
-      ->required()
-      ->check(positive_number());
-  command->options.names.rate = "--input-rate";
+      ->transform(positive_number());
   add_recording_options(*app, command->options);
+  add_capture_option(*app, command->options, capture_help);
   app->add_option("--output", command->output,
                   "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
       ->option_text("BASE");
   // Tests alone use this option: how much is read at a time must not change the result.
   app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
-  app->callback([command, &work] { work = [command] { return run(*command); }; });
+  add_outputs(*app, command->outputs, {nullptr, nullptr, false, false});
+  app->callback([command, &work] {
+    if (command->rate == 0)
+      throw wrong_usage("--to is required{}",
+                        command->options.rate ? ": it is the new rate, --rate is that of the recording" : "");
+    work = [command] { return run(*command); };
+  });
 }
 
 }  // namespace tool

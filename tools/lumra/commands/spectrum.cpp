@@ -1,108 +1,170 @@
-// lumra spectrum: averaged power spectrum of a recording as summary, CSV and picture. SPDX-License-Identifier: MIT
+// lumra spectrum: averaged power spectra of recordings as summary, JSON, CSV and picture. SPDX-License-Identifier: MIT
 #include <fmt/format.h>
 
 #include <algorithm>
 #include <cmath>
-#include <map>
 #include <memory>
+#include <nlohmann/json.hpp>
 
-#include "analysis/averaged_spectrum.hpp"
+#include "analysis/spectrum_accumulator.hpp"
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
-#include "pictures/gnuplot.hpp"
+#include "commands/inputs.hpp"
+#include "commands/spectrum_options.hpp"
 #include "pictures/spectrum_picture.hpp"
-#include "recording/open.hpp"
 #include "terminal/failure.hpp"
-#include "terminal/output_file.hpp"
 #include "terminal/progress.hpp"
-#include "terminal/results.hpp"
 #include "terminal/units.hpp"
 
 namespace tool {
 namespace {
 
-constexpr std::int32_t default_fft_size = 4096;
-
 struct spectrum_command {
-  std::string path;
-  recording::options options;
-  spectrum_settings settings;
-  std::string csv, plot;
+  input_arguments inputs;
+  spectrum_arguments spectrum;
+  output_arguments outputs;
+  bool hold = false;
+  std::size_t peaks = 1;
+  std::optional<double> centre_hz, span_hz;
+  double every_s = 0;
 };
 
-const char *name_of(lumra::window window) {
-  return window == lumra::window::none ? "no window" : "flat top";
+/// The bins that are shown and written.
+bin_range shown_bins(const spectrum_command &command, const lumra::averaged_spectrum &spectrum,
+                     const recording::source &source) {
+  if (!command.span_hz) return all_bins(spectrum);
+  const double last = static_cast<double>(spectrum.power.size() - 1);
+  const double low_end = spectrum.frequency(0), high_end = spectrum.frequency(spectrum.power.size() - 1);
+  const double centre = command.centre_hz.value_or((low_end + high_end + spectrum.info.spacing_hz) / 2);
+  const double low = (centre - *command.span_hz / 2 - low_end) / spectrum.info.spacing_hz;
+  const double high = (centre + *command.span_hz / 2 - low_end) / spectrum.info.spacing_hz;
+  // A bin that is beyond an end by rounding alone is on it.
+  constexpr double rounding = 1e-6;
+  const double first = std::max(std::ceil(low - rounding), 0.0), end = std::min(std::floor(high + rounding), last);
+  if (first > end)
+    throw failure("{}: has no bin within {} around {}; its band is {} to {}", source.data.string(),
+                  short_text(*command.span_hz), exact_text(centre), frequency_text(low_end, spectrum.info.spacing_hz),
+                  frequency_text(high_end, spectrum.info.spacing_hz));
+  return {static_cast<std::size_t>(first), static_cast<std::size_t>(end) + 1};
 }
 
-/// N when none was asked for: the largest power of two that fits, up to a size that suits a screen.
-std::int32_t fitting_size(std::uint64_t samples) {
-  std::int32_t size = default_fft_size;
-  while (size > 16 && static_cast<std::uint64_t>(size) > samples) size /= 2;
-  return size;
+void write_csv_header(output_file &csv, const spectrum_command &command) {
+  const char *unit = command.outputs.level_column();
+  csv.print("{}frequency_hz,level_{}", command.inputs.paths.size() > 1 ? "recording," : "", unit);
+  if (command.hold) csv.print(",maximum_{},minimum_{}", unit, unit);
+  csv.print("\n");
 }
 
-void write_csv(output_file &csv, const averaged_spectrum &spectrum, double centre) {
+void write_csv(output_file &csv, const spectrum_command &command, const recording::source &source,
+               const lumra::averaged_spectrum &spectrum, bin_range bins) {
   progress bar("Writing CSV");
-  csv.print("frequency_hz,level_dbfs\n");
-  const std::size_t bins = spectrum.power.size();
-  for (std::size_t k = 0; k < bins; ++k) {
-    csv.print("{},{:.4f}\n", centre + spectrum.offset(k), decibels(spectrum.power[k]));
-    if (k % 65536 == 0) bar.update(k, bins);
+  const std::string name = command.inputs.paths.size() > 1 ? csv_text(source.path.string()) + "," : "";
+  const auto level = [&](double power) { return csv_number(decibels(power) + command.outputs.calibration_db); };
+  for (std::size_t k = bins.first; k < bins.second; ++k) {
+    csv.print("{}{},{}", name, spectrum.frequency(k), level(spectrum.power[k]));
+    if (command.hold) csv.print(",{},{}", level(spectrum.maximum[k]), level(spectrum.minimum[k]));
+    csv.print("\n");
+    if (k % 65536 == 0) bar.update(k - bins.first, bins.second - bins.first);
   }
 }
 
 void summarise(results &shown, const spectrum_command &command, const recording::source &source,
-               const recording::stretch &over, const averaged_spectrum &spectrum, std::size_t peak) {
-  const double rbw = spectrum.resolution_bandwidth();
-  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.format.name()));
-  shown.add_line("Samples",
-                 fmt::format("{} ({:.6g} s)", over.samples, static_cast<double>(over.samples) / source.rate));
-  shown.add_line("Sample rate", exact_text(source.rate));
-  shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown, taken as 0 Hz");
-  shown.add_line("FFT size", fmt::format("N = {} (bin spacing {:.6g} Hz)", spectrum.power.size(), spectrum.df));
-  shown.add_line("Window", fmt::format("{} (noise bandwidth {:.4f} bins)", name_of(command.settings.window),
-                                       spectrum.noise_bandwidth));
-  shown.add_line("Averaged",
-                 fmt::format("{} segments, overlap {:g} %", spectrum.segments, command.settings.overlap_percent));
-  shown.add_line("Resolution bandwidth",
-                 fmt::format("{:.6g} Hz (density in dBFS/Hz = level {:+.2f} dB)", rbw, -10 * std::log10(rbw)));
-  const double offset = spectrum.offset(peak);
-  const double centre = source.frequency.value_or(0);
-  std::string where = frequency_text(centre + offset, spectrum.df);
-  if (source.frequency) where += fmt::format(" (offset {})", offset_text(offset, spectrum.df, unit_for(offset)));
-  shown.add_line("Peak", spectrum.power[peak] > 0
-                             ? fmt::format("{:.2f} dBFS at {}", decibels(spectrum.power[peak]), where)
-                             : "none: all samples are zero");
-  if (spectrum.power[peak] > 1.01)
+               const selection &chosen, const lumra::averaged_spectrum &spectrum,
+               const std::vector<lumra::peak> &peaks) {
+  add_recording_lines(shown, source, chosen);
+  add_spectrum_lines(shown, command.spectrum, spectrum, command.outputs);
+  const double whole = total_power(spectrum);
+  shown.add_line("Total power",
+                 whole > 0 ? level_text(decibels(whole), command.outputs) : "none: all samples are zero");
+  for (std::size_t i = 0; i < peaks.size(); ++i)
+    shown.add_line(i == 0 ? "Peak" : "", peak_text(peaks[i], spectrum, command.outputs));
+  if (!peaks.empty() && peaks.front().power > 1.01)
     shown.add_line("Note", "samples exceed full scale (amplitude 1.0), as unscaled floating-point recordings do");
-  if (!command.csv.empty()) shown.add_line("CSV", command.csv);
-  if (!command.plot.empty()) shown.add_line("Picture", command.plot);
 }
 
-results run(spectrum_command &command) {
-  const recording::source source = recording::open(command.path, command.options);
-  const recording::stretch &over = recording::only_stretch(source, command.options.names);
-  if (command.settings.fft_size == 0) command.settings.fft_size = fitting_size(over.samples);
+nlohmann::ordered_json json_of(const spectrum_command &command, const recording::source &source,
+                               const lumra::averaged_spectrum &spectrum, const std::vector<lumra::peak> &peaks) {
+  auto object = spectrum_json(command.spectrum, source, spectrum);
+  add_peaks_json(object, peaks, spectrum, command.outputs);
+  return object;
+}
 
-  // Made first, so that an output that cannot be written is known before the work.
-  results given(source.files);
-  output_file *const csv = command.csv.empty() ? nullptr : &given.add_file(command.csv);
-  const picture_type type = command.plot.empty() ? picture_type::png : picture_type_of(command.plot);
-  output_file *const plot = command.plot.empty() ? nullptr : &given.add_file(command.plot);
+/// One spectrum for each interval, written as soon as the interval is over.
+results run_intervals(const spectrum_command &command) {
+  const std::vector<recording::source> sources = open_all(command.inputs);
+  const recording::source &source = sources.front();
+  const selection chosen = select_frequency(source);
+  const lumra::spectrum_settings settings = settings_for(command.spectrum, source, chosen, command.outputs);
+  const double samples = std::round(command.every_s * source.rate);
+  if (!(samples >= static_cast<double>(settings.points) && samples < 0x1p62))
+    throw failure("{}: an interval of {} s is shorter than a segment of {} samples; use a longer --every",
+                  source.data.string(), command.every_s, settings.points);
+  const auto interval = static_cast<std::uint64_t>(samples);
 
-  const averaged_spectrum spectrum = average_spectrum(source, over, command.settings);
-  const auto peak =
-      static_cast<std::size_t>(std::max_element(spectrum.power.begin(), spectrum.power.end()) - spectrum.power.begin());
-  if (csv) write_csv(*csv, spectrum, source.frequency.value_or(0));
-  if (plot) {
-    const std::string settings =
-        fmt::format("N = {}  ·  {}  ·  {:g} % overlap  ·  {} averaged  ·  RBW {:.4g} {}", spectrum.power.size(),
-                    name_of(command.settings.window), command.settings.overlap_percent, spectrum.segments,
-                    spectrum.resolution_bandwidth() / unit_for(spectrum.resolution_bandwidth()).hertz,
-                    unit_for(spectrum.resolution_bandwidth()).name);
-    draw(spectrum_script(source, spectrum, peak, settings, type), type, *plot);
+  results given(files_of(sources));
+  output_file &json = *begin_outputs(given, command.outputs).json;
+  sample_blocks blocks(source, chosen,
+                       static_cast<std::size_t>(std::min<std::uint64_t>(interval, sample_blocks::usual_size)));
+  spectrum_accumulator accumulator(settings, blocks.is_real());
+  std::uint64_t added = 0, intervals = 0, done = 0;
+  const auto end_interval = [&] {
+    accumulator.gap();
+    if (accumulator.segments() > 0) {
+      const lumra::averaged_spectrum spectrum = accumulator.read();
+      const auto peaks = highest_peaks(spectrum, shown_bins(command, spectrum, source), command.peaks);
+      write_json(json, json_of(command, source, spectrum, peaks));
+      json.flush();
+      ++intervals;
+    }
+    accumulator.clear();
+    added = 0;
+  };
+  progress bar("Analysing");
+  while (const auto block = blocks.next()) {
+    if (block->begins_stretch && done > 0) end_interval();
+    for (std::size_t from = 0; from < block->count;) {
+      const auto part = static_cast<std::size_t>(std::min<std::uint64_t>(block->count - from, interval - added));
+      accumulator.add(block->part(from, part));
+      from += part;
+      added += part;
+      if (added == interval) end_interval();
+    }
+    done += block->count;
+    bar.update(done, chosen.samples == recording::endless ? 0 : chosen.samples);
   }
-  summarise(given, command, source, over, spectrum, peak);
+  end_interval();
+  given.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.datatype));
+  given.add_line("Intervals", fmt::format("{} of {:g} s", intervals, command.every_s));
+  add_output_lines(given, command.outputs);
+  return given;
+}
+
+results run(const spectrum_command &command) {
+  if (command.every_s > 0) return run_intervals(command);
+  const std::vector<recording::source> sources = open_all(command.inputs);
+  results given(files_of(sources));
+  // Made first, so that an output that cannot be written is known before the work.
+  const output_files files = begin_outputs(given, command.outputs);
+  if (files.csv) write_csv_header(*files.csv, command);
+  spectrum_picture picture;
+  picture.title = title_of(sources);
+  picture.is_shared = sources.size() > 1;
+  picture.level_unit = command.outputs.level_unit();
+  for (const recording::source &source : sources) {
+    selection chosen = select_frequency(source);
+    lumra::spectrum_settings settings = settings_for(command.spectrum, source, chosen, command.outputs);
+    settings.hold = command.hold;
+    const lumra::averaged_spectrum spectrum = average(source, chosen, settings);
+    const bin_range bins = shown_bins(command, spectrum, source);
+    const auto peaks = highest_peaks(spectrum, bins, command.peaks);
+    given.add_gap();
+    summarise(given, command, source, chosen, spectrum, peaks);
+    if (files.json) write_json(*files.json, json_of(command, source, spectrum, peaks));
+    if (files.csv) write_csv(*files.csv, command, source, spectrum, bins);
+    if (files.plot) add_curve(picture, command.spectrum, source, spectrum, bins, peaks, command.outputs);
+  }
+  if (files.plot) draw(spectrum_script(picture, files.type), files.type, *files.plot);
+  add_output_lines(given, command.outputs);
   return given;
 }
 
@@ -110,27 +172,34 @@ results run(spectrum_command &command) {
 
 void add_spectrum(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<spectrum_command>();
-  CLI::App *app = program.add_subcommand("spectrum", "Averaged power spectrum of a recording, in dB of full scale");
-  app->add_option("RECORDING", command->path, "SigMF recording (either file, or their common name) or raw file")
-      ->required();
-  app->add_option("--fft", command->settings.fft_size, "FFT size N, 16 to 2^27 (default 4096, or less if it must fit)")
+  CLI::App *app = program.add_subcommand("spectrum", "Averaged power spectrum of recordings, in dB of full scale");
+  app->footer(
+      "A full-scale tone on a bin reads 0 dBFS with every window. Captures of one frequency are averaged; of several "
+      "frequencies, the one that most samples have is taken.");
+  add_inputs(*app, command->inputs);
+  add_spectrum_options(*app, command->spectrum);
+  app->add_flag("--hold", command->hold, "Also keep the highest and the lowest segment of each bin");
+  app->add_option("--peaks", command->peaks, "Show so many of the highest peaks (default 1)")
       ->option_text("N")
-      ->check(CLI::Range(16, 1 << 27));
-  const std::map<std::string, lumra::window> windows{{"none", lumra::window::none},
-                                                     {"flattop", lumra::window::flat_top}};
-  app->add_option("--window", command->settings.window, "none or flattop (default)")
-      ->option_text("NAME")
-      ->transform(CLI::Transformer(windows))
-      ->transform(CLI::IsMember(windows));
-  app->add_option("--overlap", command->settings.overlap_percent, "Overlap of the segments (default 50)")
-      ->option_text("PERCENT")
-      ->check(number_where("at least 0 and below 100", [](double value) { return value >= 0 && value < 100; }));
-  app->add_option("--csv", command->csv, "Write frequency and level of every bin")->option_text("FILE");
-  app->add_option("--plot", command->plot, "Draw the spectrum")->option_text("FILE.png|.svg");
-  add_recording_options(*app, command->options);
-  // Tests alone use this option: how much is read at a time must not change the result.
-  app->add_option("--block", command->settings.block)->group("")->check(CLI::Range(1, 1 << 27));
-  app->callback([command, &work] { work = [command] { return run(*command); }; });
+      ->transform(whole_number(0, 1000000));
+  auto *span = app->add_option("--span", command->span_hz, "Show and write this width alone, around the centre")
+                   ->option_text("HZ")
+                   ->transform(positive_number());
+  app->add_option("--center", command->centre_hz, "Centre of the span (default: that of the recording)")
+      ->option_text("HZ")
+      ->transform(any_number())
+      ->needs(span);
+  auto *every = app->add_option("--every", command->every_s,
+                                "Write one JSON object for each interval, as soon as it is over, for streams")
+                    ->option_text("SECONDS")
+                    ->transform(positive_number());
+  add_outputs(*app, command->outputs, {"Write frequency and level of every bin", "Draw the spectrum"});
+  every->needs("--json")->excludes("--csv")->excludes("--plot")->excludes("--hold");
+  app->callback([command, &work] {
+    if (command->every_s > 0 && command->inputs.paths.size() > 1)
+      throw wrong_usage("--every: takes one recording, not {}", command->inputs.paths.size());
+    work = [command] { return run(*command); };
+  });
 }
 
 }  // namespace tool

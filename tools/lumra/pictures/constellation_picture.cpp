@@ -25,14 +25,6 @@ std::string rows_of(const std::vector<std::complex<double>> &points, double grid
   return rows;
 }
 
-/// 1, 2 or 5 times a power of ten, such that the axis has four to ten marks on either side of zero.
-double mark_distance(double limit) {
-  const double decade = std::pow(10, std::floor(std::log10(limit / 4)));
-  for (const double step : {5.0, 2.0})
-    if (limit / 4 >= step * decade) return step * decade;
-  return decade;
-}
-
 }  // namespace
 
 constellation::constellation(std::uint64_t samples) noexcept
@@ -66,7 +58,6 @@ std::string constellation_script(const constellation &points, const std::string 
   const std::string measured = rows_of(points.measured(), grid, drawn);
   const std::string reference = rows_of(points.reference(), grid, distinct);
   const bool symbols = distinct <= most_symbols;
-  const bool png = type == picture_type::png;
   // Few points may be large; many must leave their density visible.
   const double point_size = drawn < 500 ? 0.6 : drawn < 5000 ? 0.35 : 0.22;
   const std::string measured_plot =
@@ -76,23 +67,19 @@ std::string constellation_script(const constellation &points, const std::string 
                   symbols ? 2.0 : 0.8);
   const std::string share =
       points.is_partial() ? fmt::format("{} of {} samples drawn", points.measured().size(), points.samples()) : "";
-  return picture_preamble(type, {900, 960}) +
+  const double division = mark_distance(limit, 4);
+  const picture_frame frame{{900, 960},
+                            title,
+                            with_minus_signs(figures),
+                            {"In phase (reference RMS = 1)", -limit, limit, division},
+                            {"Quadrature (reference RMS = 1)", -limit, limit, division}};
+  return frame_script(frame, type) +
          fmt::format(
-             "set title {} noenhanced offset 0,1.6 font '{}'\n"
-             "set label 1 {} at graph 0.5,1.025 center noenhanced tc rgb '#505050'\n"
              "set label 2 {} at graph 1,-0.108 right noenhanced tc rgb '#505050'\n"
-             "set tmargin 5\nset rmargin 3\nset lmargin 9\nset bmargin 5.5\n"
-             "set size ratio -1\nset border lw 1 lc rgb '#404040'\n"
-             "set xlabel 'In phase (reference RMS = 1)' offset 0,-0.3\n"
-             "set ylabel 'Quadrature (reference RMS = 1)' offset -0.5,0\n"
-             "set xrange [{}:{}]\nset yrange [{}:{}]\nset xtics {}\nset ytics {}\nset mxtics 2\nset mytics 2\n"
-             "set tics scale 0.8,0.4\nset minussign\nset format x '%h'\nset format y '%h'\n"
-             "set grid xtics ytics mxtics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
+             "set rmargin 3\nset lmargin 9\nset bmargin 5.5\nset size ratio -1\nset mxtics 2\n"
              "set xzeroaxis lt 1 lw 1 lc rgb '#909090'\nset yzeroaxis lt 1 lw 1 lc rgb '#909090'\n"
              "set key at graph 0,-0.095 left top horizontal Left reverse samplen 1 width 2\n",
-             gnuplot_text(title), png ? "DejaVu Sans:Bold,14" : "sans-serif,20",
-             gnuplot_text(with_minus_signs(figures)), gnuplot_text(share), -limit, limit, -limit, limit,
-             mark_distance(limit), mark_distance(limit)) +
+             gnuplot_text(share)) +
          fmt::format(
              "$measured << end_of_measured\n{}end_of_measured\n"
              "$reference << end_of_reference\n{}end_of_reference\n"

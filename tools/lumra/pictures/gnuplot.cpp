@@ -8,10 +8,14 @@
 #include <unistd.h>
 
 #include <array>
+#include <cctype>
 #include <cerrno>
+#include <cmath>
 #include <cstdlib>
+#include <iterator>
 
 #include "recording/file.hpp"
+#include "terminal/console.hpp"
 #include "terminal/failure.hpp"
 
 namespace tool {
@@ -76,40 +80,98 @@ bool is_complete(int picture, picture_type type) {
   const ssize_t got = ::pread(reader.get(), tail.data(), tail.size(), size - static_cast<off_t>(tail.size()));
   if (got < static_cast<ssize_t>(tail.size())) return false;
   const std::string_view text(tail.data(), tail.size());
-  return type == picture_type::png ? text.ends_with(png_end) : text.find(svg_end) != std::string_view::npos;
+  switch (type) {
+    case picture_type::png:
+      return text.ends_with(png_end);
+    case picture_type::svg:
+      return text.find(svg_end) != std::string_view::npos;
+    case picture_type::pdf:
+      return text.find("%%EOF") != std::string_view::npos;
+  }
+  return false;
 }
 
 }  // namespace
 
 picture_type picture_type_of(const std::filesystem::path &file) {
   const std::filesystem::path suffix = file.extension();
-  if (suffix != ".png" && suffix != ".svg")
-    throw failure("{}: pictures are written as .png or .svg; choose one of these endings", file.string());
+  const picture_type *found = nullptr;
+  static constexpr std::pair<const char *, picture_type> types[] = {
+      {".png", picture_type::png}, {".svg", picture_type::svg}, {".pdf", picture_type::pdf}};
+  for (const auto &[name, type] : types)
+    if (suffix == name) found = &type;
+  if (!found)
+    throw failure("{}: pictures are written as .png, .svg or .pdf; choose one of these endings", file.string());
   if (!is_installed()) throw failure("gnuplot was not found; install it (package gnuplot-nox), or leave out --plot");
-  return suffix == ".png" ? picture_type::png : picture_type::svg;
+  return *found;
 }
 
-std::string picture_preamble(picture_type type, picture_size size) {
-  const bool png = type == picture_type::png;
+std::string frame_script(const picture_frame &frame, picture_type type) {
+  // Long lines become smaller: a character is so many pixels wide, roughly.
+  const auto shrink = [&](const std::string &line, double pixels) {
+    const auto characters = static_cast<double>(std::max<std::size_t>(width_of(line), 1));
+    return std::min(1.0, frame.size.width / pixels / characters);
+  };
+  const bool svg = type == picture_type::svg;
+  const std::string terminal =
+      svg ? fmt::format("svg dynamic size {},{} font 'sans-serif,16'", frame.size.width, frame.size.height)
+      : type == picture_type::png
+          ? fmt::format("pngcairo size {},{} font 'DejaVu Sans,12'", frame.size.width, frame.size.height)
+          : fmt::format("pdfcairo size {},{} font 'DejaVu Sans,12'", frame.size.width / 100.0,
+                        frame.size.height / 100.0);
   return fmt::format(
       "set encoding utf8\n"
-      "set terminal {} size {},{} font '{}' background rgb 'white'\n",
-      png ? "pngcairo" : "svg dynamic", size.width, size.height, png ? "DejaVu Sans,12" : "sans-serif,16");
+      "set terminal {} background rgb 'white'\n"
+      "set title {} noenhanced offset 0,1.6 font '{},{:.1f}'\n"
+      "set label 1 {} at graph 0.5,screen 1 center offset 0,-3.1 noenhanced tc rgb '#505050' font ',{:.1f}'\n"
+      "set tmargin 5\nset rmargin 4\nset lmargin 10\nset bmargin 4.2\n"
+      "set border lw 1 lc rgb '#404040'\n"
+      "set xlabel {} noenhanced offset 0,-0.3\nset ylabel {} noenhanced offset -0.5,0\n"
+      "set xrange [{:.15g}:{:.15g}]\nset yrange [{:.15g}:{:.15g}]\n"
+      "set xtics {:.15g}\nset ytics {:.15g}\nset mytics 2\nset tics scale 0.8,0.4\n"
+      "set minussign\nset format x '%.10h'\nset format y '%.10h'\n"
+      "set grid xtics ytics mytics lt 1 lw 0.8 lc rgb '#d4d4d4', lt 1 lw 0.6 lc rgb '#eeeeee'\n"
+      "unset key\n",
+      terminal, gnuplot_text(frame.title), svg ? "sans-serif:Bold" : "DejaVu Sans:Bold",
+      (svg ? 20 : 14) * shrink(frame.title, 10.5), gnuplot_text(frame.settings),
+      (svg ? 16 : 12) * shrink(frame.settings, 8.4), gnuplot_text(frame.x.title), gnuplot_text(frame.y.title),
+      frame.x.low, frame.x.high, frame.y.low, frame.y.high, frame.x.division, frame.y.division);
+}
+
+std::string empty_script(const picture_frame &frame, const std::string &reason, picture_type type) {
+  return frame_script(frame, type) +
+         fmt::format("set label 2 {} at graph 0.5,0.5 center noenhanced front tc rgb '#b02020'\nplot NaN notitle\n",
+                     gnuplot_text(reason));
+}
+
+double mark_distance(double length, int marks) {
+  const double decade = std::pow(10, std::floor(std::log10(length / marks)));
+  for (const double step : {5.0, 2.0})
+    if (length / marks >= step * decade) return step * decade;
+  return decade;
+}
+
+const char *curve_colour(std::size_t curve) {
+  constexpr const char *colours[] = {"#1f4e8c", "#c0501a", "#2a7f3f", "#7a3fa0", "#9a7d00", "#00818f"};
+  return colours[curve % std::size(colours)];
 }
 
 std::string gnuplot_text(std::string_view text) {
-  std::string result = "'";
+  std::string result = "\"";
   while (!text.empty()) {
     const std::size_t length = sequence_length(text);
+    const char first = text.front();
     if (length == 0)
       result += '?';
-    else if (text.front() == '\'')
-      result += "''";
+    else if (first == '"' || first == '\\')
+      result += std::string("\\") + first;
+    else if (first == '`')  // would run a command; by its number it is a character, which ends where the string does
+      result += "\\140\" . \"";
     else
       result += text.substr(0, length);
     text.remove_prefix(std::max<std::size_t>(length, 1));
   }
-  return result + "'";
+  return result + '"';
 }
 
 std::string with_minus_signs(std::string text) {

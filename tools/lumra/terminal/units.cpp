@@ -15,6 +15,13 @@ int decimals(double resolution, const frequency_unit &unit) {
 
 }  // namespace
 
+time_unit time_unit_for(double seconds) {
+  if (seconds >= 1) return {1, "s"};
+  if (seconds >= 1e-3) return {1e-3, "ms"};
+  if (seconds >= 1e-6) return {1e-6, "µs"};
+  return {1e-9, "ns"};
+}
+
 frequency_unit unit_for(double hertz) {
   const double size = std::abs(hertz);
   if (size >= 1e9) return {1e9, "GHz"};
@@ -26,10 +33,6 @@ frequency_unit unit_for(double hertz) {
 std::string frequency_text(double hertz, double resolution) {
   const frequency_unit unit = unit_for(hertz == 0 ? resolution : hertz);
   return fmt::format("{:.{}f} {}", hertz / unit.hertz, decimals(resolution, unit), unit.name);
-}
-
-std::string offset_text(double hertz, double resolution, const frequency_unit &unit) {
-  return fmt::format("{:+.{}f} {}", hertz / unit.hertz, decimals(resolution, unit), unit.name);
 }
 
 std::string exact_text(double hertz) {

@@ -1,4 +1,4 @@
-// Frequencies as people write them. SPDX-License-Identifier: MIT
+// Frequencies and times as people write them. SPDX-License-Identifier: MIT
 #pragma once
 
 #include <string>
@@ -10,14 +10,19 @@ struct frequency_unit {
   const char *name;
 };
 
+struct time_unit {
+  double seconds;
+  const char *name;
+};
+
+/// The unit in which this time has one to three digits before the point, at most seconds.
+time_unit time_unit_for(double seconds);
+
 /// The unit in which this frequency has one to three digits before the point.
 frequency_unit unit_for(double hertz);
 
 /// Frequency in its own unit with the digits that a resolution is worth: "5.925123 GHz".
 std::string frequency_text(double hertz, double resolution);
-
-/// The same with a sign, in the unit given.
-std::string offset_text(double hertz, double resolution, const frequency_unit &unit);
 
 /// Shortest exact text in its own unit: "10 MHz".
 std::string exact_text(double hertz);
