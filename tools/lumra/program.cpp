@@ -77,6 +77,7 @@ int run(int count, const char *const *arguments) {
   add_level(program, work);
   add_evm(program, work);
   add_resample(program, work);
+  add_convert(program, work);
   std::string name;
   const auto refuse = [&](const std::string &reason) {
     report(fmt::format("{}; see lumra {}--help", reason, name));
