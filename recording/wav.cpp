@@ -121,9 +121,9 @@ std::optional<source> open_wav(const fs::path &path, const options &said) {
 
 sample_format wav_format(const sample_format &of) {
   sample_format result{of.type, of.is_complex, false};
-  if (of.type == component::i8) result.type = component::u8;
-  if (of.type == component::u16) result.type = component::i16;
-  if (of.type == component::u32) result.type = component::i32;
+  if (of.type == component::i8) result.type = component::i16;
+  if (of.type == component::u16) result.type = component::i32;
+  if (of.type == component::u32) result.type = component::f64;
   return result;
 }
 
@@ -135,7 +135,8 @@ struct wav_writer::file {
   sound opened;
 };
 
-wav_writer::wav_writer(int descriptor, std::string name, const sample_format &format, double rate)
+wav_writer::wav_writer(int descriptor, std::string name, const sample_format &format, double rate,
+                       std::uint64_t samples)
     : name_(std::move(name)), file_(std::make_unique<file>()) {
   if (rate != std::round(rate) || !(rate <= std::numeric_limits<int>::max()))
     throw failure("{}: a WAV file has a whole number of samples a second, not {}; write SigMF, or resample", name_,
@@ -143,9 +144,12 @@ wav_writer::wav_writer(int descriptor, std::string name, const sample_format &fo
   SF_INFO info{};
   info.samplerate = static_cast<int>(rate);
   info.channels = static_cast<int>(format.components());
-  info.format = SF_FORMAT_RF64 | subtype_of(format.type);
+  // Sizes in a plain header have 32 bits; a little of that is the header's own.
+  constexpr std::uint64_t largest_plain = 0xFFFF0000;
+  info.format = (samples <= largest_plain / format.bytes() ? SF_FORMAT_WAV : SF_FORMAT_RF64) | subtype_of(format.type);
+  errno = 0;
   file_->opened.reset(sf_open_fd(descriptor, SFM_WRITE, &info, SF_FALSE));
-  if (!file_->opened) throw failure("cannot write {}: {}", name_, sf_strerror(nullptr));
+  if (!file_->opened) refuse(sf_strerror(nullptr));
   (void)sf_command(file_->opened.get(), SFC_RF64_AUTO_DOWNGRADE, nullptr, SF_TRUE);
 }
 
@@ -154,15 +158,16 @@ wav_writer::~wav_writer() = default;
 void wav_writer::write(std::span<const std::byte> bytes) {
   errno = 0;
   const auto count = static_cast<sf_count_t>(bytes.size());
-  if (sf_write_raw(file_->opened.get(), bytes.data(), count) != count)
-    throw failure("cannot write {}: {}", name_,
-                  errno != 0 ? system_reason(errno) : std::string(sf_strerror(file_->opened.get())));
+  if (sf_write_raw(file_->opened.get(), bytes.data(), count) != count) refuse(sf_strerror(file_->opened.get()));
 }
 
 void wav_writer::finish() {
   errno = 0;
-  if (const int code = sf_close(file_->opened.release()); code != 0)
-    throw failure("cannot write {}: {}", name_, errno != 0 ? system_reason(errno) : sf_error_number(code));
+  if (const int code = sf_close(file_->opened.release()); code != 0) refuse(sf_error_number(code));
+}
+
+void wav_writer::refuse(const char *reason) const {
+  throw failure("cannot write {}: {}", name_, errno != 0 ? system_reason(errno) : reason);
 }
 
 }  // namespace recording

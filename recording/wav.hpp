@@ -19,18 +19,19 @@ std::optional<source> open_wav(const std::filesystem::path &path, const options 
 
 bool has_wav_suffix(const std::filesystem::path &path);
 
-/// The type in which WAV files hold samples of a type: eight bits unsigned, more of them signed, little-endian.
+/// The smallest type of WAV files, little-endian, from which the samples of a type come back as they were. Integers of
+/// eight bits are unsigned there, wider ones signed.
 sample_format wav_format(const sample_format &of);
 /// What WAV files call it.
 std::string wav_datatype(const sample_format &format);
 
-/// Writes a WAV file to an open file that can be both written and positioned. Its header is that of RF64 where it needs
-/// to be.
+/// Writes a WAV file to an open file that can be both written and positioned.
 class wav_writer final : public byte_sink {
  public:
-  /// The format is one of wav_format, the descriptor outlives the writer. Throws failure, also where the rate is no
-  /// whole number. `name` is the file's, for messages.
-  wav_writer(int descriptor, std::string name, const sample_format &format, double rate);
+  /// The format is one of wav_format, the descriptor outlives the writer; `name` is the file's, for messages. What may
+  /// become larger than a plain file can, or is endless, gets the header of RF64. Throws failure, also where the rate is
+  /// no whole number.
+  wav_writer(int descriptor, std::string name, const sample_format &format, double rate, std::uint64_t samples);
   wav_writer(const wav_writer &) = delete;
   wav_writer &operator=(const wav_writer &) = delete;
   ~wav_writer();
@@ -42,6 +43,9 @@ class wav_writer final : public byte_sink {
 
  private:
   struct file;
+
+  /// Throws failure with what the system said last, or else this.
+  [[noreturn]] void refuse(const char *reason) const;
 
   std::string name_;
   std::unique_ptr<file> file_;

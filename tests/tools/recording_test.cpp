@@ -249,12 +249,13 @@ TEST_F(Recording, EveryKindOfFileHoldsTheSameSamples) {
     recording::sample_encoder to_archive(members, ci16);
     to_archive.write(expected);
     members.finish();
-    recording::wav_writer sound(wav.descriptor(), "y.wav", ci16, 1000);
+    recording::wav_writer sound(wav.descriptor(), "y.wav", ci16, 1000, expected.size());
     recording::sample_encoder to_wav(sound, ci16);
     to_wav.write(expected);
     sound.finish();
-    EXPECT_NE(std::string::npos,
-              refusal([&] { recording::wav_writer(wide.descriptor(), "wide.wav", ci16, 0.5); }).find("whole number"));
+    EXPECT_NE(std::string::npos, refusal([&] {
+                                   recording::wav_writer(wide.descriptor(), "wide.wav", ci16, 0.5, 1);
+                                 }).find("whole number"));
   }
   // Other programs put the data first, and compress.
   const std::string shell =

@@ -82,7 +82,7 @@ json metadata_of(const recording::source &source, std::uint64_t samples, const s
 conversion write_wav(const recording::source &source, recording::sample_format format, output_file &file,
                      const std::string &name) {
   format = recording::wav_format(format);
-  recording::wav_writer writer(file.descriptor(), name, format, source.rate);
+  recording::wav_writer writer(file.descriptor(), name, format, source.rate, source.chosen_samples);
   recording::sample_encoder encoder(writer, format);
   const std::uint64_t samples = copy(source, encoder, format.is_complex);
   writer.finish();
