@@ -32,7 +32,11 @@ constexpr double carrier_level = -18;       // dBFS, mean power
 constexpr double carrier_offset = -5.5e6;   // Hz from the centre
 constexpr double tone_level = -66, tone_offset = 4.3e6;
 constexpr double burst_level = -38, burst_offset = 9.9e6;  // level while it is on
-constexpr double burst_symbol_rate = 1.28e6;               // Hz: 24 samples a symbol
+constexpr double burst_symbol_rate = 1.28e6;               // Hz
+constexpr auto samples_per_symbol = static_cast<std::size_t>(sample_rate / burst_symbol_rate);
+constexpr auto burst_period = static_cast<std::size_t>(sample_rate / 100), burst_length = burst_period / 10;
+constexpr double subcarrier_spacing = 15e3;  // Hz
+constexpr std::size_t subcarriers = 600;
 
 double power_of(double decibels) {
   return std::pow(10, decibels / 10);
@@ -47,7 +51,8 @@ sample rotation(double frequency, std::size_t n) {
 
 /// 600 subcarriers of 15 kHz with 64-QAM, guard intervals, and symbols that fade into each other.
 void add_ofdm(std::span<sample> out, std::mt19937 &random) {
-  constexpr std::size_t size = 2048, used = 600, guard = 144, ramp = 64;
+  constexpr std::size_t size = 2048, used = subcarriers, guard = 144, ramp = 64;
+  static_assert(size * subcarrier_spacing == sample_rate);
   std::uniform_int_distribution<int> level(0, 7);
   // Two paths 130 ns apart give the carrier the tilt and dip of a real channel.
   const auto channel = [](double frequency) {
@@ -76,18 +81,26 @@ void add_ofdm(std::span<sample> out, std::mt19937 &random) {
   }
 }
 
+/// The first samples of all bursts that end in so many samples.
+std::vector<std::size_t> bursts_in(std::size_t samples) {
+  std::vector<std::size_t> starts;
+  for (std::size_t start = burst_period / 3; start + burst_length + 2 * samples_per_symbol < samples;
+       start += burst_period)
+    starts.push_back(start);
+  return starts;
+}
+
 /// QPSK with Hann-shaped pulses, one millisecond in every ten.
 void add_bursts(std::span<sample> out, std::mt19937 &random) {
-  constexpr auto per_symbol = static_cast<std::size_t>(sample_rate / burst_symbol_rate);
-  constexpr auto period = static_cast<std::size_t>(sample_rate / 100), on = period / 10;
   const auto amplitude = static_cast<float>(std::sqrt(power_of(burst_level)));
   std::uniform_int_distribution<int> quadrant(0, 3);
-  for (std::size_t burst = period / 3; burst + on + 2 * per_symbol < out.size(); burst += period)
-    for (std::size_t start = burst; start < burst + on; start += per_symbol) {
+  for (const std::size_t burst : bursts_in(out.size()))
+    for (std::size_t start = burst; start < burst + burst_length; start += samples_per_symbol) {
       const sample point =
           amplitude * std::polar(1.0F, static_cast<float>(std::numbers::pi / 4 * (2 * quadrant(random) + 1)));
-      for (std::size_t n = 0; n < 2 * per_symbol; ++n) {
-        const double x = std::sin(std::numbers::pi * static_cast<double>(n) / static_cast<double>(2 * per_symbol));
+      for (std::size_t n = 0; n < 2 * samples_per_symbol; ++n) {
+        const double x =
+            std::sin(std::numbers::pi * static_cast<double>(n) / static_cast<double>(2 * samples_per_symbol));
         out[start + n] += point * static_cast<float>(x * x) * rotation(burst_offset, start + n);
       }
     }
@@ -104,6 +117,24 @@ double measured_level(lumra::session &session, const lumra::host_array<sample> &
   return 10 * std::log10(sum / (double{size} * size));
 }
 
+nlohmann::json annotation(std::size_t start, std::size_t samples, double centre, double width, const char *label) {
+  return {{"core:sample_start", start},
+          {"core:sample_count", samples},
+          {"core:freq_lower_edge", centre_frequency + centre - width / 2},
+          {"core:freq_upper_edge", centre_frequency + centre + width / 2},
+          {"core:label", label}};
+}
+
+/// What is where, in the order of the first samples.
+nlohmann::json annotations_of(std::size_t samples) {
+  nlohmann::json list = nlohmann::json::array();
+  list.push_back(annotation(0, samples, carrier_offset, (subcarriers + 1) * subcarrier_spacing, "OFDM"));
+  list.push_back(annotation(0, samples, tone_offset, 20e3, "tone"));
+  for (const std::size_t start : bursts_in(samples))
+    list.push_back(annotation(start, burst_length, burst_offset, 2 * burst_symbol_rate, "burst"));
+  return list;
+}
+
 void write_recording(const std::string &name, std::span<const sample> samples) {
   std::ofstream data(name + ".sigmf-data", std::ios::binary);
   for (const sample &x : samples)
@@ -112,13 +143,19 @@ void write_recording(const std::string &name, std::span<const sample> samples) {
       const char bytes[] = {static_cast<char>(value & 0xFF), static_cast<char>(value >> 8)};
       data.write(bytes, sizeof bytes);
     }
+  // The second capture continues the first: its time says so.
+  const nlohmann::json captures = {
+      {{"core:sample_start", 0}, {"core:frequency", centre_frequency}, {"core:datetime", "2024-05-06T07:08:09.000Z"}},
+      {{"core:sample_start", samples.size() / 2},
+       {"core:frequency", centre_frequency},
+       {"core:datetime", "2024-05-06T07:08:09.050Z"}}};
   const nlohmann::json meta = {{"global",
                                 {{"core:datatype", "ci16_le"},
                                  {"core:sample_rate", sample_rate},
-                                 {"core:version", "1.0.0"},
+                                 {"core:version", "1.2.0"},
                                  {"core:description", "Synthetic: OFDM carrier, weak tone and burst over noise"}}},
-                               {"captures", {{{"core:sample_start", 0}, {"core:frequency", centre_frequency}}}},
-                               {"annotations", nlohmann::json::array()}};
+                               {"captures", captures},
+                               {"annotations", annotations_of(samples.size())}};
   std::ofstream text(name + ".sigmf-meta");
   text << meta.dump(2) << '\n';
   if (!data.flush() || !text.flush()) throw std::runtime_error("cannot write " + name + ".sigmf-data and -meta");
