@@ -74,6 +74,7 @@ std::size_t sequential_reader::fill(std::span<std::byte> to) {
 }
 
 std::size_t sequential_reader::read(std::uint64_t offset, std::span<std::byte> to) {
+  if (offset < position_) throw failure("samples that come once were to be read again; save them to a file first");
   std::vector<std::byte> skipped(std::min<std::uint64_t>(offset - position_, std::uint64_t{1} << 16));
   while (position_ < offset) {
     const auto count = std::min<std::uint64_t>(offset - position_, skipped.size());

@@ -21,7 +21,7 @@ class byte_reader {
 /// The bytes of a file from `begin` on, in any order.
 std::unique_ptr<byte_reader> read_file(const std::filesystem::path &file, std::uint64_t begin = 0);
 
-/// Bytes that come one after the other: skips those that are not asked for.
+/// Bytes that come one after the other: skips those that are not asked for, and fails when asked to go back.
 class sequential_reader : public byte_reader {
  public:
   std::size_t read(std::uint64_t offset, std::span<std::byte> to) final;

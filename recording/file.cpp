@@ -20,7 +20,8 @@ std::uint64_t readable_size(const fs::path &file) {
   const fs::file_status status = fs::status(file, error);
   if (!fs::exists(status)) throw failure("{}: {}", file.string(), error ? error.message() : "no such file");
   if (!fs::is_regular_file(status))
-    throw failure("{}: not a regular file; save the samples to a file first", file.string());
+    throw failure("{}: not a regular file; save the samples to one, or give them on the standard input (-)",
+                  file.string());
   const std::uint64_t size = fs::file_size(file, error);
   if (!error && ::access(file.c_str(), R_OK) != 0) error = {errno, std::generic_category()};
   if (error) throw failure("{}: {}", file.string(), error.message());

@@ -17,6 +17,13 @@ using nlohmann::json;
 
 /// One frame must fit in memory; no receiver has as many.
 constexpr std::uint64_t most_channels = 4096;
+/// One mistake may be made in every one of a million items.
+constexpr std::size_t most_faults = 100;
+
+void add_fault(source &result, std::string sentence) {
+  if (result.faults.size() < most_faults) result.faults.push_back(std::move(sentence));
+  if (result.faults.size() == most_faults) result.faults.back() = "there are more faults than are listed";
+}
 
 void read_captures(source &result, const std::string &where, std::vector<std::uint64_t> &headers) {
   const auto list = result.metadata->find("captures");
@@ -40,12 +47,12 @@ void read_captures(source &result, const std::string &where, std::vector<std::ui
       read.time = given.text("core:datetime").value_or("");
       read.begin = parse_date_time(read.time);
       if (!read.time.empty() && !read.begin)
-        result.faults.push_back(fmt::format(
-            "capture {}: core:datetime '{}' is no time such as 2024-05-06T07:08:09.123Z", number, read.time));
+        add_fault(result, fmt::format("capture {}: core:datetime '{}' is no time such as 2024-05-06T07:08:09.123Z",
+                                      number, read.time));
       result.captures.push_back(std::move(read));
     }
   if (!result.captures.empty()) return;
-  result.faults.emplace_back("there are no captures, so all samples are taken as one");
+  add_fault(result, "there are no captures, so all samples are taken as one");
   result.captures.emplace_back();
   headers.push_back(0);
 }
@@ -72,11 +79,10 @@ void locate(source &result, const std::vector<std::uint64_t> &headers, std::uint
   }
   result.samples = result.captures.back().start + result.captures.back().samples;
   if (const std::uint64_t first = result.captures.front().start; first > 0)
-    result.faults.push_back(
-        fmt::format("{} samples in front of the first capture belong to none and are left out", first));
+    add_fault(result, fmt::format("{} samples in front of the first capture belong to none and are left out", first));
   for (std::size_t i = 1; i < result.captures.size(); ++i)
     if (result.captures[i].start == result.captures[i - 1].start)
-      result.faults.push_back(fmt::format("capture {} holds no samples", i - 1));
+      add_fault(result, fmt::format("capture {} holds no samples", i - 1));
 }
 
 annotation read_annotation(const json &item, const std::string &name) {
@@ -100,7 +106,7 @@ void read_annotations(source &result) {
   const auto list = result.metadata->find("annotations");
   if (list == result.metadata->end()) return;
   if (!list->is_array()) {
-    result.faults.emplace_back("annotations is not a list");
+    add_fault(result, "annotations is not a list");
     return;
   }
   for (std::size_t i = 0; i < list->size(); ++i) {
@@ -111,10 +117,10 @@ void read_annotations(source &result) {
       read.start -= result.first_index;
       read.item = i;
       if (read.start + read.samples.value_or(0) > result.samples)
-        result.faults.push_back(name + " reaches beyond the last sample");
+        add_fault(result, name + " reaches beyond the last sample");
       result.annotations.push_back(std::move(read));
     } catch (const failure &reason) {
-      result.faults.push_back(fmt::format("{}; it is left out", reason.what()));
+      add_fault(result, fmt::format("{}; it is left out", reason.what()));
     }
   }
 }
@@ -156,9 +162,9 @@ void describe(source &result, std::shared_ptr<const json> metadata, const std::s
   if (result.channels == 0 || result.channels > most_channels)
     throw failure("{}: core:num_channels must be from 1 to {}", where, most_channels);
   try {
-    if (!global.text("core:version")) result.faults.emplace_back("core:version is missing");
+    if (!global.text("core:version")) add_fault(result, "core:version is missing");
   } catch (const failure &) {
-    result.faults.emplace_back("core:version is not a text");
+    add_fault(result, "core:version is not a text");
   }
 
   const std::uint64_t trailing = global.count("core:trailing_bytes").value_or(0);

@@ -46,7 +46,7 @@ struct annotation {
 /// Samples that an analysis may run over: no two of them have a gap or a new frequency between them.
 struct stretch {
   std::uint64_t first = 0;
-  std::uint64_t samples = 0;        // or endless
+  std::uint64_t samples = 0;        // or endless; of an endless input that was cut, at most so many
   std::optional<double> frequency;  // centre in hertz, where known
   std::size_t capture = 0;          // index of the first capture it has samples of
 };
