@@ -288,7 +288,7 @@ TEST_F(Recording, EveryKindOfFileHoldsTheSameSamples) {
                                                                     {"two.tar", "several recordings"},
                                                                     {"none.tar", "no .sigmf-meta"},
                                                                     {"alone.tar", "holds no x.sigmf-data"}}) {
-    const std::string said = refusal([&] { samples_of(open(name)); });
+    const std::string said = refusal([&, file = name] { samples_of(open(file)); });
     EXPECT_NE(std::string::npos, said.find(says)) << name << ": " << said;
   }
   fs::copy(folder_ / "x.ci16", folder_ / "x.wav");
