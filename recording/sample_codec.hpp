@@ -14,8 +14,8 @@ namespace recording {
 void decode(const sample_format &format, std::span<const std::byte> bytes, std::span<float> out);
 void decode(const sample_format &format, std::span<const std::byte> bytes, std::span<double> out);
 
-/// Converts components, none of which is NaN, to the nearest of the type, ties to even, and those beyond its ends to the
-/// ends; bytes holds exactly as many. Gives how many samples have a part that was beyond.
+/// Converts components, none of which is NaN, to the nearest of the type, ties to even, and those beyond its ends to
+/// the ends; bytes holds exactly as many. Gives how many samples have a part that was beyond.
 std::uint64_t encode(const sample_format &format, std::span<const double> in, std::span<std::byte> bytes);
 
 /// How many samples have a part at an end of an integer type: a converter that gave them may have wanted more. None of

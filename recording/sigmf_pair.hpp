@@ -9,8 +9,8 @@
 
 namespace recording {
 
-/// Opens a recording by the name of either file, or by their common name. Gives nothing where the path is none of these;
-/// data without metadata are a raw file where the options say their type. Throws failure.
+/// Opens a recording by the name of either file, or by their common name. Gives nothing where the path is none of
+/// these; data without metadata are a raw file where the options say their type. Throws failure.
 std::optional<source> open_sigmf_pair(const std::filesystem::path &path, const options &said);
 
 }  // namespace recording

@@ -20,8 +20,8 @@ struct sigmf_files {
 /// BASE.sigmf-data and BASE.sigmf-meta.
 sigmf_files sigmf_files_of(const std::filesystem::path &base);
 
-/// The text of metadata, an object of objects and lists, each item of which becomes one line: its size does not depend on
-/// how deep it is nested. Texts may hold anything; what is not UTF-8 is replaced.
+/// The text of metadata, an object of objects and lists, each item of which becomes one line: its size does not depend
+/// on how deep it is nested. Texts may hold anything; what is not UTF-8 is replaced.
 std::string metadata_text(const nlohmann::json &metadata);
 
 /// Samples may be written piece by piece, metadata once; the sinks must outlive the writer.

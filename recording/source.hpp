@@ -1,4 +1,5 @@
-// A recording that can be read: what it holds, how fast, around which frequency, and where. SPDX-License-Identifier: MIT
+// A recording that can be read: what it holds, how fast, around which frequency, and where.
+// SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstdint>

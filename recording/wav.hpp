@@ -29,8 +29,8 @@ std::string wav_datatype(const sample_format &format);
 class wav_writer final : public byte_sink {
  public:
   /// The format is one of wav_format, the descriptor outlives the writer; `name` is the file's, for messages. What may
-  /// become larger than a plain file can, or is endless, gets the header of RF64. Throws failure, also where the rate is
-  /// no whole number.
+  /// become larger than a plain file can, or is endless, gets the header of RF64. Throws failure, also where the rate
+  /// is no whole number.
   wav_writer(int descriptor, std::string name, const sample_format &format, double rate, std::uint64_t samples);
   wav_writer(const wav_writer &) = delete;
   wav_writer &operator=(const wav_writer &) = delete;

@@ -23,10 +23,12 @@ TEST_F(Info, TellsWhatIsInARecording) {
       R"({"start":10,"samples":10,"frequency_hz":null,"time":null}],"annotations":[{"start":2,"samples":null,)"
       R"("low_hz":-5.0,"high_hz":7.5,"label":"a\u001b[2J)"
       "\xC2\x9B\xE2\x80\xAE\xC2\xB5"
-      R"(","comment":""}],"faults":["annotation 1: core:sample_start must be a whole number from 0 to 2^52; it is left out"]})"
+      R"(","comment":""}],"faults":["annotation 1: core:sample_start must be a whole number from 0 to 2^52; )"
+      R"(it is left out"]})"
       "\n"
       R"({"path":"y.cu8","datatype":"cu8","sample_rate_hz":1000.0,"frequency_hz":null,"samples":15,"duration_s":0.015,)"
-      R"("channels":1,"captures":[{"start":0,"samples":15,"frequency_hz":null,"time":null}],"annotations":[],"faults":[]})"
+      R"("channels":1,"captures":[{"start":0,"samples":15,"frequency_hz":null,"time":null}],)"
+      R"("annotations":[],"faults":[]})"
       "\n",
       succeed(line + " --json -").out);
   EXPECT_EQ(

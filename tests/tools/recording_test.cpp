@@ -15,7 +15,7 @@
 #include "recording/open.hpp"
 #include "recording/sample_encoder.hpp"
 #include "recording/sample_reader.hpp"
-#include "recording/sigmf_archive.hpp"
+#include "recording/sigmf_archive_writer.hpp"
 #include "recording/wav.hpp"
 
 namespace tests {
@@ -383,7 +383,8 @@ TEST_F(Recording, WhatIsCutCarriesItsPartOfTheMetadata) {
                  "core:description": "x"},
       "captures": [{"core:sample_start": 0, "core:frequency": 1.0, "core:datetime": "2024-01-01T00:00:00.002000000Z"},
                    {"core:sample_start": 4, "core:frequency": 2.0, "x:y": 3}],
-      "annotations": [{"core:sample_start": 0, "core:sample_count": 2}, {"core:sample_start": 5, "core:label": "b"}]})");
+      "annotations": [{"core:sample_start": 0, "core:sample_count": 2},
+                      {"core:sample_start": 5, "core:label": "b"}]})");
   EXPECT_EQ(expected, recording::derived_metadata(source, cut));
 }
 

@@ -14,7 +14,7 @@
 #include "recording/open.hpp"
 #include "recording/sample_encoder.hpp"
 #include "recording/sample_reader.hpp"
-#include "recording/sigmf_archive.hpp"
+#include "recording/sigmf_archive_writer.hpp"
 #include "recording/sigmf_writer.hpp"
 #include "recording/wav.hpp"
 #include "terminal/failure.hpp"
