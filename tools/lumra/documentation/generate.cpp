@@ -77,6 +77,7 @@ std::string joined(const std::vector<std::string> &words) {
 
 std::string bash_completion(const described_command &program, const std::vector<described_command> &subcommands) {
   std::vector<std::string> names;
+  names.reserve(subcommands.size());
   for (const described_command &each : subcommands) names.push_back(each.name);
   std::string text =
       "# bash completion for lumra\n_lumra() {\n"

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cmath>
 #include <iterator>
+#include <limits>
 #include <utility>
 
 #include "terminal/units.hpp"
@@ -44,9 +45,11 @@ std::string ccdf_script(const std::string &title, const std::string &settings, c
   std::string plots = "plot ";
   const bool real = curves.front().is_real;
   script += "$gaussian << end_of_curve\n";
-  for (double above = 0; above <= right; above += 0.05)
-    if (const double share = gaussian_share(above, real); share >= bottom)
-      fmt::format_to(to, "{:.3f} {:.6g}\n", above, share);
+  constexpr int points_per_decibel = 20;
+  for (int k = 0; k <= right * points_per_decibel; ++k) {
+    const double above = static_cast<double>(k) / points_per_decibel, share = gaussian_share(above, real);
+    if (share >= bottom) fmt::format_to(to, "{:.3f} {:.6g}\n", above, share);
+  }
   script += "end_of_curve\n";
   for (std::size_t i = 0; i < curves.size(); ++i) {
     fmt::format_to(to, "$curve{} << end_of_curve\n", i);
@@ -62,7 +65,7 @@ std::string ccdf_script(const std::string &title, const std::string &settings, c
 
 std::string envelope_script(const std::string &title, const std::string &settings, const std::string &level_unit,
                             const std::vector<envelope_curve> &curves, picture_type type) {
-  double end = 0, highest = -INFINITY;
+  double end = 0, highest = -std::numeric_limits<double>::infinity();
   std::vector<double> levels;
   for (const envelope_curve &curve : curves) {
     end = std::max(end, curve.time_s.back());
