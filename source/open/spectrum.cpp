@@ -12,6 +12,7 @@
 #include "open/door.hpp"
 #include "open/element.hpp"
 #include "open/handle.hpp"
+#include "open/result.hpp"
 #include "open/state.hpp"
 #include "signal/spectrum_average.hpp"
 
@@ -100,7 +101,7 @@ bool alike(const lumra_spectrum_options &a, const lumra_spectrum_options &b) noe
          (a.window != LUMRA_WINDOW_KAISER || a.window_parameter == b.window_parameter);
 }
 
-lumra_spectrum_info info_of(const spectrum_object &object, std::uint32_t size) noexcept {
+lumra_spectrum_info info_of(const spectrum_object &object) noexcept {
   const lumra_spectrum_options &options = object.options;
   const auto points = static_cast<double>(options.points);
   const bool two_sided = is_complex(options.type);
@@ -109,7 +110,7 @@ lumra_spectrum_info info_of(const spectrum_object &object, std::uint32_t size) n
   const double first = options.centre_hz - spacing * static_cast<double>(below);
   return std::visit(
       [&](const auto &average) {
-        return lumra_spectrum_info{.size = size,
+        return lumra_spectrum_info{.size = sizeof(lumra_spectrum_info),
                                    .sides = two_sided ? 2 : 1,
                                    .points = options.points,
                                    .segments = average.segments(),
@@ -211,10 +212,8 @@ lumra_status lumra_spectrum_where(const lumra_spectrum_average *spectrum, lumra_
 lumra_status lumra_spectrum_get_options(const lumra_spectrum_average *spectrum, lumra_spectrum_options *options) {
   return enter(__func__, [&] {
     const spectrum_object &object = spectra::get(spectrum, "spectrum");
-    require_present(options, "options");
-    require(options->size == sizeof *options, LUMRA_BAD_SIZE_FIELD, "options->size is ", options->size, "; it is ",
-            std::uint64_t{sizeof *options});
-    *options = options_of(object);
+    require_sized(options, "options");
+    give_result(options, options_of(object));
   });
 }
 
@@ -222,9 +221,7 @@ lumra_status lumra_spectrum_read(const lumra_spectrum_average *spectrum, lumra_s
                                  double *maximum, double *minimum, uint64_t room) {
   return enter(__func__, [&] {
     const spectrum_object &object = spectra::get(spectrum, "spectrum");
-    require_present(info, "info");
-    require(info->size == sizeof *info, LUMRA_BAD_SIZE_FIELD, "info->size is ", info->size, "; it is ",
-            std::uint64_t{sizeof *info});
+    require_sized(info, "info");
     std::visit(
         [&](const auto &average) {
           require(room >= average.bins(), LUMRA_TOO_LITTLE_ROOM, "room is ", room, " bins; the spectrum has ",
@@ -241,7 +238,7 @@ lumra_status lumra_spectrum_read(const lumra_spectrum_average *spectrum, lumra_s
                   object.options.points, " samples in one run");
           (void)get(spectrum, "spectrum");
           average.read(mean, highest, lowest);
-          *info = info_of(object, info->size);
+          give_result(info, info_of(object));
         },
         object.average);
   });
