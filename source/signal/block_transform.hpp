@@ -3,16 +3,11 @@
 
 #include <complex>
 #include <cstddef>
-#include <type_traits>
 
 #include "signal/dfti_descriptor.hpp"
+#include "signal/sample_type.hpp"
 
 namespace dsp {
-
-template <class Sample>
-using real_of = decltype(std::real(Sample{}));
-template <class Sample>
-inline constexpr bool is_complex = !std::is_same_v<Sample, real_of<Sample>>;
 
 /// Transforms of one length, out of place and unscaled; those of real samples have the non-negative half of the bins.
 /// Making one takes as long as several of its transforms, so that a few short ones are kept for whoever is next. One

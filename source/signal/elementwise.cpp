@@ -18,17 +18,14 @@ namespace {
 using qsrfhs::kernels::active;
 using cf32 = std::complex<float>;
 
-template <class T>
-constexpr bool is_complex = !std::is_same_v<T, real_t<T>>;
-
 /// The parts of complex numbers, and real numbers themselves.
 template <class T>
-const real_t<T> *parts(std::span<const T> x) noexcept {
-  return reinterpret_cast<const real_t<T> *>(x.data());
+const real_of<T> *parts(std::span<const T> x) noexcept {
+  return reinterpret_cast<const real_of<T> *>(x.data());
 }
 template <class T>
-real_t<T> *parts(std::span<T> x) noexcept {
-  return reinterpret_cast<real_t<T> *>(x.data());
+real_of<T> *parts(std::span<T> x) noexcept {
+  return reinterpret_cast<real_of<T> *>(x.data());
 }
 
 /// The quotient of complex numbers a / b by r = 1 / |b|^2, into two reals.
@@ -49,7 +46,7 @@ void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexce
     const auto *const a = parts(x), *const b = parts(y);
     auto *const q = parts(out);
     for (std::size_t i = 0; i < 2 * out.size(); i += 2) {
-      const real_t<T> br = b[i], bi = b[i + 1];
+      const real_of<T> br = b[i], bi = b[i + 1];
       divide_one(a + i, br, bi, 1 / (br * br + bi * bi), q + i);
     }
   } else {
@@ -62,7 +59,7 @@ void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     active().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), out.size());
   } else if constexpr (is_complex<T>) {
-    const real_t<T> br = value.real(), bi = value.imag(), r = 1 / (br * br + bi * bi);
+    const real_of<T> br = value.real(), bi = value.imag(), r = 1 / (br * br + bi * bi);
     for (std::size_t i = 0; i < 2 * out.size(); i += 2) divide_one(parts(x) + i, br, bi, r, parts(out) + i);
   } else {
     for (std::size_t i = 0; i < out.size(); ++i) out[i] = x[i] / value;
@@ -70,15 +67,15 @@ void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept {
 }
 
 template <class T>
-void scale(std::span<const T> x, real_t<T> factor, std::span<T> out) noexcept {
-  const real_t<T> *const in = parts(x);
-  real_t<T> *const product = parts(out);
-  const std::size_t count = out.size_bytes() / sizeof(real_t<T>);
+void scale(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept {
+  const real_of<T> *const in = parts(x);
+  real_of<T> *const product = parts(out);
+  const std::size_t count = out.size_bytes() / sizeof(real_of<T>);
   for (std::size_t i = 0; i < count; ++i) product[i] = in[i] * factor;
 }
 
 template <class T>
-void magnitude(std::span<const T> x, std::span<real_t<T>> out) noexcept {
+void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     active().magnitude(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
@@ -91,7 +88,7 @@ void magnitude(std::span<const T> x, std::span<real_t<T>> out) noexcept {
 }
 
 template <class T>
-void power(std::span<const T> x, std::span<real_t<T>> out) noexcept {
+void power(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     active().magnitude_squared(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
@@ -119,7 +116,7 @@ void scale_logarithms(std::span<Real> x, Real a, Real b) noexcept {
 /// Runs work(piece of the input, piece of the output) and the logarithms of what it wrote, in pieces that stay in the
 /// first cache.
 template <class T, class Work>
-void log2_in_pieces(std::span<const T> x, real_t<T> a, real_t<T> b, std::span<real_t<T>> out, Work work) noexcept {
+void log2_in_pieces(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out, Work work) noexcept {
   constexpr std::size_t most = 1024;
   const qsrfhs::mkl_runtime::use in_use;
   for (std::size_t first = 0; first < out.size(); first += most) {
@@ -140,7 +137,7 @@ void log2(std::span<const T> x, T a, T b, std::span<T> out) noexcept {
 }
 
 template <class T>
-void log2_power(std::span<const T> x, real_t<T> a, real_t<T> b, std::span<real_t<T>> out) noexcept {
+void log2_power(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out) noexcept {
   if constexpr (is_complex<T>)
     log2_in_pieces(x, a, b, out, power<T>);
   else
@@ -154,7 +151,7 @@ constexpr std::size_t polynomial_block = 32;
 
 template <class T, class C>
 void polynomial_of_block(const T *x, std::span<const C> c, C *out, std::size_t n) noexcept {
-  using real = real_t<C>;
+  using real = real_of<C>;
   real xr[polynomial_block]{}, xi[polynomial_block]{}, re[polynomial_block], im[polynomial_block];
   const real *const in = parts(std::span<const T>(x, n));
   for (std::size_t i = 0; i < n; ++i) {
@@ -252,13 +249,13 @@ void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, 
   }
 }
 
-#define LUMRA_FOR_TYPE(T)                                                                            \
-  template void divide(std::span<const T>, std::span<const T>, std::span<T>) noexcept;               \
-  template void divide_by_value(std::span<const T>, T, std::span<T>) noexcept;                       \
-  template void scale(std::span<const T>, real_t<T>, std::span<T>) noexcept;                         \
-  template void magnitude(std::span<const T>, std::span<real_t<T>>) noexcept;                        \
-  template void power(std::span<const T>, std::span<real_t<T>>) noexcept;                            \
-  template void log2_power(std::span<const T>, real_t<T>, real_t<T>, std::span<real_t<T>>) noexcept; \
+#define LUMRA_FOR_TYPE(T)                                                                               \
+  template void divide(std::span<const T>, std::span<const T>, std::span<T>) noexcept;                  \
+  template void divide_by_value(std::span<const T>, T, std::span<T>) noexcept;                          \
+  template void scale(std::span<const T>, real_of<T>, std::span<T>) noexcept;                           \
+  template void magnitude(std::span<const T>, std::span<real_of<T>>) noexcept;                          \
+  template void power(std::span<const T>, std::span<real_of<T>>) noexcept;                              \
+  template void log2_power(std::span<const T>, real_of<T>, real_of<T>, std::span<real_of<T>>) noexcept; \
   template void polynomial(std::span<const T>, std::span<const T>, std::span<T>) noexcept;
 #define LUMRA_FOR_REAL_TYPE(T)                                                                                         \
   LUMRA_FOR_TYPE(T)                                                                                                    \

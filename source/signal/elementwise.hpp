@@ -7,19 +7,9 @@
 #include <cstdint>
 #include <span>
 
-namespace dsp {
+#include "signal/sample_type.hpp"
 
-template <class T>
-struct real_of {
-  using type = T;
-};
-template <class T>
-struct real_of<std::complex<T>> {
-  using type = T;
-};
-/// The type of a sample's magnitude.
-template <class T>
-using real_t = typename real_of<T>::type;
+namespace dsp {
 
 // T: float, double and complex numbers of them.
 
@@ -28,18 +18,18 @@ void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexce
 template <class T>
 void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept;
 template <class T>
-void scale(std::span<const T> x, real_t<T> factor, std::span<T> out) noexcept;
+void scale(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept;
 template <class T>
-void magnitude(std::span<const T> x, std::span<real_t<T>> out) noexcept;
+void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept;
 template <class T>
-void power(std::span<const T> x, std::span<real_t<T>> out) noexcept;
+void power(std::span<const T> x, std::span<real_of<T>> out) noexcept;
 
 /// out = a log2(x) + b for real T.
 template <class T>
 void log2(std::span<const T> x, T a, T b, std::span<T> out) noexcept;
 /// out = a log2(|x|^2) + b.
 template <class T>
-void log2_power(std::span<const T> x, real_t<T> a, real_t<T> b, std::span<real_t<T>> out) noexcept;
+void log2_power(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out) noexcept;
 
 /// The polynomial of at least one coefficient, c[0] first; x is of the type of C or of its real parts.
 template <class T, class C>

@@ -10,12 +10,11 @@
 #include "qsrfhs/math/mkl_memory.hpp"
 #include "qsrfhs/math/mkl_section.hpp"
 #include "signal/lapack.hpp"
+#include "signal/sample_type.hpp"
 
 namespace dsp {
 namespace {
 
-template <class T>
-constexpr bool is_complex = !std::is_floating_point_v<T>;
 template <class T>
 constexpr const char *adjoint = is_complex<T> ? "C" : "T";
 
