@@ -78,6 +78,11 @@ class dfti_descriptor {
     check(qsrfhs::mkl_memory::watched_status([&] { return DftiComputeForward(handle_.get(), data); }),
           dfti_step::forward);
   }
+  void forward(const void *in, void *out, const qsrfhs::mkl_section & /*around*/) const {
+    check(qsrfhs::mkl_memory::watched_status(
+              [&] { return DftiComputeForward(handle_.get(), const_cast<void *>(in), out); }),
+          dfti_step::forward);
+  }
   void backward(void *data) const {
     compute([&] { return DftiComputeBackward(handle_.get(), data); }, dfti_step::backward);
   }

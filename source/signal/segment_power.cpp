@@ -56,21 +56,22 @@ void segment_power<Sample>::begin(const Sample *x) noexcept {
 }
 
 template <class Sample>
-void segment_power<Sample>::finish(real *power, bool add, const Sample *next, std::size_t ahead) {
+void segment_power<Sample>::finish(real *power, bool add, const Sample *next, std::size_t ahead,
+                                   const qsrfhs::mkl_section &around) {
   const std::size_t n = window_.size();
   if constexpr (std::is_same_v<Sample, cf32>) {
-    transform_.forward(work_.data());
+    transform_.forward(work_.data(), around);
     const auto &kernels = qsrfhs::kernels::active();
     float *const work = floats(work_.data());
     if (!next) return write_power(work_.data(), power, add, n);
     (add ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
         work, power, floats(next), window_.data(), floats(next + n), ahead, n);
   } else if constexpr (is_complex<Sample>) {
-    transform_.forward(work_.data());
+    transform_.forward(work_.data(), around);
     write_power(work_.data(), power, add, n);
     if (next) begin(next);
   } else {
-    transform_.forward(work_.data(), spectrum_.data());
+    transform_.forward(work_.data(), spectrum_.data(), around);
     write_power(spectrum_.data(), power, add, spectrum_.size());
     if (next) begin(next);
   }

@@ -30,8 +30,8 @@ class segment_power {
   void begin(const Sample *x) noexcept;
   /// Writes the powers of the segment that was begun, or adds them, and begins the next one, unless that is null.
   /// `ahead` is how many of its samples behind the next segment the caches are asked for. Single-precision powers of
-  /// complex samples stand in the kernels' order.
-  void finish(real *power, bool add, const Sample *next, std::size_t ahead);
+  /// complex samples stand in the kernels' order. To be called inside of the section.
+  void finish(real *power, bool add, const Sample *next, std::size_t ahead, const qsrfhs::mkl_section &around);
 
   /// Puts powers into the order of the bins, or out of it.
   static void order(std::span<real> power) noexcept;
