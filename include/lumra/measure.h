@@ -105,7 +105,7 @@ typedef struct lumra_find_peaks_options {
  * magnitudes of both neighbours differ by, relative to the bin's; with a lobe narrower than 2 bins to either side, from
  * the larger one. For a complex tone alone they are exact: within 1e-9 bins and 1e-9 dB in double precision with every
  * cosine window (all but Kaiser's) and any N; with Kaiser's window of any beta up to 3 N within 0.7 / N^2 bins and
- * 4 / N^2 dB more. The mirror of a real tone, other lines within the lobe, and noise disturb both; the offset from the
+ * 4.1 / N^2 dB more. The mirror of a real tone, other lines within the lobe, and noise disturb both; the offset from the
  * bin is never more than half a bin. A peak on a bin at an end of one side is not interpolated.
  *
  * info     window and window_parameter are read
