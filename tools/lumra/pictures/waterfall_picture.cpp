@@ -49,6 +49,7 @@ std::string waterfall_script(const waterfall_picture &picture, picture_type type
   fmt::format_to(to,
                  "set lmargin at screen 0.08\nset rmargin at screen 0.86\nset bmargin at screen 0.09\n"
                  "set tmargin at screen 0.895\nset grid noxtics noytics nomxtics nomytics\nset tics out\n"
+                 "set style textbox opaque fillcolor rgb '#101010' noborder margins 0.3,0.3\n"
                  "set colorbox user origin screen 0.88,screen 0.09 size screen 0.022,screen 0.805\n"
                  "set yrange [{:.12g}:{:.12g}]\n"
                  "set cbrange [{:.6g}:{:.6g}]\nset cblabel {} offset 1.5,0\nset format cb '%.10h'\n"
@@ -73,8 +74,8 @@ std::string waterfall_script(const waterfall_picture &picture, picture_type type
       const bool inside = top - time(picture.begin_s) < 0.04 * (time(end_s) - time(picture.begin_s));
       const bool leans = left > scale.axis.low + 0.7 * (scale.axis.high - scale.axis.low);
       fmt::format_to(to,
-                     "set label {} {} at first {:.12g},first {:.12g} {} offset {},{} noenhanced front tc rgb '#40ff80' "
-                     "font ',10'\n",
+                     "set label {} {} at first {:.12g},first {:.12g} {} offset {},{} noenhanced front boxed "
+                     "tc rgb '#40ff80' font ',10'\n",
                      number, gnuplot_text(box.text), leans ? right : left, top, leans ? "right" : "left",
                      leans ? -0.3 : 0.3, inside ? -0.6 : 0.5);
     }
