@@ -8,6 +8,7 @@
 
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
+#include "commands/each_spectrum.hpp"
 #include "commands/inputs.hpp"
 #include "commands/spectrum_options.hpp"
 #include "pictures/spectrum_picture.hpp"
@@ -180,32 +181,17 @@ void add_stretches(spectrum_picture &picture, const power_command &command, cons
 }
 
 results run(const power_command &command) {
-  const std::vector<recording::source> sources = open_all(command.inputs);
-  results given(files_of(sources));
-  const output_files files = begin_outputs(given, command.outputs);
-  if (files.csv) write_csv_header(*files.csv, command);
-  spectrum_picture picture;
-  picture.title = title_of(sources);
-  picture.is_shared = sources.size() > 1;
-  picture.level_unit = command.outputs.level_unit();
-  for (const recording::source &source : sources) {
-    selection chosen = select_frequency(source);
-    const lumra::averaged_spectrum spectrum =
-        average(source, chosen, settings_for(command.spectrum, source, chosen, command.outputs));
-    const power_figures figures = measure(command, source, spectrum);
-    given.add_gap();
-    add_recording_lines(given, source, chosen);
-    add_spectrum_lines(given, command.spectrum, spectrum, command.outputs);
-    summarise(given, command, figures, spectrum.info.spacing_hz);
-    if (files.json) write_json(*files.json, json_of(command, figures));
-    if (files.csv) write_csv(*files.csv, command, source, figures);
-    if (!files.plot) continue;
-    add_curve(picture, command.spectrum, source, spectrum, all_bins(spectrum), {}, command.outputs);
-    if (sources.size() == 1) add_stretches(picture, command, figures);
-  }
-  if (files.plot) draw(spectrum_script(picture, files.type), files.type, *files.plot);
-  add_output_lines(given, command.outputs);
-  return given;
+  return each_spectrum(
+      command.inputs, command.spectrum, command.outputs, [&](output_file &csv) { write_csv_header(csv, command); },
+      [&](const measured_spectrum &of) {
+        const power_figures figures = measure(command, of.source, of.spectrum);
+        summarise(of.given, command, figures, of.spectrum.info.spacing_hz);
+        if (of.files.json) write_json(*of.files.json, json_of(command, figures));
+        if (of.files.csv) write_csv(*of.files.csv, command, of.source, figures);
+        if (!of.picture) return;
+        add_curve(*of.picture, command.spectrum, of.source, of.spectrum, all_bins(of.spectrum), {}, command.outputs);
+        if (!of.picture->is_shared) add_stretches(*of.picture, command, figures);
+      });
 }
 
 }  // namespace
@@ -215,8 +201,7 @@ void add_power(CLI::App &program, work_to_do &work) {
   CLI::App *app = program.add_subcommand("power", "Powers of channels and their neighbours, occupied bandwidth");
   app->footer(
       "Powers are integrated over the averaged spectrum and divided by the noise bandwidth of its window. Neighbours "
-      "are "
-      "as wide as their channel, at these distances from centre to centre.");
+      "are as wide as their channel, at these distances from centre to centre.");
   add_inputs(*app, command->inputs);
   app->add_option("--channel", command->channel_texts,
                   "A channel by centre and width in hertz; may be repeated (default: the whole band)")

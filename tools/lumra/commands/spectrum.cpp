@@ -9,6 +9,7 @@
 #include "analysis/spectrum_accumulator.hpp"
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
+#include "commands/each_spectrum.hpp"
 #include "commands/inputs.hpp"
 #include "commands/spectrum_options.hpp"
 #include "pictures/spectrum_picture.hpp"
@@ -23,7 +24,6 @@ struct spectrum_command {
   input_arguments inputs;
   spectrum_arguments spectrum;
   output_arguments outputs;
-  bool hold = false;
   std::size_t peaks = 1;
   std::optional<double> centre_hz, span_hz;
   double every_s = 0;
@@ -51,7 +51,7 @@ bin_range shown_bins(const spectrum_command &command, const lumra::averaged_spec
 void write_csv_header(output_file &csv, const spectrum_command &command) {
   const char *unit = command.outputs.level_column();
   csv.print("{}frequency_hz,level_{}", command.inputs.paths.size() > 1 ? "recording," : "", unit);
-  if (command.hold) csv.print(",maximum_{},minimum_{}", unit, unit);
+  if (command.spectrum.hold) csv.print(",maximum_{},minimum_{}", unit, unit);
   csv.print("\n");
 }
 
@@ -62,17 +62,14 @@ void write_csv(output_file &csv, const spectrum_command &command, const recordin
   const auto level = [&](double power) { return csv_number(decibels(power) + command.outputs.calibration_db); };
   for (std::size_t k = bins.first; k < bins.second; ++k) {
     csv.print("{}{},{}", name, spectrum.frequency(k), level(spectrum.power[k]));
-    if (command.hold) csv.print(",{},{}", level(spectrum.maximum[k]), level(spectrum.minimum[k]));
+    if (command.spectrum.hold) csv.print(",{},{}", level(spectrum.maximum[k]), level(spectrum.minimum[k]));
     csv.print("\n");
     if (k % 65536 == 0) bar.update(k - bins.first, bins.second - bins.first);
   }
 }
 
-void summarise(results &shown, const spectrum_command &command, const recording::source &source,
-               const selection &chosen, const lumra::averaged_spectrum &spectrum,
+void summarise(results &shown, const spectrum_command &command, const lumra::averaged_spectrum &spectrum,
                const std::vector<lumra::peak> &peaks) {
-  add_recording_lines(shown, source, chosen);
-  add_spectrum_lines(shown, command.spectrum, spectrum, command.outputs);
   const double whole = total_power(spectrum);
   shown.add_line("Total power",
                  whole > 0 ? level_text(decibels(whole), command.outputs) : "none: all samples are zero");
@@ -141,31 +138,16 @@ results run_intervals(const spectrum_command &command) {
 
 results run(const spectrum_command &command) {
   if (command.every_s > 0) return run_intervals(command);
-  const std::vector<recording::source> sources = open_all(command.inputs);
-  results given(files_of(sources));
-  // Made first, so that an output that cannot be written is known before the work.
-  const output_files files = begin_outputs(given, command.outputs);
-  if (files.csv) write_csv_header(*files.csv, command);
-  spectrum_picture picture;
-  picture.title = title_of(sources);
-  picture.is_shared = sources.size() > 1;
-  picture.level_unit = command.outputs.level_unit();
-  for (const recording::source &source : sources) {
-    selection chosen = select_frequency(source);
-    lumra::spectrum_settings settings = settings_for(command.spectrum, source, chosen, command.outputs);
-    settings.hold = command.hold;
-    const lumra::averaged_spectrum spectrum = average(source, chosen, settings);
-    const bin_range bins = shown_bins(command, spectrum, source);
-    const auto peaks = highest_peaks(spectrum, bins, command.peaks);
-    given.add_gap();
-    summarise(given, command, source, chosen, spectrum, peaks);
-    if (files.json) write_json(*files.json, json_of(command, source, spectrum, peaks));
-    if (files.csv) write_csv(*files.csv, command, source, spectrum, bins);
-    if (files.plot) add_curve(picture, command.spectrum, source, spectrum, bins, peaks, command.outputs);
-  }
-  if (files.plot) draw(spectrum_script(picture, files.type), files.type, *files.plot);
-  add_output_lines(given, command.outputs);
-  return given;
+  return each_spectrum(
+      command.inputs, command.spectrum, command.outputs, [&](output_file &csv) { write_csv_header(csv, command); },
+      [&](const measured_spectrum &of) {
+        const bin_range bins = shown_bins(command, of.spectrum, of.source);
+        const auto peaks = highest_peaks(of.spectrum, bins, command.peaks);
+        summarise(of.given, command, of.spectrum, peaks);
+        if (of.files.json) write_json(*of.files.json, json_of(command, of.source, of.spectrum, peaks));
+        if (of.files.csv) write_csv(*of.files.csv, command, of.source, of.spectrum, bins);
+        if (of.picture) add_curve(*of.picture, command.spectrum, of.source, of.spectrum, bins, peaks, command.outputs);
+      });
 }
 
 }  // namespace
@@ -178,7 +160,7 @@ void add_spectrum(CLI::App &program, work_to_do &work) {
       "frequencies, the one that most samples have is taken.");
   add_inputs(*app, command->inputs);
   add_spectrum_options(*app, command->spectrum);
-  app->add_flag("--hold", command->hold, "Also keep the highest and the lowest segment of each bin");
+  app->add_flag("--hold", command->spectrum.hold, "Also keep the highest and the lowest segment of each bin");
   app->add_option("--peaks", command->peaks, "Show so many of the highest peaks (default 1)")
       ->option_text("N")
       ->transform(whole_number(0, 1000000));

@@ -102,6 +102,7 @@ lumra::spectrum_settings settings_for(const spectrum_arguments &arguments, const
   settings.window = window.type;
   settings.window_parameter = window.parameter;
   settings.overlap = arguments.overlap_percent / 100;
+  settings.hold = arguments.hold;
   settings.threads = outputs.threads;
   settings.points = arguments.fft_size > 0 ? arguments.fft_size : arguments.usual_size;
   if (arguments.rbw_hz > 0) settings.points = size_for(arguments, source.rate, source);

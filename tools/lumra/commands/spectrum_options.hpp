@@ -23,6 +23,7 @@ struct spectrum_arguments {
   double rbw_hz = 0;
   std::string window = "flattop";
   double overlap_percent = 50;
+  bool hold = false;  // also the highest and the lowest segment of each bin
 };
 
 void add_spectrum_options(CLI::App &app, spectrum_arguments &arguments);

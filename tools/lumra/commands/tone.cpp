@@ -8,6 +8,7 @@
 
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
+#include "commands/each_spectrum.hpp"
 #include "commands/inputs.hpp"
 #include "commands/spectrum_options.hpp"
 #include "pictures/spectrum_picture.hpp"
@@ -110,36 +111,22 @@ void add_marks(spectrum_picture &picture, const tone_command &command, const lum
 }
 
 results run(const tone_command &command) {
-  const std::vector<recording::source> sources = open_all(command.inputs);
-  results given(files_of(sources));
-  const output_files files = begin_outputs(given, command.outputs);
-  if (files.csv) files.csv->print("{}order,frequency_hz,level_dbc\n", sources.size() > 1 ? "recording," : "");
-  spectrum_picture picture;
-  picture.title = title_of(sources);
-  picture.is_shared = sources.size() > 1;
-  picture.level_unit = command.outputs.level_unit();
-  for (const recording::source &source : sources) {
-    selection chosen = select_frequency(source);
-    const lumra::averaged_spectrum spectrum =
-        average(source, chosen, settings_for(command.spectrum, source, chosen, command.outputs));
-    const lumra::tone_figures tone = measure(command, source, spectrum);
-    given.add_gap();
-    add_recording_lines(given, source, chosen);
-    add_spectrum_lines(given, command.spectrum, spectrum, command.outputs);
-    summarise(given, command, tone, spectrum.info.spacing_hz);
-    if (files.json) write_json(*files.json, json_of(command, tone));
-    if (files.csv) write_csv(*files.csv, command, source, tone);
-    if (!files.plot) continue;
-    add_curve(picture, command.spectrum, source, spectrum, all_bins(spectrum), {}, command.outputs);
-    if (sources.size() == 1) {
-      add_marks(picture, command, tone, spectrum);
-      picture.settings += with_minus_signs(fmt::format("  ·  SNR {:.1f} dB  ·  THD {:.1f} dB  ·  SFDR {:.1f} dB",
-                                                       tone.snr_db, tone.thd_db, tone.sfdr_db));
-    }
-  }
-  if (files.plot) draw(spectrum_script(picture, files.type), files.type, *files.plot);
-  add_output_lines(given, command.outputs);
-  return given;
+  const bool named = command.inputs.paths.size() > 1;
+  return each_spectrum(
+      command.inputs, command.spectrum, command.outputs,
+      [&](output_file &csv) { csv.print("{}order,frequency_hz,level_dbc\n", named ? "recording," : ""); },
+      [&](const measured_spectrum &of) {
+        const lumra::tone_figures tone = measure(command, of.source, of.spectrum);
+        summarise(of.given, command, tone, of.spectrum.info.spacing_hz);
+        if (of.files.json) write_json(*of.files.json, json_of(command, tone));
+        if (of.files.csv) write_csv(*of.files.csv, command, of.source, tone);
+        if (!of.picture) return;
+        add_curve(*of.picture, command.spectrum, of.source, of.spectrum, all_bins(of.spectrum), {}, command.outputs);
+        if (of.picture->is_shared) return;
+        add_marks(*of.picture, command, tone, of.spectrum);
+        of.picture->settings += with_minus_signs(fmt::format("  ·  SNR {:.1f} dB  ·  THD {:.1f} dB  ·  SFDR {:.1f} dB",
+                                                             tone.snr_db, tone.thd_db, tone.sfdr_db));
+      });
 }
 
 }  // namespace
