@@ -45,9 +45,9 @@ enum lumra_status {
   LUMRA_INVALID_PARAMETER =
       -312401, /* error vectors: a block is null, sizes differ or are negative, or an unknown accuracy mode */
   LUMRA_NOT_OFFERED = -312402,          /* qsLTEHS: what it stands for is not offered */
-  LUMRA_FFT_SIZE_UNSUPPORTED = -312432, /* in logs: an FFT size above 2^27 */
+  LUMRA_FFT_SIZE_UNSUPPORTED = -312432, /* has a message, an FFT size above 2^27; returned by no function */
   LUMRA_ALLOCATION_FAILED = -312498,    /* error vectors: no memory */
-  LUMRA_UNDEFINED_ERROR = -312499,      /* in logs: MKL failed */
+  LUMRA_UNDEFINED_ERROR = -312499,      /* has a message, MKL failed; returned by no function */
 
   /* Library information. */
   LUMRA_INFO_FILENAME_NULL = -268501027,
