@@ -61,10 +61,12 @@ std::unique_ptr<iir> make(std::vector<dsp::recursion_coefficients> stages, std::
             LUMRA_OUT_OF_RANGE, "there are ", std::uint64_t{stage.reverse_order()},
             " coefficients behind a[0]; blocks take ", std::uint64_t{dsp::recursive_filter::most_block_order},
             ", so choose LUMRA_IIR_AUTO");
-  const dsp::recursion_method chosen = method == LUMRA_IIR_IN_ORDER ? dsp::recursion_method::in_order
-                                       : method == LUMRA_IIR_BLOCKS
-                                           ? dsp::recursion_method::blocks
-                                           : dsp::recursive_filter::choose(stages, is_single(type));
+  const dsp::recursion_method chosen =
+      method == LUMRA_IIR_IN_ORDER ? dsp::recursion_method::in_order
+      : method == LUMRA_IIR_BLOCKS
+          ? dsp::recursion_method::blocks
+          : dsp::recursive_filter::choose(
+                stages, is_single(type) ? dsp::precision::single_precision : dsp::precision::double_precision);
   return std::unique_ptr<iir>(
       new iir{type, dsp::recursive_filter(std::move(stages), is_complex(type) ? 2 : 1, chosen)});
 }

@@ -64,7 +64,7 @@ void delayed_reference<Sample>::load(std::size_t first, std::size_t count) {
 }
 
 template <class Sample>
-void delayed_reference<Sample>::shift(double delay, bool with_slopes) {
+void delayed_reference<Sample>::shift(double delay, slopes wanted) {
   const qsrfhs::mkl_runtime::use in_use;
   const std::size_t points = window_.count(), half = (points + 1) / 2;
   const double turn = -delay / static_cast<double>(points), scale = 1 / static_cast<double>(points);
@@ -76,7 +76,7 @@ void delayed_reference<Sample>::shift(double delay, bool with_slopes) {
   rotate(bins.last(negative), turn, -static_cast<double>(negative), scale, turned.last(negative));
   transform_->backward(turned.data(), delayed_.data());
   shifted_ = delay;
-  if (!with_slopes) return;
+  if (wanted == slopes::left_out) return;
   const double step = -2 * std::numbers::pi / static_cast<double>(points);
   for (std::size_t k = 0; k < points; ++k) {
     const double bin = k < half ? static_cast<double>(k) : -static_cast<double>(points - k);

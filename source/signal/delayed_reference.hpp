@@ -20,6 +20,9 @@ struct stretch {
   [[nodiscard]] std::size_t count() const noexcept { return last - first; }
 };
 
+/// Derivatives of a delayed record by the delay.
+enum class slopes { left_out, computed };
+
 /// A record delayed by fractions of a sample, in double precision and blocks of moderate length: each block's Fourier
 /// transform with its phases turned. Blocks are computed with neighbouring samples on both sides, as far as there are.
 template <class Sample>
@@ -38,9 +41,9 @@ class delayed_reference {
   /// the delay, block by block over a stretch. Without a delay and slopes these are the samples. Throws
   /// std::bad_alloc, dfti_failure.
   template <class Visit>
-  void walk(const stretch &part, double delay, bool with_slopes, Visit visit) {
+  void walk(const stretch &part, double delay, slopes wanted, Visit visit) {
     using values = std::span<const std::complex<double>>;
-    const bool as_is = delay == 0 && !with_slopes;
+    const bool as_is = delay == 0 && wanted == slopes::left_out;
     const std::size_t block = as_is ? 4096 : longest_block - 2 * margin;
     for (std::size_t first = part.first, count = 0; first < part.last; first += count) {
       count = std::min(part.last - first, reference_.size() <= longest_block && !as_is ? part.count() : block);
@@ -52,10 +55,10 @@ class delayed_reference {
         continue;
       }
       load(first, count);
-      if (with_slopes || delay != shifted_) shift(delay, with_slopes);
+      if (wanted == slopes::computed || delay != shifted_) shift(delay, wanted);
       const std::size_t inside = first - window_.first;
       visit(first, values(delayed_.data() + inside, count),
-            with_slopes ? values(slopes_.data() + inside, count) : values());
+            wanted == slopes::computed ? values(slopes_.data() + inside, count) : values());
     }
   }
 
@@ -70,7 +73,7 @@ class delayed_reference {
   /// The spectrum of a block with its margins, unless it is there.
   void load(std::size_t first, std::size_t count);
   /// Computes delayed_, and slopes_ if asked for, of the window.
-  void shift(double delay, bool with_slopes);
+  void shift(double delay, slopes wanted);
 
   std::span<const Sample> reference_;
   stretch window_{0, 0};

@@ -25,7 +25,7 @@ double power(wide v) noexcept {
 /// Calls visit(first, carried) run by run over the part: the reference as the model delays it, on the model's carrier.
 template <class Sample, class Visit>
 void walk_carried(delayed_reference<Sample> &reference, const stretch &part, const stream_model &model, Visit visit) {
-  reference.walk(part, model.delay, false, [&](std::size_t first, std::span<const wide> values, auto) {
+  reference.walk(part, model.delay, slopes::left_out, [&](std::size_t first, std::span<const wide> values, auto) {
     std::array<wide, run> room;
     for (std::size_t begin = 0; begin < values.size(); begin += run) {
       const auto delayed = values.subspan(begin, std::min(run, values.size() - begin));

@@ -29,7 +29,8 @@ alignment_outcome find_delay_and_frequency(std::span<const Sample> reference, st
   if (!search(reference, measured, wanted, part, model)) return alignment_outcome::unrelated;
   for (;;) {
     const bool last = part.count() == n || (!wanted.frequency && part.count() == longest_for_delay);
-    const alignment_outcome outcome = refine(delayed, measured, wanted, part, last, model);
+    const alignment_outcome outcome =
+        refine(delayed, measured, wanted, part, last ? refinement::full : refinement::rough, model);
     if (outcome != alignment_outcome::found) return outcome;
     if (!(std::abs(model.delay) <= static_cast<double>(longest_delay(n)) + 1)) return alignment_outcome::unrelated;
     if (last) break;

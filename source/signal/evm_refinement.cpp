@@ -69,10 +69,10 @@ struct normal_equations {
 
 template <class Sample>
 alignment_outcome refine(delayed_reference<Sample> &delayed, std::span<const Sample> measured, const alignment &wanted,
-                         const stretch &part, bool fully, stream_model &model) {
+                         const stretch &part, refinement how, stream_model &model) {
   constexpr int most_rounds = 12;
   constexpr double least_correlation = 0.005;
-  const double enough = fully ? 1e-5 : 1e-2;  // of the last step, whose square is what is left
+  const double enough = how == refinement::full ? 1e-5 : 1e-2;  // of the last step, whose square is what is left
   const bool short_enough = part.count() <= longest_for_delay;
   const double half = static_cast<double>(part.count()) / 2, middle = static_cast<double>(part.first) + half;
   wide gain = 0, dc = 0;
@@ -86,26 +86,28 @@ alignment_outcome refine(delayed_reference<Sample> &delayed, std::span<const Sam
     if (compared.first >= compared.last) return alignment_outcome::unrelated;
     normal_equations equations;
     double fitted_power = 0, error_power = 0;
-    delayed.walk(compared, model.delay, with_delay, [&](std::size_t first, auto values, auto slopes) {
-      constexpr std::size_t run = 256;
-      std::array<wide, run> carried, sloped;
-      for (std::size_t begin = 0; begin < values.size(); begin += run) {
-        const std::size_t count = std::min(run, values.size() - begin);
-        const double from_middle = static_cast<double>(first + begin) - middle;
-        rotate(values.subspan(begin, count), model.frequency, from_middle, 1, carried);
-        if (with_delay) rotate(slopes.subspan(begin, count), model.frequency, from_middle, 1, sloped);
-        for (std::size_t k = 0; k < count; ++k) {
-          const wide u = carried[k], fitted = times(gain, u);
-          const double turn = 2 * std::numbers::pi * (from_middle + static_cast<double>(k)) / half;
-          const wide error = wide(measured[first + begin + k]) - fitted - dc;
-          fitted_power += fitted.real() * fitted.real() + fitted.imag() * fitted.imag();
-          error_power += error.real() * error.real() + error.imag() * error.imag();
-          equations.add({u, wide(-u.imag(), u.real()), 1, wide(0, 1), with_delay ? times(gain, sloped[k]) : 0,
-                         turn * wide(-fitted.imag(), fitted.real())},
-                        error);
-        }
-      }
-    });
+    delayed.walk(compared, model.delay, with_delay ? slopes::computed : slopes::left_out,
+                 [&](std::size_t first, auto values, auto derivatives) {
+                   constexpr std::size_t run = 256;
+                   std::array<wide, run> carried, sloped;
+                   for (std::size_t begin = 0; begin < values.size(); begin += run) {
+                     const std::size_t count = std::min(run, values.size() - begin);
+                     const double from_middle = static_cast<double>(first + begin) - middle;
+                     rotate(values.subspan(begin, count), model.frequency, from_middle, 1, carried);
+                     if (with_delay) rotate(derivatives.subspan(begin, count), model.frequency, from_middle, 1, sloped);
+                     for (std::size_t k = 0; k < count; ++k) {
+                       const wide u = carried[k], fitted = times(gain, u);
+                       const double turn = 2 * std::numbers::pi * (from_middle + static_cast<double>(k)) / half;
+                       const wide error = wide(measured[first + begin + k]) - fitted - dc;
+                       fitted_power += fitted.real() * fitted.real() + fitted.imag() * fitted.imag();
+                       error_power += error.real() * error.real() + error.imag() * error.imag();
+                       equations.add(
+                           {u, wide(-u.imag(), u.real()), 1, wide(0, 1), with_delay ? times(gain, sloped[k]) : 0,
+                            turn * wide(-fitted.imag(), fitted.real())},
+                           error);
+                     }
+                   }
+                 });
     unknowns change;
     if (!equations.solve(is_free, change)) return alignment_outcome::undetermined;
     if (!first_round && !(fitted_power >= least_correlation * (fitted_power + error_power)))
@@ -120,8 +122,8 @@ alignment_outcome refine(delayed_reference<Sample> &delayed, std::span<const Sam
 }
 
 template alignment_outcome refine(delayed_reference<std::complex<float>> &, std::span<const std::complex<float>>,
-                                  const alignment &, const stretch &, bool, stream_model &);
+                                  const alignment &, const stretch &, refinement, stream_model &);
 template alignment_outcome refine(delayed_reference<std::complex<double>> &, std::span<const std::complex<double>>,
-                                  const alignment &, const stretch &, bool, stream_model &);
+                                  const alignment &, const stretch &, refinement, stream_model &);
 
 }  // namespace dsp

@@ -77,11 +77,11 @@ auto power_forest<Real>::plant(std::uint64_t position, std::uint64_t next) noexc
     const int joint = level(before.last, position);
     if (joint < level(position, next) && closed_in_front(trees_.size() - 1, joint)) {
       before.last = position;
-      return {before.sum.data(), true};
+      return {before.sum.data(), row_goes::on_top};
     }
   }
   trees_.push_back({position, position, buffer()});
-  return {trees_.back().sum.data(), false};
+  return {trees_.back().sum.data(), row_goes::in};
 }
 
 template <class Real>

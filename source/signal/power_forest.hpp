@@ -12,6 +12,9 @@
 
 namespace dsp {
 
+/// Into new memory, or added to what is there.
+enum class row_goes { in, on_top };
+
 /// Rows are the leaves of the binary tree of all positions: a stretch [m 2^L, (m + 1) 2^L) is the sum of its two
 /// halves, or the one of them that holds any. Which rows there are alone decides what is added to what. Trees whose
 /// stretch may still get rows, in front or behind, are kept side by side: at most two for each level.
@@ -22,10 +25,10 @@ class power_forest {
     std::uint64_t first, last;  // positions of its rows
     qsrfhs::aligned_buffer<Real> sum;
   };
-  /// Where a row goes: into new memory, or added to what is there.
+  /// Where a row goes.
   struct place {
     Real *row;
-    bool add;
+    row_goes goes;
   };
 
   static constexpr std::size_t most_trees = 128;

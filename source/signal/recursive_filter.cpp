@@ -329,7 +329,7 @@ bool recursive_filter::restore(const place &at) noexcept {
   return true;
 }
 
-recursion_method recursive_filter::choose(const std::vector<recursion_coefficients> &stages, bool single_precision) {
+recursion_method recursive_filter::choose(const std::vector<recursion_coefficients> &stages, precision of_samples) {
   constexpr std::size_t samples = 2048;
   for (const recursion_coefficients &stage : stages)
     if (stage.reverse_order() > most_block_order) return recursion_method::in_order;
@@ -361,7 +361,8 @@ recursion_method recursive_filter::choose(const std::vector<recursion_coefficien
     error_ordered += (ordered[k] - exact[k]) * (ordered[k] - exact[k]);
     error_blocked += (blocked[k] - exact[k]) * (blocked[k] - exact[k]);
   }
-  const long double allowed = std::max(16 * error_ordered, power * (single_precision ? 0x1p-60L : 0x1p-104L));
+  const long double allowed =
+      std::max(16 * error_ordered, power * (of_samples == precision::single_precision ? 0x1p-60L : 0x1p-104L));
   return error_blocked <= allowed ? recursion_method::blocks : recursion_method::in_order;  // in order for NaN, too
 }
 

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "qsrfhs/util/aligned_buffer.hpp"
+#include "signal/sample_type.hpp"
 
 namespace dsp {
 
@@ -47,7 +48,7 @@ class recursive_filter {
   /// The trial is noise of 2048 samples. Blocks are taken where their error against extended precision is, as a root
   /// mean square, below four times that of the recursion in order, or below 2^-30 (single precision) or 2^-52 (double)
   /// of the output. A narrow filter of high order in direct form loses more digits in blocks, and stays in order.
-  static recursion_method choose(const std::vector<recursion_coefficients> &stages, bool single_precision);
+  static recursion_method choose(const std::vector<recursion_coefficients> &stages, precision of_samples);
 
   /// Filters n samples of type float, double or complex of them; out may be in.
   template <class Sample>

@@ -14,4 +14,6 @@ using real_of = decltype(std::real(Sample{}));
 template <class Sample>
 inline constexpr bool is_complex = !std::is_same_v<Sample, real_of<Sample>>;
 
+enum class precision { single_precision, double_precision };
+
 }  // namespace dsp

@@ -28,12 +28,12 @@ void apply_window(const Sample *x, const Real *w, Sample *out, std::size_t n) no
 }
 
 template <class Real>
-void write_power(const std::complex<Real> *x, Real *power, bool add, std::size_t n) noexcept {
+void write_power(const std::complex<Real> *x, Real *power, row_goes how, std::size_t n) noexcept {
   if constexpr (std::is_same_v<Real, float>) {
     const auto &kernels = qsrfhs::kernels::active();
-    (add ? kernels.accumulate_power : kernels.store_power)(floats(x), power, n);
+    (how == row_goes::on_top ? kernels.accumulate_power : kernels.store_power)(floats(x), power, n);
   } else {
-    if (!add) std::fill_n(power, n, Real{});
+    if (how == row_goes::in) std::fill_n(power, n, Real{});
     for (std::size_t k = 0; k < n; ++k) power[k] += x[k].real() * x[k].real() + x[k].imag() * x[k].imag();
   }
 }
@@ -56,23 +56,23 @@ void segment_power<Sample>::begin(const Sample *x) noexcept {
 }
 
 template <class Sample>
-void segment_power<Sample>::finish(real *power, bool add, const Sample *next, std::size_t ahead,
+void segment_power<Sample>::finish(real *power, row_goes how, const Sample *next, std::size_t ahead,
                                    const qsrfhs::mkl_section &around) {
   const std::size_t n = window_.size();
   if constexpr (std::is_same_v<Sample, cf32>) {
     transform_.forward(work_.data(), around);
     const auto &kernels = qsrfhs::kernels::active();
     float *const work = floats(work_.data());
-    if (!next) return write_power(work_.data(), power, add, n);
-    (add ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
+    if (!next) return write_power(work_.data(), power, how, n);
+    (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
         work, power, floats(next), window_.data(), floats(next + n), ahead, n);
   } else if constexpr (is_complex<Sample>) {
     transform_.forward(work_.data(), around);
-    write_power(work_.data(), power, add, n);
+    write_power(work_.data(), power, how, n);
     if (next) begin(next);
   } else {
     transform_.forward(work_.data(), spectrum_.data(), around);
-    write_power(spectrum_.data(), power, add, spectrum_.size());
+    write_power(spectrum_.data(), power, how, spectrum_.size());
     if (next) begin(next);
   }
 }

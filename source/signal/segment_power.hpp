@@ -8,6 +8,7 @@
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "signal/block_transform.hpp"
 #include "signal/dfti_descriptor.hpp"
+#include "signal/power_forest.hpp"
 
 namespace dsp {
 
@@ -31,7 +32,7 @@ class segment_power {
   /// Writes the powers of the segment that was begun, or adds them, and begins the next one, unless that is null.
   /// `ahead` is how many of its samples behind the next segment the caches are asked for. Single-precision powers of
   /// complex samples stand in the kernels' order. To be called inside of the section.
-  void finish(real *power, bool add, const Sample *next, std::size_t ahead, const qsrfhs::mkl_section &around);
+  void finish(real *power, row_goes how, const Sample *next, std::size_t ahead, const qsrfhs::mkl_section &around);
 
   /// Puts powers into the order of the bins, or out of it.
   static void order(std::span<real> power) noexcept;

@@ -182,15 +182,15 @@ void spectrum_average<Sample>::run_lane(lane &own, const Sample *x, std::uint64_
     const std::size_t ahead = k + 2 < count ? step : 0;
     const auto place = own.forest.plant(position, position + step);
     if (held) {
-      own.power.finish(own.leaf.data(), false, next, ahead, section);
+      own.power.finish(own.leaf.data(), row_goes::in, next, ahead, section);
       const std::span<const real> leaf = own.leaf.elements();
-      if (place.add)
+      if (place.goes == row_goes::on_top)
         add_row(leaf, std::span(place.row, leaf.size()));
       else
         std::copy(leaf.begin(), leaf.end(), place.row);
       hold(own, leaf, leaf);
     } else {
-      own.power.finish(place.row, place.add, next, ahead, section);
+      own.power.finish(place.row, place.goes, next, ahead, section);
     }
     own.forest.settle(position + step);
     section.let_forks_pass();
