@@ -1,7 +1,7 @@
 // The one way in which reading and writing a recording fails. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <stdexcept>
 #include <string>

@@ -1,11 +1,12 @@
 // SPDX-License-Identifier: MIT
 #include "analysis/selection.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <iterator>
 
+#include "terminal/append.hpp"
 #include "terminal/failure.hpp"
 #include "terminal/units.hpp"
 
@@ -27,7 +28,7 @@ selection of_stretches(const recording::source &source, std::vector<stretch> str
     constexpr std::size_t most_named = 8;
     std::string names;
     for (std::size_t i = 0; i < std::min(stretches.size(), most_named); ++i)
-      fmt::format_to(std::back_inserter(names), "{}{}", i == 0 ? "" : ", ", stretches[i].capture);
+      append(names, "{}{}", i == 0 ? "" : ", ", stretches[i].capture);
     if (stretches.size() > most_named) names += ", ...";
     chosen.text =
         fmt::format("{} {} alone{}; choose another one with --capture", stretches.size() == 1 ? "capture" : "captures",

@@ -11,6 +11,10 @@ namespace tool {
 
 using nlohmann::ordered_json;
 
+CLI::App *add_command(CLI::App &program, const char *name, const char *help) {
+  return program.add_subcommand(name, help);
+}
+
 CLI::Validator any_number() {
   return number_where("a number", [](double) { return true; });
 }

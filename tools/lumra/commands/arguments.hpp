@@ -14,6 +14,9 @@
 
 namespace tool {
 
+/// A new subcommand. The library of command lines is all in headers: this function alone compiles its parser.
+CLI::App *add_command(CLI::App &program, const char *name, const char *help);
+
 /// An option's value is a number, with a prefix or without, that satisfies `holds`.
 template <class Holds>
 CLI::Validator number_where(const char *what, Holds holds) {

@@ -1,5 +1,5 @@
 // lumra convert: a recording in another form: SigMF of any type, an archive, WAV. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <complex>
@@ -153,7 +153,7 @@ results run(const convert_command &command) {
 
 void add_convert(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<convert_command>();
-  CLI::App *app = program.add_subcommand("convert", "A recording as SigMF of any type, as an archive or as WAV");
+  CLI::App *app = add_command(program, "convert", "A recording as SigMF of any type, as an archive or as WAV");
   app->footer(
       "Captures and annotations are carried over, with the indices of the samples that are written. Samples are "
       "rounded "

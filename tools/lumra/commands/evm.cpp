@@ -1,6 +1,6 @@
 // lumra evm: the errors of a measured recording against a reference as summary, CSV and picture.
 // SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <cmath>
@@ -222,7 +222,7 @@ results run(evm_command &command) {
 
 void add_evm(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<evm_command>();
-  CLI::App *app = program.add_subcommand("evm", "Error vectors of a recording against a reference");
+  CLI::App *app = add_command(program, "evm", "Error vectors of a recording against a reference");
   app->footer(
       "Sample by sample, M against R: EVM = |M - R|, magnitude error = |M| - |R|, both in percent of the RMS of the "
       "reference; phase error = arg(M conj(R)) in degrees, for samples that are zero in neither recording. --align "

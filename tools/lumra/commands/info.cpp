@@ -1,6 +1,6 @@
 // lumra info: what is in a recording; without one, which library this is and what it runs on.
 // SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <lumra/lumra.hpp>
@@ -78,7 +78,7 @@ ordered_json json_of(const recording::source &source) {
 void write_csv(output_file &csv, const recording::source &source) {
   const auto frequency = common_frequency(source);
   csv.print("{},{},{},{},", csv_text(source.path.string()), csv_text(source.datatype), source.rate,
-            frequency ? fmt::to_string(*frequency) : "");
+            frequency ? fmt::format("{}", *frequency) : "");
   if (source.samples == endless)
     csv.print(",,");
   else
@@ -167,7 +167,7 @@ results run(const info_command &command) {
 void add_info(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<info_command>();
   CLI::App *app =
-      program.add_subcommand("info", "What is in a recording; without one, the library's version and what it runs on");
+      add_command(program, "info", "What is in a recording; without one, the library's version and what it runs on");
   app->footer(
       "A fault is something wrong with the metadata that does not hinder reading. The library's own lines are the "
       "version, the processor path in use and the version of MKL.");

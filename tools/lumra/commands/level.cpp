@@ -1,5 +1,5 @@
 // lumra level: RMS, peak, crest factor, DC, clipping, power statistics and envelope. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <cmath>
 #include <memory>
@@ -144,7 +144,7 @@ results run(const level_command &command) {
 
 void add_level(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<level_command>();
-  CLI::App *app = program.add_subcommand("level", "RMS, peak, crest factor, DC, clipping and power statistics");
+  CLI::App *app = add_command(program, "level", "RMS, peak, crest factor, DC, clipping and power statistics");
   app->footer(
       "Levels are those of |x|: a complex tone of amplitude 1 has 0 dBFS. Power statistics (CCDF) are the share of "
       "samples whose power is more than some decibels above the mean. Clipped samples have a part at an end of their "

@@ -1,5 +1,5 @@
 // lumra power: powers of channels, of their neighbours, and the occupied bandwidth. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <cmath>
 #include <lumra/measure.hpp>
@@ -198,7 +198,7 @@ results run(const power_command &command) {
 
 void add_power(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<power_command>();
-  CLI::App *app = program.add_subcommand("power", "Powers of channels and their neighbours, occupied bandwidth");
+  CLI::App *app = add_command(program, "power", "Powers of channels and their neighbours, occupied bandwidth");
   app->footer(
       "Powers are integrated over the averaged spectrum and divided by the noise bandwidth of its window. Neighbours "
       "are as wide as their channel, at these distances from centre to centre.");

@@ -1,5 +1,5 @@
 // lumra resample: a recording at a new rate, as SigMF. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <cmath>
 #include <lumra/lumra.hpp>
@@ -108,7 +108,7 @@ results run(const resample_command &command) {
 
 void add_resample(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<resample_command>();
-  CLI::App *app = program.add_subcommand("resample", "A recording at a new rate, as SigMF");
+  CLI::App *app = add_command(program, "resample", "A recording at a new rate, as SigMF");
   app->footer(
       "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass "
       "band "

@@ -1,5 +1,5 @@
 // lumra spectrum: averaged power spectra of recordings as summary, JSON, CSV and picture. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <cmath>
@@ -154,7 +154,7 @@ results run(const spectrum_command &command) {
 
 void add_spectrum(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<spectrum_command>();
-  CLI::App *app = program.add_subcommand("spectrum", "Averaged power spectrum of recordings, in dB of full scale");
+  CLI::App *app = add_command(program, "spectrum", "Averaged power spectrum of recordings, in dB of full scale");
   app->footer(
       "A full-scale tone on a bin reads 0 dBFS with every window. Captures of one frequency are averaged; of several "
       "frequencies, the one that most samples have is taken.");

@@ -1,5 +1,5 @@
 // lumra tone: a carrier, its harmonics, its image, and the noise. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <cmath>
 #include <lumra/measure.hpp>
@@ -133,7 +133,7 @@ results run(const tone_command &command) {
 
 void add_tone(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<tone_command>();
-  CLI::App *app = program.add_subcommand("tone", "A carrier with its harmonics, image and noise");
+  CLI::App *app = add_command(program, "tone", "A carrier with its harmonics, image and noise");
   app->footer(
       "THD, image and DC are in dB of the carrier. Harmonics are those of the carrier's offset from the centre, folded "
       "into the band; one that falls on another line cannot be told from it. Effective bits are (SINAD - 1.76) / 6.02, "

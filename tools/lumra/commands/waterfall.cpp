@@ -1,5 +1,5 @@
 // lumra waterfall: levels over time and frequency. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <cmath>
 #include <memory>
@@ -122,7 +122,7 @@ results run(const waterfall_command &command) {
 
 void add_waterfall(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<waterfall_command>();
-  CLI::App *app = program.add_subcommand("waterfall", "Levels over time and frequency as a picture");
+  CLI::App *app = add_command(program, "waterfall", "Levels over time and frequency as a picture");
   app->footer(
       "Time runs from top to bottom and counts from the recording's begin. Annotations are drawn as labelled boxes. Of "
       "captures that do not continue each other, the longest one is taken.");

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "documentation/generate.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -10,6 +10,7 @@
 #include <lumra/lumra.hpp>
 
 #include "documentation/command_model.hpp"
+#include "terminal/append.hpp"
 #include "terminal/failure.hpp"
 
 namespace tool {
@@ -87,21 +88,20 @@ std::string bash_completion(const described_command &program, const std::vector<
       "    case ${COMP_WORDS[i]} in -*) ;; *) command=${COMP_WORDS[i]}; break ;; esac\n"
       "  done\n"
       "  case $command,$before in\n";
-  const auto to = std::back_inserter(text);
   for (const described_command &each : subcommands)
     for (const described_option &option : each.options) {
       if (option.value.empty() || is_file_name(option)) continue;
-      fmt::format_to(to, "    {},{}) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\"); return ;;\n", each.name,
-                     option.name, joined(option.choices));
+      append(text, "    {},{}) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\"); return ;;\n", each.name,
+             option.name, joined(option.choices));
     }
   text += "  esac\n  case $command,$word in\n";
   const auto add_names = [&](const described_command &each, const std::string &pattern) {
     std::vector<std::string> options;
     for (const described_option &option : each.options) options.push_back(option.name);
-    fmt::format_to(to, "    {}) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\") ;;\n", pattern, joined(options));
+    append(text, "    {}) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\") ;;\n", pattern, joined(options));
   };
   add_names(program, ",-*");
-  fmt::format_to(to, "    ,*) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\") ;;\n", joined(names));
+  append(text, "    ,*) mapfile -t COMPREPLY < <(compgen -W '{}' -- \"$word\") ;;\n", joined(names));
   for (const described_command &each : subcommands) add_names(each, each.name + ",-*");
   return text + "    *) compopt -o default ;;\n  esac\n}\ncomplete -F _lumra lumra\n";
 }
@@ -133,17 +133,15 @@ std::string zsh_completion(const described_command &program, const std::vector<d
   std::string text =
       "#compdef lumra\n_lumra() {\n  local context state line\n  typeset -A opt_args\n"
       "  _arguments -C \\\n";
-  const auto to = std::back_inserter(text);
-  for (const described_option &option : program.options) fmt::format_to(to, "    {} \\\n", zsh_option(option));
+  for (const described_option &option : program.options) append(text, "    {} \\\n", zsh_option(option));
   text +=
       "    '1:subcommand:->subcommand' '*::argument:->argument'\n  case $state in\n    subcommand)\n"
       "      local -a names=(\n";
-  for (const described_command &each : subcommands)
-    fmt::format_to(to, "        '{}:{}'\n", each.name, zsh_text(each.help));
+  for (const described_command &each : subcommands) append(text, "        '{}:{}'\n", each.name, zsh_text(each.help));
   text += "      )\n      _describe subcommand names ;;\n    argument)\n      case $words[1] in\n";
   for (const described_command &each : subcommands) {
-    fmt::format_to(to, "        {})\n          _arguments \\\n", each.name);
-    for (const described_option &option : each.options) fmt::format_to(to, "            {} \\\n", zsh_option(option));
+    append(text, "        {})\n          _arguments \\\n", each.name);
+    for (const described_option &option : each.options) append(text, "            {} \\\n", zsh_option(option));
     text += "            '*:file:_files' ;;\n";
   }
   return text + "      esac ;;\n  esac\n}\n_lumra \"$@\"\n";

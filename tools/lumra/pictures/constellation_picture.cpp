@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "pictures/constellation_picture.hpp"
+#include "terminal/append.hpp"
 
 #include <algorithm>
 #include <cmath>
@@ -20,7 +21,7 @@ std::string rows_of(const std::vector<std::complex<double>> &points, double grid
   std::string rows;
   for (const std::complex<double> &point : points)
     if (taken.emplace(std::lround(point.real() / grid), std::lround(point.imag() / grid)).second)
-      fmt::format_to(std::back_inserter(rows), "{:.5g} {:.5g}\n", point.real(), point.imag());
+      append(rows, "{:.5g} {:.5g}\n", point.real(), point.imag());
   count = taken.size();
   return rows;
 }

@@ -7,6 +7,7 @@
 #include <limits>
 #include <utility>
 
+#include "terminal/append.hpp"
 #include "terminal/units.hpp"
 
 namespace tool {
@@ -40,25 +41,24 @@ std::string ccdf_script(const std::string &title, const std::string &settings, c
   if (std::all_of(curves.begin(), curves.end(), [](const ccdf_curve &curve) { return curve.above_db.empty(); }))
     return empty_script(frame, "all samples are zero", type);
   std::string script = frame_script(frame, type);
-  const auto to = std::back_inserter(script);
-  fmt::format_to(to, "set logscale y\nset ytics 10\nset mytics 10\nset format y '10^{{%T}}'\n{}", key);
+  append(script, "set logscale y\nset ytics 10\nset mytics 10\nset format y '10^{{%T}}'\n{}", key);
   std::string plots = "plot ";
   const bool real = curves.front().is_real;
   script += "$gaussian << end_of_curve\n";
   constexpr int points_per_decibel = 20;
   for (int k = 0; k <= right * points_per_decibel; ++k) {
     const double above = static_cast<double>(k) / points_per_decibel, share = gaussian_share(above, real);
-    if (share >= bottom) fmt::format_to(to, "{:.3f} {:.6g}\n", above, share);
+    if (share >= bottom) append(script, "{:.3f} {:.6g}\n", above, share);
   }
   script += "end_of_curve\n";
   for (std::size_t i = 0; i < curves.size(); ++i) {
-    fmt::format_to(to, "$curve{} << end_of_curve\n", i);
+    append(script, "$curve{} << end_of_curve\n", i);
     for (std::size_t k = 0; k < curves[i].above_db.size(); ++k)
       if (curves[i].probability[k] > 0)
-        fmt::format_to(to, "{:.3f} {:.9g}\n", curves[i].above_db[k], curves[i].probability[k]);
+        append(script, "{:.3f} {:.9g}\n", curves[i].above_db[k], curves[i].probability[k]);
     script += "end_of_curve\n";
-    fmt::format_to(std::back_inserter(plots), "$curve{} using 1:2 with lines lw 2 lc rgb '{}' title {}, \\\n  ", i,
-                   curve_colour(i), gnuplot_text(curves[i].name));
+    append(plots, "$curve{} using 1:2 with lines lw 2 lc rgb '{}' title {}, \\\n  ", i, curve_colour(i),
+           gnuplot_text(curves[i].name));
   }
   return script + plots + "$gaussian using 1:2 with lines lw 1.5 dt 2 lc rgb '#707070' title 'Gaussian noise'\n";
 }
@@ -86,21 +86,18 @@ std::string envelope_script(const std::string &title, const std::string &setting
   frame.y.low = frame.y.division * std::floor(lowest / frame.y.division - 0.2);
   frame.y.high = frame.y.division * std::ceil(highest / frame.y.division + 0.4);
   std::string script = frame_script(frame, type) + key, plots;
-  const auto to = std::back_inserter(script);
   const auto number = [&](double level) { return std::isfinite(level) ? fmt::format(" {:.3f}", level) : " NaN"; };
   for (std::size_t i = 0; i < curves.size(); ++i) {
     const envelope_curve &curve = curves[i];
-    fmt::format_to(to, "$curve{} << end_of_curve\n", i);
+    append(script, "$curve{} << end_of_curve\n", i);
     for (std::size_t k = 0; k < curve.time_s.size(); ++k)
-      fmt::format_to(to, "{:.9g}{}{}\n", curve.time_s[k] / unit.seconds, number(curve.rms_db[k]),
-                     number(curve.peak_db[k]));
+      append(script, "{:.9g}{}{}\n", curve.time_s[k] / unit.seconds, number(curve.rms_db[k]), number(curve.peak_db[k]));
     script += "end_of_curve\n";
     const std::string name = curves.size() > 1 ? ", " + curve.name : "";
-    fmt::format_to(std::back_inserter(plots),
-                   "{0}$curve{1} using 1:3 with lines lw 0.8 dt 3 lc rgb '{2}' title {3}, \\\n"
-                   "  $curve{1} using 1:2 with lines lw 1.4 lc rgb '{2}' title {4}",
-                   i == 0 ? "plot " : ", \\\n  ", i, curve_colour(i), gnuplot_text("Peak" + name),
-                   gnuplot_text("RMS" + name));
+    append(plots,
+           "{0}$curve{1} using 1:3 with lines lw 0.8 dt 3 lc rgb '{2}' title {3}, \\\n"
+           "  $curve{1} using 1:2 with lines lw 1.4 lc rgb '{2}' title {4}",
+           i == 0 ? "plot " : ", \\\n  ", i, curve_colour(i), gnuplot_text("Peak" + name), gnuplot_text("RMS" + name));
   }
   return script + plots + "\n";
 }

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "pictures/frequency_scale.hpp"
+#include "terminal/append.hpp"
 
 namespace tool {
 namespace {
@@ -54,7 +55,7 @@ picture_axis level_axis(const spectrum_picture &picture) {
 
 void add_number(std::string &row, double value) {
   if (std::isfinite(value))
-    fmt::format_to(std::back_inserter(row), " {:.3f}", value);
+    append(row, " {:.3f}", value);
   else
     row += " NaN";
 }
@@ -62,7 +63,7 @@ void add_number(std::string &row, double value) {
 std::string rows_of(const spectrum_curve &curve, const frequency_scale &scale, double bottom) {
   std::string rows;
   for (std::size_t k = 0; k < curve.level_db.size(); ++k) {
-    fmt::format_to(std::back_inserter(rows), "{:.12g}", scale.at(curve.frequency_hz[k]));
+    append(rows, "{:.12g}", scale.at(curve.frequency_hz[k]));
     add_number(rows, curve.level_db[k]);
     if (!curve.lowest_db.empty()) {
       // Silence in the band reaches down to the axis.
@@ -119,7 +120,7 @@ std::string spectrum_script(const spectrum_picture &picture, picture_type type) 
 
   std::string script = frame_script(frame, type);
   const auto add = [&](auto text, auto &&...values) {
-    fmt::format_to(std::back_inserter(script), fmt::runtime(text), values...);
+    append_formatted(script, text, fmt::make_format_args(values...));
   };
   // The axis ends where the band does; numbers that are drawn lie inside.
   int number = 2;
@@ -155,7 +156,7 @@ std::string spectrum_script(const spectrum_picture &picture, picture_type type) 
     const char *side = inside < 0.15 ? "left" : inside > 0.85 ? "right" : "center";
     add("set label {} {} at first {:.12g},{:.3f} {} offset 0,1.4 noenhanced front tc rgb '#b02020'\n", number++,
         gnuplot_text(with_minus_signs(mark.text)), x, mark.level_db, side);
-    fmt::format_to(std::back_inserter(marks), "{:.12g} {:.3f}\n", x, mark.level_db + 0.011 * height);
+    append(marks, "{:.12g} {:.3f}\n", x, mark.level_db + 0.011 * height);
   }
   // The list stands on the side where the highest mark is not.
   if (!picture.list.empty()) {

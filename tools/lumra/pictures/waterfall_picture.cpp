@@ -6,6 +6,7 @@
 #include <iterator>
 
 #include "pictures/frequency_scale.hpp"
+#include "terminal/append.hpp"
 #include "terminal/units.hpp"
 
 namespace tool {
@@ -44,19 +45,17 @@ std::string waterfall_script(const waterfall_picture &picture, picture_type type
   const auto [low, high] = picture.range_db.value_or(levels_in(picture));
   if (std::isnan(low)) return empty_script(frame, "all samples are zero", type);
   std::string script = frame_script(frame, type);
-  const auto to = std::back_inserter(script);
   // Time runs down, as it does in a waterfall. Colours are of equal steps in brightness, for eyes and for print.
-  fmt::format_to(to,
-                 "set lmargin at screen 0.08\nset rmargin at screen 0.86\nset bmargin at screen 0.09\n"
-                 "set tmargin at screen 0.895\nset grid noxtics noytics nomxtics nomytics\nset tics out\n"
-                 "set style textbox opaque fillcolor rgb '#101010' noborder margins 0.3,0.3\n"
-                 "set colorbox user origin screen 0.88,screen 0.09 size screen 0.022,screen 0.805\n"
-                 "set yrange [{:.12g}:{:.12g}]\n"
-                 "set cbrange [{:.6g}:{:.6g}]\nset cblabel {} offset 1.5,0\nset format cb '%.10h'\n"
-                 "set palette defined (0 '#000004', 1 '#1d1147', 2 '#51127c', 3 '#832681', 4 '#b73779', 5 '#e75263', "
-                 "6 '#fc8961', 7 '#fec488', 8 '#fcfdbf')\n",
-                 time(end_s), time(picture.begin_s), low, high,
-                 gnuplot_text(fmt::format("Level ({})", picture.level_unit)));
+  append(script,
+         "set lmargin at screen 0.08\nset rmargin at screen 0.86\nset bmargin at screen 0.09\n"
+         "set tmargin at screen 0.895\nset grid noxtics noytics nomxtics nomytics\nset tics out\n"
+         "set style textbox opaque fillcolor rgb '#101010' noborder margins 0.3,0.3\n"
+         "set colorbox user origin screen 0.88,screen 0.09 size screen 0.022,screen 0.805\n"
+         "set yrange [{:.12g}:{:.12g}]\n"
+         "set cbrange [{:.6g}:{:.6g}]\nset cblabel {} offset 1.5,0\nset format cb '%.10h'\n"
+         "set palette defined (0 '#000004', 1 '#1d1147', 2 '#51127c', 3 '#832681', 4 '#b73779', 5 '#e75263', "
+         "6 '#fc8961', 7 '#fec488', 8 '#fcfdbf')\n",
+         time(end_s), time(picture.begin_s), low, high, gnuplot_text(fmt::format("Level ({})", picture.level_unit)));
   int number = 2;
   for (const waterfall_box &box : picture.boxes) {
     const double left = std::max(scale.at(box.low_hz), scale.axis.low);
@@ -65,35 +64,34 @@ std::string waterfall_script(const waterfall_picture &picture, picture_type type
                  bottom = std::min(time(box.end_s), time(end_s));
     if (left >= right || top >= bottom) continue;
     if (static_cast<std::size_t>(number) >= most_boxes) break;
-    fmt::format_to(to,
-                   "set object {} rectangle from first {:.12g},first {:.12g} to first {:.12g},first {:.12g} front "
-                   "fs empty border lc rgb '#40ff80' lw 1.2\n",
-                   number, left, top, right, bottom);
+    append(script,
+           "set object {} rectangle from first {:.12g},first {:.12g} to first {:.12g},first {:.12g} front "
+           "fs empty border lc rgb '#40ff80' lw 1.2\n",
+           number, left, top, right, bottom);
     if (static_cast<std::size_t>(number) < most_labels && !box.text.empty()) {
       // Above the box where there is room, else inside of it.
       const bool inside = top - time(picture.begin_s) < 0.04 * (time(end_s) - time(picture.begin_s));
       const bool leans = left > scale.axis.low + 0.7 * (scale.axis.high - scale.axis.low);
-      fmt::format_to(to,
-                     "set label {} {} at first {:.12g},first {:.12g} {} offset {},{} noenhanced front boxed "
-                     "tc rgb '#40ff80' font ',10'\n",
-                     number, gnuplot_text(box.text), leans ? right : left, top, leans ? "right" : "left",
-                     leans ? -0.3 : 0.3, inside ? -0.6 : 0.5);
+      append(script,
+             "set label {} {} at first {:.12g},first {:.12g} {} offset {},{} noenhanced front boxed "
+             "tc rgb '#40ff80' font ',10'\n",
+             number, gnuplot_text(box.text), leans ? right : left, top, leans ? "right" : "left", leans ? -0.3 : 0.3,
+             inside ? -0.6 : 0.5);
     }
     ++number;
   }
   script += "$levels << end_of_levels\n";
   for (const std::vector<float> &row : picture.levels_db) {
     for (const float level : row)
-      fmt::format_to(to, "{:.1f} ", std::isfinite(level) ? static_cast<double>(level) : low - 1000);
+      append(script, "{:.1f} ", std::isfinite(level) ? static_cast<double>(level) : low - 1000);
     script += '\n';
   }
   const auto columns = static_cast<double>(picture.levels_db.front().size());
   const double width = (scale.axis.high - scale.axis.low) / columns, height = time(picture.step_s);
-  fmt::format_to(
-      to,
-      "end_of_levels\n"
-      "plot $levels matrix using ({:.12g}+($1+0.5)*{:.12g}):({:.12g}+($2+0.5)*{:.12g}):3 with image notitle\n",
-      scale.axis.low, width, time(picture.begin_s), height);
+  append(script,
+         "end_of_levels\n"
+         "plot $levels matrix using ({:.12g}+($1+0.5)*{:.12g}):({:.12g}+($2+0.5)*{:.12g}):3 with image notitle\n",
+         scale.axis.low, width, time(picture.begin_s), height);
   return script;
 }
 

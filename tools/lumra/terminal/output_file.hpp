@@ -1,17 +1,17 @@
 // A file that appears whole or not at all. SPDX-License-Identifier: MIT
 #pragma once
 
-#include <fmt/format.h>
-
 #include <cstdio>
 #include <filesystem>
 #include <optional>
 #include <span>
+#include <string>
 #include <utility>
 #include <vector>
 
 #include "recording/byte_sink.hpp"
 #include "recording/file.hpp"
+#include "terminal/append.hpp"
 #include "terminal/interruption.hpp"
 
 namespace tool {
@@ -29,8 +29,8 @@ class output_file final : public recording::byte_sink {
   template <class... Args>
   void print(fmt::format_string<Args...> text, Args &&...args) {
     text_.clear();
-    fmt::format_to(std::back_inserter(text_), text, std::forward<Args>(args)...);
-    write(std::as_bytes(std::span(text_.data(), text_.size())));
+    append(text_, text, std::forward<Args>(args)...);
+    write(std::as_bytes(std::span(text_)));
   }
   void write(std::span<const std::byte> bytes) override;
   /// Hands on what was written so far, for whoever reads while the work goes on.
@@ -59,7 +59,7 @@ class output_file final : public recording::byte_sink {
   std::optional<unfinished_file> unfinished_;  // none: written in place, or in its place
   bool appeared_ = false, replaced_ = false;
   recording::stream file_;
-  fmt::memory_buffer text_;
+  std::string text_;
 };
 
 }  // namespace tool

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include "terminal/printable.hpp"
+#include "terminal/append.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <iterator>
@@ -44,7 +45,7 @@ std::string printable(std::string_view text) {
     if (length > 0)
       result += text.substr(0, length);
     else
-      fmt::format_to(std::back_inserter(result), "\\x{:02X}", static_cast<unsigned char>(text.front()));
+      append(result, "\\x{:02X}", static_cast<unsigned char>(text.front()));
     text.remove_prefix(std::max<std::size_t>(length, 1));
   }
   return result;

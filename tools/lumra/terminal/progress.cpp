@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "terminal/progress.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 #include <unistd.h>
 
 #include <algorithm>

@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: MIT
 #include "terminal/results.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <iterator>
 
+#include "terminal/append.hpp"
 #include "terminal/console.hpp"
 #include "terminal/failure.hpp"
 #include "terminal/interruption.hpp"
@@ -31,8 +32,8 @@ void results::add_line(std::string_view label, std::string_view text) {
   const bool terminal = ::isatty(STDOUT_FILENO) == 1;
   const std::size_t width = terminal ? columns_of(STDOUT_FILENO) : std::string_view::npos;
   const bool styled = is_styled(STDOUT_FILENO);
-  fmt::format_to(std::back_inserter(summary_), "{}{:<{}}{}{}\n", styled ? "\033[1m" : "", label, indent,
-                 styled ? "\033[0m" : "", wrapped(printable(text), width, indent));
+  append(summary_, "{}{:<{}}{}{}\n", styled ? "\033[1m" : "", label, indent, styled ? "\033[0m" : "",
+         wrapped(printable(text), width, indent));
 }
 
 void results::add_gap() {
