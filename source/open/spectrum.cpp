@@ -31,7 +31,7 @@ struct spectrum_object {
 };
 using spectra = handles<lumra_spectrum_average, spectrum_object>;
 
-constexpr state_kind saved_spectrum{{'a', 'v', 'g'}, 1};
+constexpr state_kind saved_spectrum{{'a', 'v', 'g'}, 2};
 constexpr std::uint64_t fewest_points = 16;
 constexpr std::uint32_t most_threads = 1024;
 

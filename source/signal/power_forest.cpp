@@ -19,7 +19,10 @@ void add(const double *x, double *sum, std::size_t n) noexcept {
 }  // namespace
 
 template <class Real>
-power_forest<Real>::power_forest(std::size_t length, std::uint64_t begin) : length_(length), begin_(begin) {
+power_forest<Real>::power_forest(std::size_t length, std::uint64_t step, std::uint64_t begin)
+    : length_(length),
+      group_(static_cast<int>(std::bit_width(step - 1) + std::bit_width(most_in_group)) - 2),
+      begin_(begin) {
   trees_.reserve(2 * most_trees);  // its own, and those of another one that it takes over
   spare_.reserve(4 * most_trees);
 }
@@ -27,7 +30,7 @@ power_forest<Real>::power_forest(std::size_t length, std::uint64_t begin) : leng
 template <class Real>
 void power_forest<Real>::reserve(std::uint64_t rows, std::size_t trees) {
   // The levels of trees that cannot be joined yet rise and then fall, and double the rows with each step.
-  const std::size_t more = std::min<std::uint64_t>(rows, 2U * std::bit_width(rows) + 8U);
+  const std::size_t more = std::min<std::uint64_t>(rows, 2U * std::bit_width(rows) + most_in_group);
   fill_spare(more + trees);
 }
 
@@ -52,6 +55,12 @@ bool power_forest<Real>::closed_in_front(std::size_t k, int level) const noexcep
 }
 
 template <class Real>
+bool power_forest<Real>::are_joined(std::size_t k, int behind) const noexcept {
+  const int joint = level_behind(k);
+  return joint <= group_ ? closed_in_front(k, group_) : joint < behind && closed_in_front(k, joint);
+}
+
+template <class Real>
 void power_forest<Real>::join(std::size_t k) noexcept {
   add(trees_[k + 1].sum.data(), trees_[k].sum.data(), length_);
   trees_[k].last = trees_[k + 1].last;
@@ -61,12 +70,7 @@ void power_forest<Real>::join(std::size_t k) noexcept {
 
 template <class Real>
 void power_forest<Real>::settle(std::uint64_t next) noexcept {
-  while (trees_.size() >= 2) {
-    const std::size_t k = trees_.size() - 2;
-    const int joint = level_behind(k);
-    if (joint >= level(trees_.back().last, next) || !closed_in_front(k, joint)) return;
-    join(k);
-  }
+  while (trees_.size() >= 2 && are_joined(trees_.size() - 2, level(trees_.back().last, next))) join(trees_.size() - 2);
 }
 
 template <class Real>
@@ -75,7 +79,8 @@ auto power_forest<Real>::plant(std::uint64_t position, std::uint64_t next) noexc
   if (!trees_.empty()) {
     tree &before = trees_.back();
     const int joint = level(before.last, position);
-    if (joint < level(position, next) && closed_in_front(trees_.size() - 1, joint)) {
+    const bool in_group = joint <= group_;
+    if ((in_group || joint < level(position, next)) && closed_in_front(trees_.size() - 1, in_group ? group_ : joint)) {
       before.last = position;
       return {before.sum.data(), row_goes::on_top};
     }
@@ -87,9 +92,8 @@ auto power_forest<Real>::plant(std::uint64_t position, std::uint64_t next) noexc
 template <class Real>
 void power_forest<Real>::reduce(std::uint64_t next) noexcept {
   for (std::size_t k = 0; k + 1 < trees_.size();) {
-    const int joint = level_behind(k);
     const int behind = k + 2 < trees_.size() ? level_behind(k + 1) : level(trees_[k + 1].last, next);
-    if (joint < behind && closed_in_front(k, joint)) {
+    if (are_joined(k, behind)) {
       join(k);
       k -= std::min<std::size_t>(k, 1);
     } else {
@@ -132,9 +136,11 @@ void power_forest<Real>::fold(std::size_t first, std::size_t count, std::span<Re
     std::copy_n(trees_[first].sum.data(), length_, out.data());
     return;
   }
-  std::size_t left = 1;  // trees of the first half of the smallest stretch that holds all
+  // Trees of the first half of the smallest stretch that holds all; of one group, all but the last.
+  const auto level_at = [&](std::size_t k) { return std::max(level_behind(first + k - 1), group_); };
+  std::size_t left = 1;
   for (std::size_t k = 2; k < count; ++k)
-    if (level_behind(first + k - 1) > level_behind(first + left - 1)) left = k;
+    if (level_at(k) >= level_at(left)) left = k;
   const std::size_t right = count - left;
   if (left == 1) {
     fold(first + left, right, out);

@@ -15,9 +15,10 @@ namespace dsp {
 /// Into new memory, or added to what is there.
 enum class row_goes { in, on_top };
 
-/// Rows are the leaves of the binary tree of all positions: a stretch [m 2^L, (m + 1) 2^L) is the sum of its two
-/// halves, or the one of them that holds any. Which rows there are alone decides what is added to what. Trees whose
-/// stretch may still get rows, in front or behind, are kept side by side: at most two for each level.
+/// Rows are added one after the other within groups, stretches [m 2^g, (m + 1) 2^g) of positions. Groups are the leaves
+/// of the binary tree of all positions: a longer stretch is the sum of its two halves, or the one of them that holds
+/// any. Which rows there are alone decides what is added to what. Trees whose stretch may still get rows, in front or
+/// behind, are kept side by side: at most two for each level; and so are the rows of a group that began in front.
 template <class Real>
 class power_forest {
  public:
@@ -32,10 +33,12 @@ class power_forest {
   };
 
   static constexpr std::size_t most_trees = 128;
+  /// Rows of a group that are at least `step` positions apart.
+  static constexpr std::size_t most_in_group = 8;
 
-  /// Rows of `length` values at positions from `begin` on: what stands in front of that is not this forest's. Throws
-  /// std::bad_alloc.
-  power_forest(std::size_t length, std::uint64_t begin);
+  /// Rows of `length` values, `step` or more apart, at positions from `begin` on: what stands in front of that is not
+  /// this forest's. Throws std::bad_alloc.
+  power_forest(std::size_t length, std::uint64_t step, std::uint64_t begin);
 
   [[nodiscard]] std::span<const tree> trees() const noexcept { return trees_; }
   [[nodiscard]] std::size_t length() const noexcept { return length_; }
@@ -67,13 +70,17 @@ class power_forest {
   [[nodiscard]] int level_behind(std::size_t k) const noexcept { return level(trees_[k].last, trees_[k + 1].first); }
   /// Whether a stretch of that level around tree k gets no row in front of tree k any more.
   [[nodiscard]] bool closed_in_front(std::size_t k, int level) const noexcept;
-  void join(std::size_t k) noexcept;  // tree k and the one behind it
+  /// Whether tree k and the one behind it make one sum, where the row behind both will be in a stretch of level
+  /// `behind` with the latter.
+  [[nodiscard]] bool are_joined(std::size_t k, int behind) const noexcept;
+  void join(std::size_t k) noexcept;
   void reduce(std::uint64_t next) noexcept;
   void fold(std::size_t first, std::size_t count, std::span<Real> out) const;
   void fill_spare(std::size_t count);
   qsrfhs::aligned_buffer<Real> buffer() noexcept;
 
   std::size_t length_;
+  int group_;  // the level of a group
   std::uint64_t begin_;
   std::vector<tree> trees_;
   std::vector<qsrfhs::aligned_buffer<Real>> spare_;

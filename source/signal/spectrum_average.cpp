@@ -35,7 +35,7 @@ void lower(std::span<const Real> x, std::span<Real> minimum) noexcept {
 
 template <class Sample>
 spectrum_average<Sample>::lane::lane(const spectrum_average &owner)
-    : power(owner.window_.elements()), forest(owner.bins(), owner.settings_.start) {
+    : power(owner.window_.elements()), forest(owner.bins(), owner.settings_.step, owner.settings_.start) {
   if (owner.settings_.hold == extremes::forgotten) return;
   leaf = qsrfhs::aligned_buffer<real>(owner.bins());
   maximum = qsrfhs::aligned_buffer<real>(owner.bins());
