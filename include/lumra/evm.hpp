@@ -5,9 +5,12 @@
 #include <lumra/object.hpp>
 
 #include <complex>
+#include <cstddef>
 #include <cstdint>
 #include <span>
 #include <type_traits>
+#include <utility>
+#include <vector>
 
 namespace lumra {
 
@@ -47,6 +50,78 @@ lumra_evm_result measure_evm(std::span<const T> reference, std::type_identity_t<
   check_open(run(detail::raw(reference.data()), detail::raw(measured.data()), reference.size(), &how, &result,
                  detail::raw(traces.error.data()), traces.magnitude.data(), traces.phase.data()));
   return result;
+}
+
+/// Two streams of T beside each other under a model; see evm.h. One thread at a time.
+template <sample T>
+class evm_meter {
+  static_assert(!std::is_same_v<T, real_type<T>>);
+
+ public:
+  /// The type of the options is left out.
+  explicit evm_meter(lumra_evm_meter_options options = LUMRA_EVM_METER_OPTIONS)
+      : meter_(detail::make<owned>([&options](lumra_evm_meter **out) {
+          options.type = detail::type_code<T>;
+          return lumra_evm_meter_create(&options, out);
+        })) {}
+
+  void add(std::span<const T> reference, std::span<const T> measured) {
+    detail::require_length(measured.size(), reference.size());
+    check_open(lumra_evm_meter_add(meter_.get(), reference.data(), measured.data(), reference.size()));
+  }
+  /// `next` begins where this one ends.
+  void merge(const evm_meter &next) { check_open(lumra_evm_meter_merge(meter_.get(), next.meter_.get())); }
+
+  /// The errors under the model.
+  [[nodiscard]] lumra_evm_result read() const {
+    lumra_evm_result result{};
+    result.size = sizeof result;
+    check_open(lumra_evm_meter_read(meter_.get(), &result));
+    return result;
+  }
+  /// A better model.
+  [[nodiscard]] lumra_evm_refinement refine() const {
+    lumra_evm_refinement refinement{};
+    refinement.size = sizeof refinement;
+    check_open(lumra_evm_meter_refine(meter_.get(), &refinement));
+    return refinement;
+  }
+  [[nodiscard]] lumra_evm_meter_extent where() const { return where(meter_.get()); }
+
+  [[nodiscard]] std::vector<std::byte> save() const {
+    return detail::save(meter_.get(), &lumra_evm_meter_state_size, &lumra_evm_meter_save);
+  }
+  /// Replaces the meter by a saved one, which must be of T.
+  void load(std::span<const std::byte> bytes) {
+    auto loaded = detail::make<owned>(
+        [&](lumra_evm_meter **out) { return lumra_evm_meter_load(bytes.data(), bytes.size(), out); });
+    if (where(loaded.get()).type != detail::type_code<T>)
+      throw error(status(LUMRA_WRONG_TYPE), "the saved meter is of another type");
+    meter_ = std::move(loaded);
+  }
+
+ private:
+  using owned = detail::owned<lumra_evm_meter, &lumra_evm_meter_free>;
+
+  static lumra_evm_meter_extent where(const lumra_evm_meter *meter) {
+    lumra_evm_meter_extent extent{};
+    check_open(lumra_evm_meter_where(meter, &extent));
+    return extent;
+  }
+
+  owned meter_;
+};
+
+/// Errors under a known model in units of the reference; see lumra_evm_errors. The type of the options is left out.
+template <sample T>
+void trace_evm(lumra_evm_meter_options options, std::span<const T> reference,
+               std::type_identity_t<std::span<const T>> measured, const error_traces<T> &traces) {
+  detail::require_length(measured.size(), reference.size());
+  for (const std::size_t length : {traces.error.size(), traces.magnitude.size(), traces.phase.size()})
+    if (length != 0) detail::require_length(length, reference.size());
+  options.type = detail::type_code<T>;
+  check_open(lumra_evm_errors(&options, reference.data(), measured.data(), reference.size(), traces.error.data(),
+                              traces.magnitude.data(), traces.phase.data()));
 }
 
 }  // namespace lumra

@@ -39,20 +39,26 @@ template <class Sample>
 stretch delayed_reference<Sample>::known(double delay) const noexcept {
   const auto n = static_cast<double>(reference_.size()), skipped = static_cast<double>(guard(reference_.size()));
   const double first = std::clamp(std::ceil(skipped + delay), 0.0, n);
-  const double last = std::clamp(std::floor(n - skipped + delay), first, n);
+  const double last = std::clamp(n + std::floor(delay - skipped), first, n);
   return {static_cast<std::size_t>(first), static_cast<std::size_t>(last)};
 }
 
 template <class Sample>
-void delayed_reference<Sample>::load(std::size_t first, std::size_t count) {
-  stretch wanted{first - std::min(first, margin), std::min(first + count + margin, reference_.size())};
-  if (reference_.size() <= longest_block && 2 * wanted.count() > reference_.size()) wanted = {0, reference_.size()};
+void delayed_reference<Sample>::prepare(std::size_t points) {
+  if (!transform_ || transform_->length() != points)
+    transform_ = std::make_unique<block_transform<std::complex<double>>>(points);
+  for (buffer *room : {&spectrum_, &turned_, &delayed_, &slopes_})
+    if (room->size() < points) *room = buffer(points);
+}
+
+template <class Sample>
+void delayed_reference<Sample>::load(const stretch &part) {
+  stretch wanted{part.first - std::min(part.first, margin), std::min(part.last + margin, reference_.size())};
+  if (2 * wanted.count() > reference_.size()) wanted = {0, reference_.size()};
   if (transform_ && wanted.first == window_.first && wanted.last == window_.last) return;
   const qsrfhs::mkl_runtime::use in_use;
   const std::size_t points = wanted.count();
-  if (!transform_ || transform_->length() != points)
-    transform_ = std::make_unique<block_transform<std::complex<double>>>(points);
-  for (buffer *room : {&spectrum_, &turned_, &delayed_, &slopes_}) prepare(*room, points);
+  prepare(points);
   std::copy_n(reference_.data() + wanted.first, points, delayed_.data());
   transform_->forward(delayed_.data(), spectrum_.data());
   if (!fills_band({spectrum_.data(), points})) {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <complex>
 #include <cstddef>
@@ -23,14 +24,24 @@ struct stretch {
 /// Derivatives of a delayed record by the delay.
 enum class slopes { left_out, computed };
 
-/// A record delayed by fractions of a sample, in double precision and blocks of moderate length: each block's Fourier
-/// transform with its phases turned. Blocks are computed with neighbouring samples on both sides, as far as there are.
+/// A record delayed by fractions of a sample, in double precision: its Fourier transform with the phases turned. Parts
+/// of it are computed with neighbouring samples on both sides, as far as there are.
 template <class Sample>
 class delayed_reference {
  public:
-  static constexpr std::size_t longest_block = std::size_t{1} << 20;
+  /// The longest record that is delayed; as it is, it may be of any length.
+  static constexpr std::size_t longest = std::size_t{1} << 18;
 
   explicit delayed_reference(std::span<const Sample> reference) noexcept : reference_(reference) {}
+
+  /// Takes another record in the place of this one.
+  void renew(std::span<const Sample> reference) noexcept {
+    reference_ = reference;
+    window_ = {0, 0};
+    shifted_ = std::numeric_limits<double>::quiet_NaN();
+  }
+  /// Makes the room for delayed records of that length. Throws std::bad_alloc, dfti_failure.
+  void prepare(std::size_t points);
 
   /// Samples that interpolation does not know well at the ends of a record.
   static std::size_t guard(std::size_t n) noexcept { return std::min<std::size_t>(32, n / 8); }
@@ -38,40 +49,36 @@ class delayed_reference {
   [[nodiscard]] stretch known(double delay) const noexcept;
 
   /// Calls visit(first, values, slopes) with values[k] = x(first + k - delay) and, if asked for, their derivatives by
-  /// the delay, block by block over a stretch. Without a delay and slopes these are the samples. Throws
-  /// std::bad_alloc, dfti_failure.
+  /// the delay, piece by piece over a stretch. Without a delay and slopes these are the samples. Throws
+  /// std::bad_alloc, dfti_failure where there is no room yet.
   template <class Visit>
   void walk(const stretch &part, double delay, slopes wanted, Visit visit) {
     using values = std::span<const std::complex<double>>;
-    const bool as_is = delay == 0 && wanted == slopes::left_out;
-    const std::size_t block = as_is ? 4096 : longest_block - 2 * margin;
-    for (std::size_t first = part.first, count = 0; first < part.last; first += count) {
-      count = std::min(part.last - first, reference_.size() <= longest_block && !as_is ? part.count() : block);
-      if (as_is) {
-        prepare(delayed_, count);
-        std::copy_n(reference_.data() + first, count, delayed_.data());
-        shifted_ = std::numeric_limits<double>::quiet_NaN();
-        visit(first, values(delayed_.data(), count), values());
-        continue;
+    if (part.first >= part.last) return;
+    if (delay == 0 && wanted == slopes::left_out) {
+      constexpr std::size_t piece = 4096;
+      std::array<std::complex<double>, piece> room;
+      for (std::size_t first = part.first; first < part.last; first += piece) {
+        const std::size_t count = std::min(part.last - first, piece);
+        std::copy_n(reference_.data() + first, count, room.data());
+        visit(first, values(room.data(), count), values());
       }
-      load(first, count);
-      if (wanted == slopes::computed || delay != shifted_) shift(delay, wanted);
-      const std::size_t inside = first - window_.first;
-      visit(first, values(delayed_.data() + inside, count),
-            wanted == slopes::computed ? values(slopes_.data() + inside, count) : values());
+      return;
     }
+    load(part);
+    if (wanted == slopes::computed || delay != shifted_) shift(delay, wanted);
+    const std::size_t inside = part.first - window_.first;
+    visit(part.first, values(delayed_.data() + inside, part.count()),
+          wanted == slopes::computed ? values(slopes_.data() + inside, part.count()) : values());
   }
 
  private:
   using buffer = qsrfhs::aligned_buffer<std::complex<double>>;
 
-  static constexpr std::size_t margin = 8192;  // samples around a block: the longest delay, and where ends still show
+  static constexpr std::size_t margin = 8192;  // samples around a part: the longest delay, and where ends still show
 
-  static void prepare(buffer &room, std::size_t count) {
-    if (room.size() < count) room = buffer(count);
-  }
-  /// The spectrum of a block with its margins, unless it is there.
-  void load(std::size_t first, std::size_t count);
+  /// The spectrum of a part with its margins, unless it is there.
+  void load(const stretch &part);
   /// Computes delayed_, and slopes_ if asked for, of the window.
   void shift(double delay, slopes wanted);
 

@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include "signal/error_vectors.hpp"
 
-#include <mkl_vml.h>
-
 #include <algorithm>
 #include <array>
 #include <cmath>
@@ -16,15 +14,10 @@ namespace {
 
 using wide = std::complex<double>;
 
-constexpr std::size_t run = 512;
-
-double power(wide v) noexcept {
-  return v.real() * v.real() + v.imag() * v.imag();
-}
-
 /// Calls visit(first, carried) run by run over the part: the reference as the model delays it, on the model's carrier.
 template <class Sample, class Visit>
 void walk_carried(delayed_reference<Sample> &reference, const stretch &part, const stream_model &model, Visit visit) {
+  constexpr std::size_t run = error_sums::longest_run;
   reference.walk(part, model.delay, slopes::left_out, [&](std::size_t first, std::span<const wide> values, auto) {
     std::array<wide, run> room;
     for (std::size_t begin = 0; begin < values.size(); begin += run) {
@@ -39,122 +32,153 @@ void walk_carried(delayed_reference<Sample> &reference, const stretch &part, con
   });
 }
 
-/// Sums over all that is compared, from which gain, dc and correlation follow.
-struct moments {
-  double reference = 0, measured = 0;  // powers
-  wide product = 0;                    // of the measured and the conjugated reference
-  wide reference_dc = 0, measured_dc = 0;
-
-  void add(wide u, wide m) noexcept {
-    reference += power(u);
-    measured += power(m);
-    product += times(m, std::conj(u));
-    reference_dc += u;
-    measured_dc += m;
-  }
-  void add(const moments &other) noexcept {
-    reference += other.reference;
-    measured += other.measured;
-    product += other.product;
-    reference_dc += other.reference_dc;
-    measured_dc += other.measured_dc;
-  }
-  /// What is left without the direct parts.
-  [[nodiscard]] moments centred(double count) const noexcept {
-    moments rest = *this;
-    rest.reference -= power(reference_dc) / count;
-    rest.measured -= power(measured_dc) / count;
-    rest.product -= times(measured_dc, std::conj(reference_dc)) / count;
-    return rest;
-  }
-};
-
-/// Sets gain and dc of the model, and the reference's RMS.
-error_outcome fit(const moments &all, const alignment &wanted, error_figures &figures) {
-  // Errors of ten times the reference, or a correlation that one of so many trials finds in unrelated noise.
-  constexpr double least = 0.01, for_search = 20, most = 0.5;
-  constexpr double no_variation = 1e-12;
-  const auto count = static_cast<double>(figures.compared.count());
-  if (all.reference == 0) return error_outcome::silent_reference;
-  figures.reference_rms = std::sqrt(all.reference / count);
-  const moments rest = wanted.dc ? all.centred(count) : all;
-  if (wanted.gain || wanted.searched()) {
-    if (rest.reference <= no_variation * all.reference) return error_outcome::undetermined;
-    const double correlation = power(rest.product) / rest.reference / rest.measured;
-    const double threshold = wanted.searched() ? std::min(least + for_search / count, most) : least;
-    if (!(correlation >= threshold)) return error_outcome::unrelated;
-  }
-  if (wanted.gain) figures.model.gain = rest.product / rest.reference;
-  if (wanted.dc) figures.model.dc = (all.measured_dc - times(figures.model.gain, all.reference_dc)) / count;
-  return error_outcome::measured;
-}
-
-/// Angles of a run of products, those of 0 being 0.
-void find_angles(std::span<const wide> products, double *angles) noexcept {
-  std::array<double, run> re, im;
-  for (std::size_t k = 0; k < products.size(); ++k) {
-    const bool none = products[k] == 0.0;
-    re[k] = none ? 1 : products[k].real();
-    im[k] = none ? 0 : products[k].imag();
-  }
-  vmdAtan2(static_cast<MKL_INT>(products.size()), im.data(), re.data(), angles, VML_HA);
-}
-
 template <class Real>
-void fill_ends(Real *trace, std::size_t n, const stretch &compared, Real value) noexcept {
-  if (!trace) return;
-  std::fill_n(trace, compared.first, value);
-  std::fill(trace + compared.last, trace + n, value);
+void fill_ends(const error_traces<Real> &traces, std::size_t n, const stretch &compared) noexcept {
+  constexpr Real nan = std::numeric_limits<Real>::quiet_NaN();
+  const auto fill = [&](auto *trace, auto value) {
+    if (!trace) return;
+    std::fill_n(trace, compared.first, value);
+    std::fill(trace + compared.last, trace + n, value);
+  };
+  fill(traces.error, std::complex<Real>(nan, nan));
+  fill(traces.magnitude, nan);
+  fill(traces.phase, nan);
 }
 
 template <class Real>
 void measure_model(delayed_reference<std::complex<Real>> &delayed, std::span<const std::complex<Real>> measured,
-                   const error_traces<Real> &traces, error_figures &figures) {
-  const stream_model &model = figures.model;
-  const wide inverse_gain = 1.0 / model.gain;
+                   const stretch &compared, const error_traces<Real> &traces, error_figures &figures) {
   const double scale = 1 / figures.reference_rms;
-  double error_power = 0, magnitude_power = 0, phase_power = 0;
-  walk_carried(delayed, figures.compared, model, [&](std::size_t first, std::span<const wide> carried) {
-    std::array<wide, run> errors, products;
-    std::array<double, run> magnitudes, angles;
-    const std::size_t count = carried.size();
-    for (std::size_t k = 0; k < count; ++k) {
-      const wide z = times(wide(measured[first + k]) - model.dc, inverse_gain), u = carried[k];
-      errors[k] = (z - u) * scale;
-      magnitudes[k] = (std::sqrt(power(z)) - std::sqrt(power(u))) * scale;
-      products[k] = times(z, std::conj(u));
-    }
-    find_angles({products.data(), count}, angles.data());
-    double sums[3] = {};
-    for (std::size_t k = 0; k < count; ++k) {
-      const double p = power(errors[k]);
-      figures.peak.take(p, first + k);
-      sums[0] += p;
-      sums[1] += magnitudes[k] * magnitudes[k];
-      sums[2] += angles[k] * angles[k];
-    }
-    error_power += sums[0];
-    magnitude_power += sums[1];
-    phase_power += sums[2];
-    if (traces.error) {
-      if (model.frequency != 0)
-        rotate(std::span(errors).first(count), -model.frequency, static_cast<double>(first), 1, errors);
-      for (std::size_t k = 0; k < count; ++k) traces.error[first + k] = std::complex<Real>(errors[k]);
-    }
-    if (traces.magnitude)
-      for (std::size_t k = 0; k < count; ++k) traces.magnitude[first + k] = static_cast<Real>(magnitudes[k]);
-    if (traces.phase)
-      for (std::size_t k = 0; k < count; ++k) traces.phase[first + k] = static_cast<Real>(angles[k]);
+  error_sums sums;
+  walk_carried(delayed, compared, figures.model, [&](std::size_t first, std::span<const wide> carried) {
+    sums.add(carried, measured.data() + first, figures.model, first, scale, traces.from(first));
   });
-  const auto count = static_cast<double>(figures.compared.count());
-  figures.rms = std::sqrt(error_power / count);
-  figures.magnitude_rms = std::sqrt(magnitude_power / count);
-  figures.phase_rms = std::sqrt(phase_power / count);
-  constexpr Real nan = std::numeric_limits<Real>::quiet_NaN();
-  fill_ends(traces.error, measured.size(), figures.compared, std::complex<Real>(nan, nan));
-  fill_ends(traces.magnitude, measured.size(), figures.compared, nan);
-  fill_ends(traces.phase, measured.size(), figures.compared, nan);
+  const auto count = static_cast<double>(compared.count());
+  figures.peak = sums.peak;
+  figures.rms = std::sqrt(sums.error / count);
+  figures.magnitude_rms = std::sqrt(sums.magnitude / count);
+  figures.phase_rms = std::sqrt(sums.phase / count);
+  fill_ends(traces, measured.size(), compared);
 }
+
+/// Records that delayed_reference takes as a whole, and those that need no search.
+template <class Real>
+error_outcome measure_whole(std::span<const std::complex<Real>> reference, std::span<const std::complex<Real>> measured,
+                            const alignment &wanted, const error_traces<Real> &traces, error_figures &figures) {
+  delayed_reference<std::complex<Real>> delayed(reference);
+  if (wanted.searched()) {
+    const alignment_outcome outcome = find_delay_and_frequency(reference, measured, wanted, delayed, figures.model);
+    if (outcome == alignment_outcome::unrelated) return error_outcome::unrelated;
+    if (outcome == alignment_outcome::undetermined) return error_outcome::undetermined;
+  }
+  const stretch compared = wanted.delay ? delayed.known(figures.model.delay) : stretch{0, reference.size()};
+  figures.compared = {compared.first, compared.last};
+  stream_moments all;
+  walk_carried(delayed, compared, figures.model, [&](std::size_t first, std::span<const wide> carried) {
+    all.add(carried, {}, measured.data() + first, static_cast<double>(first));
+  });
+  const auto count = static_cast<double>(compared.count());
+  figures.reference_rms = std::sqrt(all.reference / count);
+  model_change change;
+  const error_outcome outcome =
+      fit_model(all, count, {wanted.gain, false, false, wanted.dc}, wanted.searched(), figures.model, change);
+  if (outcome == error_outcome::measured) measure_model(delayed, measured, compared, traces, figures);
+  return outcome;
+}
+
+/// Calls visit(block) over all blocks of a record.
+template <class Visit>
+void walk_blocks(const positions &record, Visit visit) {
+  for (std::uint64_t k = record.first / error_block::length; k * error_block::length < record.last; ++k)
+    visit(error_block(k, record));
+}
+
+/// A part of n samples that is as long as it may be, with this one in its middle.
+positions around(const positions &part, double reach, std::uint64_t n) noexcept {
+  if (!(reach < static_cast<double>(n))) return {0, n};
+  const auto count = static_cast<std::uint64_t>(reach);
+  const std::uint64_t middle = part.first + part.count() / 2;
+  const std::uint64_t first = std::min(middle - std::min(middle, count / 2), n - count);
+  return {first, first + count};
+}
+
+/// Longer records, beginning where the reference has the most energy.
+template <class Real>
+class long_record {
+ public:
+  using samples = std::span<const std::complex<Real>>;
+
+  long_record(samples reference, samples measured, const alignment &wanted) noexcept
+      : reference_(reference), measured_(measured), wanted_(wanted) {}
+
+  error_outcome align(stream_model &model) const {
+    positions part = loudest();
+    error_figures begun;
+    const error_outcome found = measure_whole<Real>(of(reference_, part), of(measured_, part), wanted_, {}, begun);
+    if (found != error_outcome::measured) return found;
+    model.delay = begun.model.delay;
+    model.frequency = begun.model.frequency;
+    constexpr int most_rounds = 24;
+    const std::uint64_t n = reference_.size();
+    for (int round = 0; round < most_rounds; ++round) {
+      const error_totals totals = sum(part, model, wanted_.delay);
+      const positions compared = wanted_.delay ? known_positions(part, model.delay) : part;
+      model_refinement refined;
+      const error_outcome outcome = totals.refine(part, compared, wanted_, model, refined);
+      if (outcome != error_outcome::measured) return outcome;
+      model = refined.model;
+      if (part.count() == n && refined.settled) break;
+      part = around(part, refined.reach, n);
+    }
+    return error_outcome::measured;
+  }
+
+  error_outcome measure(const stream_model &model, const error_traces<Real> &traces, error_figures &figures) const {
+    const positions all{0, reference_.size()};
+    const positions compared = model.delay != 0 ? known_positions(all, model.delay) : all;
+    const error_outcome outcome = sum(all, model, false, traces).read(compared, model, figures);
+    if (outcome != error_outcome::measured) return outcome;
+    const double scale = 1 / figures.reference_rms;
+    for (std::size_t k = compared.first; k < compared.last; ++k) {
+      if (traces.error) traces.error[k] = std::complex<Real>(wide(traces.error[k]) * scale);
+      if (traces.magnitude) traces.magnitude[k] = static_cast<Real>(static_cast<double>(traces.magnitude[k]) * scale);
+    }
+    fill_ends(traces, reference_.size(), {compared.first, compared.last});
+    return outcome;
+  }
+
+ private:
+  static samples of(samples x, const positions &part) noexcept { return x.subspan(part.first, part.count()); }
+
+  [[nodiscard]] positions loudest() const noexcept {
+    constexpr std::size_t length = delayed_reference<std::complex<Real>>::longest;
+    positions best{0, length};
+    double most = -1;
+    for (std::size_t first = 0; first < reference_.size(); first += length) {
+      const std::size_t begin = std::min(first, reference_.size() - length);
+      double energy = 0;
+      for (const auto &v : reference_.subspan(begin, length)) energy += std::norm(wide(v));
+      if (energy <= most || std::isnan(energy)) continue;
+      most = energy;
+      best = {begin, begin + length};
+    }
+    return best;
+  }
+
+  [[nodiscard]] error_totals sum(const positions &part, const stream_model &model, bool with_slopes,
+                                 const error_traces<Real> &traces = {}) const {
+    error_totals totals;
+    block_comparison<Real> comparison(model, with_slopes);
+    walk_blocks(part, [&](const error_block &block) {
+      totals.add(comparison.compare(of(reference_, block.around), of(measured_, block.around), block.around.first,
+                                    block.part(), traces.from(block.around.first)));
+    });
+    return totals;
+  }
+
+  samples reference_, measured_;
+  const alignment &wanted_;
+};
 
 }  // namespace
 
@@ -166,27 +190,32 @@ error_outcome measure_errors(std::span<const std::complex<Real>> reference,
   if (std::all_of(reference.begin(), reference.end(), [](const sample &v) { return v == Real(0); }))
     return error_outcome::silent_reference;
   const qsrfhs::mkl_runtime::use in_use;
-  delayed_reference<sample> delayed(reference);
-  if (wanted.searched()) {
-    const alignment_outcome outcome = find_delay_and_frequency(reference, measured, wanted, delayed, figures.model);
-    if (outcome == alignment_outcome::unrelated) return error_outcome::unrelated;
-    if (outcome == alignment_outcome::undetermined) return error_outcome::undetermined;
-  }
-  figures.compared = wanted.delay ? delayed.known(figures.model.delay) : stretch{0, reference.size()};
-  moments all;
-  walk_carried(delayed, figures.compared, figures.model, [&](std::size_t first, std::span<const wide> carried) {
-    moments here;
-    for (std::size_t k = 0; k < carried.size(); ++k) here.add(carried[k], wide(measured[first + k]));
-    all.add(here);
-  });
-  const error_outcome outcome = fit(all, wanted, figures);
-  if (outcome == error_outcome::measured) measure_model(delayed, measured, traces, figures);
-  return outcome;
+  if (!wanted.searched() || reference.size() <= delayed_reference<sample>::longest)
+    return measure_whole(reference, measured, wanted, traces, figures);
+  const long_record<Real> record(reference, measured, wanted);
+  stream_model model;
+  const error_outcome outcome = record.align(model);
+  return outcome == error_outcome::measured ? record.measure(model, traces, figures) : outcome;
 }
 
-template error_outcome measure_errors(std::span<const std::complex<float>>, std::span<const std::complex<float>>,
-                                      const alignment &, const error_traces<float> &, error_figures &);
-template error_outcome measure_errors(std::span<const std::complex<double>>, std::span<const std::complex<double>>,
-                                      const alignment &, const error_traces<double> &, error_figures &);
+template <class Real>
+void trace_errors(std::span<const std::complex<Real>> reference, std::span<const std::complex<Real>> measured,
+                  std::uint64_t position, const stream_model &model, const error_traces<Real> &traces) {
+  const qsrfhs::mkl_runtime::use in_use;
+  block_comparison<Real> comparison(model, false);
+  const positions all{0, reference.size()};
+  const positions known = comparison.is_delayed() ? known_positions(all, model.delay) : all;
+  (void)comparison.compare(reference, measured, position, {0, reference.size()}, traces);
+  fill_ends(traces, reference.size(), {known.first, known.last});
+}
+
+#define INSTANCES(REAL)                                                                                               \
+  template error_outcome measure_errors(std::span<const std::complex<REAL>>, std::span<const std::complex<REAL>>,     \
+                                        const alignment &, const error_traces<REAL> &, error_figures &);              \
+  template void trace_errors(std::span<const std::complex<REAL>>, std::span<const std::complex<REAL>>, std::uint64_t, \
+                             const stream_model &, const error_traces<REAL> &);
+INSTANCES(float)
+INSTANCES(double)
+#undef INSTANCES
 
 }  // namespace dsp

@@ -2,36 +2,24 @@
 #pragma once
 
 #include <complex>
-#include <cstddef>
 #include <span>
 
-#include "signal/evm_alignment.hpp"
-#include "signal/level.hpp"
+#include "signal/evm_totals.hpp"
 
 namespace dsp {
 
-/// Values a sample, as many as the record has; null where not wanted.
-template <class Real>
-struct error_traces {
-  std::complex<Real> *error = nullptr;
-  Real *magnitude = nullptr, *phase = nullptr;
-};
-
-struct error_figures {
-  stretch compared{0, 0};
-  stream_model model;
-  double reference_rms = 0;
-  double rms = 0, magnitude_rms = 0, phase_rms = 0;  // of the reference's RMS, and radians
-  power_peak peak;                                   // square of the largest error, position in the record
-};
-
-enum class error_outcome { measured, silent_reference, unrelated, undetermined };
-
-/// Aligns what is wanted of `measured` with a reference as long, and compares them. The traces are written only where
-/// it returns `measured`. Throws std::bad_alloc, dfti_failure.
+/// Aligns what is wanted of `measured` with a reference as long, and compares them. The traces, fractions of the
+/// reference's RMS, are as long; they are written only where it returns `measured`. Throws std::bad_alloc,
+/// dfti_failure.
 template <class Real>
 error_outcome measure_errors(std::span<const std::complex<Real>> reference,
                              std::span<const std::complex<Real>> measured, const alignment &wanted,
                              const error_traces<Real> &traces, error_figures &figures);
+
+/// Errors under a model that is known, in units of the reference, of samples from a position on. Not more samples than
+/// delayed_reference takes where there is a delay. Throws as above.
+template <class Real>
+void trace_errors(std::span<const std::complex<Real>> reference, std::span<const std::complex<Real>> measured,
+                  std::uint64_t position, const stream_model &model, const error_traces<Real> &traces);
 
 }  // namespace dsp

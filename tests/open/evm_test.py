@@ -52,6 +52,52 @@ def measure(reference, measured, align=0, kind="cf64", rate=1.0, traces=(None, N
     return result
 
 
+MODEL = ("gain_re", "gain_im", "delay_samples", "frequency_hz", "dc_re", "dc_im")
+BLOCK, WINDOW = 245760, 262144
+
+
+def meter_of(r, y, start=0, cuts=0, **options):
+    """A meter of all samples, from random cuts, merges, and states."""
+    meter = lumra.create("evm_meter", type=lumra.type_code("cf32" if r.dtype == np.complex64 else "cf64"), start=start, **options)
+    if cuts == 0:
+        lumra.call("evm_meter_add", meter, lumra.odd(r), lumra.odd(y), len(r))
+        return meter
+    at = int(rng.integers(0, len(r) + 1))
+    if rng.random() < 0.3:
+        lumra.call("evm_meter_add", meter, r[:at], y[:at], at)
+        lumra.call("evm_meter_add", meter, r[at:], y[at:], len(r) - at)
+        return meter
+    meter = meter_of(r[:at], y[:at], start, cuts - 1, **options)
+    lumra.call("evm_meter_merge", meter, meter_of(r[at:], y[at:], start + at, cuts - 1, **options))
+    return lumra.load("evm_meter", lumra.save(meter)) if rng.random() < 0.3 else meter
+
+
+def read(meter, what="result"):
+    found = lumra.record(f"evm_{what}")
+    found.size = ctypes.sizeof(found)
+    lumra.call(f"evm_meter_{'read' if what == 'result' else 'refine'}", meter, found)
+    return found
+
+
+def chunked(r, y, align, rate):
+    """The settled model of records that a meter sees in pieces."""
+    n = len(r)
+    parts = [min(k, n - WINDOW) for k in range(0, n, WINDOW)]
+    first, count = max(parts, key=lambda k: np.sum(np.abs(r[k : k + WINDOW].astype(complex)) ** 2)), WINDOW
+    kind = "cf32" if r.dtype == np.complex64 else "cf64"
+    begun = measure(r[first : first + count], y[first : first + count], align, kind, rate)
+    model = {"delay_samples": begun.delay_samples, "frequency_hz": begun.frequency_hz, "sample_rate_hz": rate}
+    for _ in range(8):
+        here = slice(first, first + count)
+        better = read(meter_of(r[here], y[here], first, 3, align=align, **model), "refinement")
+        model |= {name: getattr(better, name) for name in MODEL}
+        if better.settled and count == n:
+            return model
+        middle, count = first + count // 2, min(better.reach, n)
+        first = min(max(middle - count // 2, 0), n - count)
+    raise AssertionError("the model does not settle")
+
+
 class Evm(lumra.Test):
     def test_plain_formulas(self):
         n, rate = 5001, 1e6
@@ -132,6 +178,86 @@ class Evm(lumra.Test):
             self.assertFalse(np.isnan(trace[inside]).any())
         clean = measure(reference, measured - gain * impulse * np.exp(2j * np.pi * frequency * np.arange(n)), 15)
         self.assertLess(clean.rms, 2e-5)
+
+    def test_chunks_have_the_bits_of_the_whole(self):
+        n, rate = 400_000, 1e6
+        reference = symbols(n, 0)
+        for kind, align, delay, frequency in (("cf64", 15, -300.5, 0.2), ("cf32", DELAY | DC, 77.3, 0)):
+            r = reference.astype(TYPES[kind][0])
+            y = carried(symbols(n, delay), 1 if align & DC else 2j, frequency, 0.1 if align & DC else 0, 30).astype(r.dtype)
+            traces = np.empty(n, r.dtype), np.empty(n, r.real.dtype), np.empty(n, r.real.dtype)
+            whole = measure(r, y, align, kind, rate, traces)
+            model = chunked(r, y, align, rate)
+            self.assertEqual(bytes(whole), bytes(read(meter_of(r, y, 0, 3, **model))), (kind, align))
+            for first in (0, BLOCK - 8192):  # windows of blocks
+                count, begin = min(WINDOW, n - first), min(first, 8192)
+                inner = slice(begin, begin + BLOCK)
+                errors = tuple(np.empty(count, t.dtype) for t in traces)
+                options = lumra.record("evm_meter", type=lumra.type_code(kind), start=first, **model)
+                lumra.call("evm_errors", options, r[first : first + count], y[first : first + count], count, *errors)
+                for k, (mine, all_of_them) in enumerate(zip(errors, traces)):
+                    mine, expected = mine[inner], all_of_them[first : first + count][inner]
+                    np.testing.assert_array_equal(np.isnan(expected), np.isnan(mine))
+                    self.close(np.nan_to_num(expected), np.nan_to_num(mine) / (1 if k == 2 else whole.reference_rms), TYPES[kind][2])
+
+    def test_same_bits_for_any_tree(self):
+        reference, measured = noise(500_000), noise(500_000)
+        reference[5] = measured[400_000] = 100
+        for start, n in ((0, 1), (0, 500_000), (1, 300), (BLOCK - 8193, 300_000), (2**62 - 500_000, 500_000)):
+            for options in ({"align": 15, "delay_samples": -2.5, "frequency_hz": 0.1}, {"dc_re": 1.0}):
+                r, y = reference[:n], measured[:n]
+                whole = meter_of(r, y, start, **options)
+                for _ in range(2):
+                    tree = meter_of(r, y, start, 4, **options)
+                    self.assertEqual(lumra.save(whole).tobytes(), lumra.save(tree).tobytes(), (start, n))
+                    self.assertEqual(bytes(read(whole)), bytes(read(tree)), (start, n)) if n > 1 else None
+
+    def test_meters_refuse(self):
+        r, tone, result, out = noise(1000), np.exp(0.3j * np.arange(1000)), lumra.record("evm_result", size=200), ctypes.c_void_p()
+        meter, late, empty = meter_of(r, r, 7), meter_of(r, r, 1008), meter_of(r[:0], r[:0], 2**62)
+        spoilt = np.where(np.arange(1000) == 5, np.nan, r)
+
+        def made(**changes):
+            return "evm_meter_create", lumra.record("evm_meter", **changes), out
+
+        refined, fresh = "evm_meter_refine", lumra.record("evm_refinement")
+        fresh.size = ctypes.sizeof(fresh)
+        for code, says, function, *arguments in [
+            ("UNKNOWN_CHOICE", "options->type is 8", *made(type=8)),
+            ("UNKNOWN_CHOICE", "options->align is 16", *made(align=16)),
+            ("OUT_OF_RANGE", "reserved is 1", *made(reserved=1)),
+            ("OUT_OF_RANGE", "start is", *made(start=2**62 + 1)),
+            ("OUT_OF_RANGE", "sample_rate_hz is 0", *made(sample_rate_hz=0)),
+            ("OUT_OF_RANGE", "gain_re and gain_im make 0", *made(gain_re=0)),
+            ("OUT_OF_RANGE", "delay_samples is 502", *made(delay_samples=502)),
+            ("OUT_OF_RANGE", "frequency_hz is nan", *made(frequency_hz=np.nan)),
+            ("OUT_OF_RANGE", "dc_im inf", *made(dc_im=np.inf)),
+            ("WRONG_OBJECT", "meter was freed", "evm_meter_add", r, r, r, 8),
+            ("NULL_ARGUMENT", "measured is null", "evm_meter_add", meter, r, None, 8),
+            ("OUT_OF_RANGE", "end at 2^62", "evm_meter_add", empty, r, r, 1),
+            ("OVERLAP", "next is meter", "evm_meter_merge", meter, meter),
+            ("WRONG_TYPE", "other options", "evm_meter_merge", meter, meter_of(r, r, 1007, dc_re=1.0)),
+            ("OUT_OF_RANGE", "starts at 1008; meter ends at 1007", "evm_meter_merge", meter, late),
+            ("NULL_ARGUMENT", "extent is null", "evm_meter_where", meter, None),
+            ("BAD_SIZE_FIELD", "result->size is 200", "evm_meter_read", meter, result),
+            ("TOO_FEW_SAMPLES", "none of the samples", refined, meter_of(r[:30], r[:30], delay_samples=100.0), fresh),
+            ("OUT_OF_RANGE", "the reference is zero", refined, meter_of(0 * r, r), fresh),
+            *[("NO_CONVERGENCE", "unrelated", refined, meter_of(r, x, align=1), fresh) for x in (noise(1000), spoilt, 0 * r)],
+            ("NO_CONVERGENCE", "told apart", refined, meter_of(tone, tone, align=3), fresh),
+            ("OUT_OF_RANGE", "at most 262144", "evm_errors", lumra.record("evm_meter", delay_samples=1.0), r, r, WINDOW + 1, None, None, None),
+            ("OVERLAP", "error overlaps measured", "evm_errors", None, r, tone, 1000, tone, None, None),
+            ("TOO_FEW_SAMPLES", "n is 0", "evm_errors", None, r, r, 0, None, None, None),
+        ]:
+            self.refused(f"LUMRA_{code}", function, *arguments, says=says)
+        extent, state = lumra.record("evm_meter_extent"), lumra.save(meter)
+        lumra.call("evm_meter_where", meter, extent)
+        self.assertEqual((7, 1000, lumra.type_code("cf64")), (extent.start, extent.samples, extent.type))
+        for k in [*range(200), *range(200, state.size, 517)]:
+            damaged = state.copy()
+            damaged[k] ^= 1 << k % 8
+            self.refused("LUMRA_BAD_STATE", "evm_meter_load", damaged, damaged.size, out)
+            self.refused("LUMRA_BAD_STATE", "evm_meter_load", state[:k].copy(), k, out)
+        self.assertIsNone(out.value)
 
     def test_not_finite_and_silence(self):
         r = noise(1000)
