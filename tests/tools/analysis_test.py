@@ -7,6 +7,7 @@ import pathlib
 import pty
 import re
 import subprocess
+import sys
 import tempfile
 import unittest
 
@@ -209,6 +210,31 @@ class Analysis(unittest.TestCase):
         found = self.figures("evm --align r m")
         self.assertIsNotNone(found["gain_db"])
         self.assertIsNone(found["delay_samples"])
+
+    def test_alignment_in_constant_memory(self):
+        """Of a long recording, which repeats a shorter one with its delay and its carrier."""
+        period, times, delay, turns = 500_000, 12, -123.4, 4321
+        bins = np.fft.fft(noise(period)) * (np.abs(np.fft.fftfreq(period)) < 0.4)
+        late = np.fft.ifft(bins * np.exp(-2j * np.pi * np.fft.fftfreq(period) * delay))
+        measured = 0.5j * late * np.exp(2j * np.pi * turns * np.arange(period) / period) + 0.01
+        for name, x in (("r", np.fft.ifft(bins)), ("m", measured)):
+            self.write(name, np.tile(x.astype(np.complex64), times))
+        line = "evm --align gain,delay,frequency,dc r m --json found.json"
+        most = []
+        for options in ("", f" --samples {period}"):
+            # A small process starts the program, whose own memory does not count.
+            script = "import resource as r, subprocess, sys; subprocess.run(sys.argv[1:], stdout=2, check=True); " \
+                     "print(r.getrusage(r.RUSAGE_CHILDREN).ru_maxrss)"
+            command = [sys.executable, "-c", script, os.environ["LUMRA_PROGRAM"], *(line + options).split()]
+            done = subprocess.run(command, cwd=self.folder, capture_output=True, check=True)
+            most.append(int(done.stdout))
+            if not options:
+                found = json.loads((self.folder / "found.json").read_text())
+        self.assertLess(most[0], most[1] + 25_000)  # KiB; the samples alone would take four times as much
+        self.assertAlmostEqual(delay, found["delay_samples"], delta=1e-6)
+        self.assertAlmostEqual(turns * RATE / period, found["frequency_hz"], delta=1e-7)
+        self.assertAlmostEqual(db(0.25), found["gain_db"], delta=1e-6)
+        self.assertAlmostEqual(-40, found["dc_db"], delta=1e-4)
 
     def test_several_recordings(self):
         for name, deviation in (("a,b", 0.1), ("c", 0.2)):

@@ -103,87 +103,217 @@ bool has_phase(sample reference, sample measured) noexcept {
 
 namespace {
 
-/// All samples of an input.
-std::vector<sample> read_all(const evm_input &input, std::uint64_t count) {
-  recording::sample_reader reader(input.source, input.over);
-  progress bar("Reading");
-  std::vector<sample> x(count);
-  constexpr std::uint64_t piece = std::uint64_t{1} << 20;
-  for (std::uint64_t done = 0; done < count; bar.update(done, count))
-    done += reader.read(std::span(x).subspan(done, std::min(piece, count - done)));
-  return x;
+/// Both recordings, part by part.
+class recorded_pair {
+ public:
+  recorded_pair(const evm_input &reference, const evm_input &measured, std::uint64_t samples)
+      : from_(reference.source, reference.over), to_(measured.source, measured.over), samples_(samples) {}
+
+  [[nodiscard]] std::uint64_t samples() const noexcept { return samples_; }
+
+  struct part {
+    std::uint64_t first, samples;
+  };
+  struct pair {
+    std::span<const sample> reference, measured;
+  };
+  /// The samples are valid until the next call.
+  pair read(const part &wanted) {
+    read(from_, wanted, reference_);
+    read(to_, wanted, measured_);
+    return {reference_, measured_};
+  }
+  std::span<const sample> read_reference(const part &wanted) {
+    read(from_, wanted, reference_);
+    return reference_;
+  }
+
+ private:
+  static void read(recording::sample_reader &reader, const part &wanted, std::vector<sample> &to) {
+    to.resize(wanted.samples);
+    reader.seek(wanted.first);
+    reader.read(std::span(to));
+  }
+
+  recording::sample_reader from_, to_;
+  std::uint64_t samples_;
+  std::vector<sample> reference_, measured_;
+};
+
+constexpr std::uint64_t window = LUMRA_EVM_WINDOW;
+
+failure silent(const evm_input &reference) {
+  return failure("{}: all samples are zero, which no error can be related to; give a reference with a signal",
+                 reference.source.data.string());
+}
+
+/// Where the reference has the most energy.
+recorded_pair::part loudest(recorded_pair &pair) {
+  progress bar("Searching");
+  recorded_pair::part best{0, std::min(pair.samples(), window)};
+  if (best.samples == pair.samples()) return best;
+  double most = -1;
+  for (std::uint64_t first = 0; first < pair.samples(); first += window) {
+    const recorded_pair::part part{std::min(first, pair.samples() - window), window};
+    double energy = 0;
+    for (const sample &v : pair.read_reference(part)) energy += std::norm(std::complex<double>(v));
+    bar.update(part.first + window, pair.samples());
+    if (energy <= most) continue;
+    most = energy;
+    best = part;
+  }
+  return best;
+}
+
+lumra_evm_refinement refine(recorded_pair &pair, const recorded_pair::part &part,
+                            const lumra_evm_meter_options &options) {
+  lumra_evm_meter_options here = options;
+  here.start = part.first;
+  lumra::evm_meter<sample> meter(here);
+  progress bar("Aligning");
+  for (std::uint64_t done = 0; done < part.samples;) {
+    const recorded_pair::part piece{part.first + done, std::min(window, part.samples - done)};
+    const auto [reference, measured] = pair.read(piece);
+    meter.add(reference, measured);
+    done += piece.samples;
+    bar.update(done, part.samples);
+  }
+  return meter.refine();
+}
+
+/// The options of a meter under the model that aligns the recordings, and the reference's RMS.
+struct aligned_model {
+  lumra_evm_meter_options options;
+  double reference_rms;
+};
+
+aligned_model align(recorded_pair &pair, const lumra_evm_meter_options &given) {
+  aligned_model found{given, 0};
+  const bool searched = (given.align & (LUMRA_ALIGN_DELAY | LUMRA_ALIGN_FREQUENCY)) != 0;
+  const std::uint64_t n = pair.samples();
+  recorded_pair::part part{0, n};
+  if (searched) {
+    part = loudest(pair);
+    const auto [reference, measured] = pair.read(part);
+    const auto begun =
+        lumra::measure_evm<sample>(reference, measured, static_cast<lumra::align>(given.align), given.sample_rate_hz);
+    found.options.delay_samples = begun.delay_samples;
+    found.options.frequency_hz = begun.frequency_hz;
+    if (part.samples == n) {
+      found.options.gain_re = begun.gain_re;
+      found.options.gain_im = begun.gain_im;
+      found.options.dc_re = begun.dc_re;
+      found.options.dc_im = begun.dc_im;
+      found.reference_rms = begun.reference_rms;
+      return found;
+    }
+  }
+  constexpr int most_rounds = 24;
+  for (int round = 0; round < most_rounds; ++round) {
+    const lumra_evm_refinement better = refine(pair, part, found.options);
+    found.options.gain_re = better.gain_re;
+    found.options.gain_im = better.gain_im;
+    found.options.delay_samples = better.delay_samples;
+    found.options.frequency_hz = better.frequency_hz;
+    found.options.dc_re = better.dc_re;
+    found.options.dc_im = better.dc_im;
+    found.reference_rms = better.reference_rms;
+    if (part.samples == n && better.settled != 0) break;
+    const std::uint64_t longer = std::min(better.reach, n), middle = part.first + part.samples / 2;
+    part = {std::min(middle - std::min(middle, longer / 2), n - longer), longer};
+  }
+  return found;
+}
+
+/// Aligns; says what is wrong with which recording where there is no alignment.
+aligned_model align_or_fail(recorded_pair &pair, const lumra_evm_meter_options &given, const evm_input &reference,
+                            const evm_input &measured) {
+  try {
+    return align(pair, given);
+  } catch (const lumra::error &problem) {
+    switch (problem.status().code()) {
+      case LUMRA_TOO_FEW_SAMPLES:
+        throw failure("{}: {} samples are too few to find a delay or a frequency in; give more, or --align=gain",
+                      measured.source.data.string(), pair.samples());
+      case LUMRA_NO_CONVERGENCE:
+        throw failure(
+            "{}: seems unrelated to the reference, or the reference cannot tell what is to be aligned; ask for less of "
+            "--align",
+            measured.source.data.string());
+      case LUMRA_OUT_OF_RANGE:
+        throw silent(reference);
+      default:
+        throw;
+    }
+  }
 }
 
 evm_result measure_aligned(const evm_input &reference, const evm_input &measured, const evm_settings &settings,
                            const std::function<void(const evm_block &)> &see) {
   const std::uint64_t n = settings.samples;
-  const std::vector<sample> r = read_all(reference, n), m = read_all(measured, n);
-  std::vector<sample> vectors(n);
-  std::vector<float> magnitude(n), phase(n);
-  lumra_evm_options options = LUMRA_EVM_OPTIONS;
+  recorded_pair pair(reference, measured, n);
+  lumra_evm_meter_options options = LUMRA_EVM_METER_OPTIONS;
   options.align = settings.align;
   options.sample_rate_hz = reference.source.rate;
-  lumra_evm_result found = {};
-  found.size = sizeof found;
-  const auto as_library = [](const sample *x) { return reinterpret_cast<const lumra_cf32 *>(x); };
-  const lumra_status status =
-      lumra_evm_measure_cf32(as_library(r.data()), as_library(m.data()), n, &options, &found,
-                             reinterpret_cast<lumra_cf32 *>(vectors.data()), magnitude.data(), phase.data());
-  const std::string &name = measured.source.data.string();
-  if (status == LUMRA_TOO_FEW_SAMPLES)
-    throw failure("{}: {} samples are too few to find a delay or a frequency in; give more, or --align=gain", name, n);
-  if (status == LUMRA_NO_CONVERGENCE)
-    throw failure(
-        "{}: seems unrelated to the reference, or the reference cannot tell what is to be aligned; ask for less of "
-        "--align",
-        name);
-  lumra::check_open(status);
+  const aligned_model found = align_or_fail(pair, options, reference, measured);
+  options = found.options;
 
   evm_result result;
-  result.reference_rms = found.reference_rms;
-  result.first = found.first;
-  result.samples = found.samples;
-  result.gain = {found.gain_re, found.gain_im};
-  result.dc = {found.dc_re, found.dc_im};
-  result.delay_samples = found.delay_samples;
-  result.frequency_hz = found.frequency_hz;
-  const double unit = found.reference_rms;
+  const double unit = result.reference_rms = found.reference_rms;
+  result.gain = {options.gain_re, options.gain_im};
+  result.dc = {options.dc_re, options.dc_im};
+  result.delay_samples = options.delay_samples;
+  result.frequency_hz = options.frequency_hz;
+  const auto delay = static_cast<std::int64_t>(std::llround(options.delay_samples));
   statistics errors, magnitudes, phases;
-  std::vector<float> error(std::min<std::uint64_t>(settings.block, n));
-  std::vector<sample> aligned(error.size());
-  const auto delay = static_cast<std::int64_t>(std::llround(found.delay_samples));
-  for (std::uint64_t i = found.first; i < found.first + found.samples;) {
-    const auto count = static_cast<std::size_t>(std::min<std::uint64_t>(error.size(), found.first + found.samples - i));
+  std::vector<sample> vectors(std::min(n, window)), aligned(vectors.size());
+  std::vector<float> error(vectors.size()), magnitude(vectors.size()), phase(vectors.size());
+  progress bar("Comparing");
+  // Each block has its neighbours with it; a record that is no longer than a window is one block.
+  constexpr std::uint64_t margin = (window - LUMRA_EVM_BLOCK) / 2;
+  const std::uint64_t step = n <= window ? n : LUMRA_EVM_BLOCK;
+  for (std::uint64_t begin = 0; begin < n; begin += step) {
+    options.start = begin - std::min(begin, margin);
+    const recorded_pair::part around{options.start, std::min(window, n - options.start)};
+    const auto [r, m] = pair.read(around);
+    lumra::trace_evm<sample>(
+        options, r, m,
+        {std::span(vectors).first(r.size()), std::span(magnitude).first(r.size()), std::span(phase).first(r.size())});
+    // What cannot be compared, at the ends, is NaN.
+    auto first = static_cast<std::size_t>(begin - around.first);
+    auto last = static_cast<std::size_t>(std::min(begin + step, n) - around.first);
+    while (first < last && std::isnan(phase[first])) ++first;
+    while (first < last && std::isnan(phase[last - 1])) --last;
+    if (first == last) continue;
+    if (result.samples == 0) result.first = around.first + first;
+    result.samples += last - first;
     // The nearest sample of the reference stands for the one between.
-    const sample *of = r.data() + static_cast<std::ptrdiff_t>(i) - delay;
-    for (std::size_t k = 0; k < count; ++k) {
-      error[k] = static_cast<float>(unit * std::abs(std::complex<double>(vectors[i + k])));
-      aligned[k] = of[k] + static_cast<float>(unit) * vectors[i + k];
-      magnitude[i + k] = static_cast<float>(unit * static_cast<double>(magnitude[i + k]));
-      errors.add(error[k], i + k);
-      magnitudes.add(magnitude[i + k], i + k);
-      if (has_phase(of[k], m[i + k]))
-        phases.add(phase[i + k], i + k);
+    const sample *of = r.data() - delay;
+    for (std::size_t k = first; k < last; ++k) {
+      const std::uint64_t index = around.first + k;
+      error[k] = std::abs(vectors[k]);
+      aligned[k] = of[k] + vectors[k];
+      errors.add(error[k], index);
+      magnitudes.add(magnitude[k], index);
+      if (has_phase(of[k], m[k]))
+        phases.add(phase[k], index);
       else
         ++result.without_phase;
     }
-    see({i,
-         i - found.first,
+    const std::size_t count = last - first;
+    see({around.first + first,
+         around.first + first - result.first,
          unit,
-         {of, count},
-         {aligned.data(), count},
-         {error.data(), count},
-         {magnitude.data() + i, count},
-         {phase.data() + i, count}});
-    i += count;
+         {of + first, count},
+         {aligned.data() + first, count},
+         {error.data() + first, count},
+         {magnitude.data() + first, count},
+         {phase.data() + first, count}});
+    bar.update(begin + step, n);
   }
   result.error = errors.in(unit);
   result.magnitude = magnitudes.in(unit);
   result.phase = phases.in(1);
-  // The library's own sums have not been rounded to single precision on the way.
-  result.error.rms = found.rms;
-  result.magnitude.rms = found.magnitude_rms;
-  result.phase.rms = found.phase_rms;
   return result;
 }
 
@@ -194,9 +324,7 @@ evm_result measure_evm(const evm_input &reference, const evm_input &measured, co
   if ((settings.align & ~std::uint32_t{LUMRA_ALIGN_GAIN}) != 0)
     return measure_aligned(reference, measured, settings, see);
   const relation sums = relate(reference, measured, settings);
-  if (sums.reference_power == 0)
-    throw failure("{}: all samples are zero, which no error can be related to; give a reference with a signal",
-                  reference.source.data.string());
+  if (sums.reference_power == 0) throw silent(reference);
   evm_result result;
   result.samples = settings.samples;
   result.reference_rms = std::sqrt(sums.reference_power / static_cast<double>(settings.samples));

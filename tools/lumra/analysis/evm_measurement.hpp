@@ -22,7 +22,7 @@ struct evm_input {
 struct evm_settings {
   std::uint32_t align = LUMRA_ALIGN_NONE;        // sum of enum lumra_align
   std::uint64_t samples = 0;                     // from the start, not more than either recording has
-  std::uint64_t block = std::uint64_t{1} << 16;  // samples to read at a time; the result does not depend on it
+  std::uint64_t block = std::uint64_t{1} << 16;  // samples to read at a time, where no more than the gain is aligned
 };
 
 /// Statistics of one kind of error.
@@ -55,9 +55,8 @@ struct evm_block {
 /// A sample that is zero has no phase.
 [[nodiscard]] bool has_phase(std::complex<float> reference, std::complex<float> measured) noexcept;
 
-/// Compares sample by sample, and shows `see` the errors block by block. Without an alignment, or with the gain alone,
-/// the recordings are read twice in constant memory: for the levels, then for the errors. Any other alignment has all
-/// samples in memory, 32 bytes for each pair. Throws failure, or lumra::error when the library refuses.
+/// Compares sample by sample, and shows `see` the errors block by block. Both recordings are read several times: for
+/// the levels or the alignment, and for the errors. Throws failure, or lumra::error when the library refuses.
 evm_result measure_evm(const evm_input &reference, const evm_input &measured, const evm_settings &settings,
                        const std::function<void(const evm_block &)> &see);
 
