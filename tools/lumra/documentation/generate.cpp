@@ -120,7 +120,9 @@ std::string zsh_text(const std::string &text) {
 }
 
 std::string zsh_option(const described_option &option) {
-  std::string text = fmt::format("'{}{}[{}]", option.is_repeated ? "*" : "", option.name, zsh_text(option.help));
+  // With "=", a value may follow in the same word or in the next.
+  std::string text = fmt::format("'{}{}{}[{}]", option.is_repeated ? "*" : "", option.name,
+                                 option.value.empty() ? "" : "=", zsh_text(option.help));
   if (!option.value.empty()) {
     text += ":" + zsh_text(option.value) + ":";
     if (is_file_name(option)) text += "_files";
