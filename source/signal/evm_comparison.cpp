@@ -81,7 +81,7 @@ block_sums block_comparison<Real>::compare(std::span<const sample> reference, st
   const stretch compared{std::max(part.first, known.first), std::min(part.last, known.last)};
   block_sums sums;
   // Times near 0 keep their digits in the squares.
-  const double middle = static_cast<double>(part.first + part.count() / 2);
+  const double middle = static_cast<double>(part.first + part.last) / 2;
   delayed_.walk(compared, model_.delay, slopes_, [&](std::size_t first, auto values, auto derivatives) {
     std::array<wide, run> carried_room, sloped_room;
     const auto carry = [&](std::span<const wide> x, std::size_t at, std::span<wide> room) {
