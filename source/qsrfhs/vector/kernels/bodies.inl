@@ -5,6 +5,7 @@
 //
 #include "complex.inl"
 #include "fir.inl"
+#include "interpolation.inl"
 #include "log2.inl"
 #include "lookup.inl"
 #include "polynomial.inl"
@@ -52,5 +53,7 @@ static constexpr kernel_table table = {
     .complex_fir = &complex_fir,
     .complex_fir_double = &complex_fir_double,
     .multiply_double = &multiply_double,
+    .interpolate = &interpolate,
+    .interpolate_double = &interpolate_double,
     .recursion = &recursion,
 };

@@ -39,6 +39,22 @@ struct tap_offsets {
   const float *offsets;  // groups of eight: whole parts, then fractions, each at most 1
 };
 
+/// Where an output takes its samples, and where it lies between the middle two of them.
+template <class Real>
+struct sample_place {
+  std::uint32_t first;  // sample
+  std::uint32_t row;    // of taps
+  Real offset;          // from the middle of what the row is for
+};
+
+/// Taps as polynomials of the offset. For each 32 bytes of taps stand their coefficients of power 3, then those of powers
+/// 2, 1 and 0. For complex samples each tap stands twice.
+template <class Real>
+struct cubic_taps {
+  const Real *coefficients;
+  std::size_t length;  // taps in a row, a multiple of 32 bytes
+};
+
 /// Where tap k of eight stands for complex samples, so that taps can be doubled within the halves of a register.
 constexpr int complex_tap_order[8] = {0, 1, 4, 5, 2, 3, 6, 7};
 
@@ -145,6 +161,13 @@ struct kernel_table {
 
   /// a[k] *= b[k], n complex.
   void (*multiply_double)(double *a, const double *b, std::size_t n);
+
+  /// out[k] = sum over the taps of a row at its offset, times the samples from first on. Samples are `width` values each:
+  /// 1 for real samples, 2 for complex ones.
+  void (*interpolate)(const sample_place<float> *places, std::size_t outputs, const cubic_taps<float> &taps,
+                      std::size_t width, const float *x, float *out);
+  void (*interpolate_double)(const sample_place<double> *places, std::size_t outputs, const cubic_taps<double> &taps,
+                             std::size_t width, const double *x, double *out);
 
   /// Turns samples into outputs, in place, in whole blocks of `count` streams, 1 or 2. In front of each stream stand as
   /// many outputs as the order, rounded up to a multiple of 4. Samples are finite: where one is not, the outputs of its
