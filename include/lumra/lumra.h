@@ -59,6 +59,7 @@
 #include <lumra/library_info.h>
 #include <lumra/linear_algebra.h>
 #include <lumra/measure.h>
+#include <lumra/resampler.h>
 #include <lumra/session.h>
 #include <lumra/spectrum.h>
 #include <lumra/status.h>

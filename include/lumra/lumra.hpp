@@ -14,6 +14,7 @@
 #include <lumra/library.hpp>
 #include <lumra/linear_algebra.hpp>
 #include <lumra/measure.hpp>
+#include <lumra/resampler.hpp>
 #include <lumra/services.hpp>
 #include <lumra/session.hpp>
 #include <lumra/spectrum.hpp>
