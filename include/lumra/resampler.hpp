@@ -23,9 +23,9 @@ struct resampling {
 /// Streams of T at another rate. With more than one channel, samples lie in rows one behind the other, inputs and
 /// outputs alike. One thread at a time.
 template <sample T>
-class resampler {
+class stream_resampler {
  public:
-  explicit resampler(const resampling &how)
+  explicit stream_resampler(const resampling &how)
       : resampler_(detail::make<owned>([&](lumra_resampler **out) {
           lumra_resampler_options options = LUMRA_RESAMPLER_OPTIONS;
           options.type = detail::type_code<T>;
@@ -40,8 +40,8 @@ class resampler {
           return lumra_resampler_create(&options, out);
         })),
         channels_(how.channels) {}
-  resampler(double input_rate_hz, double output_rate_hz)
-      : resampler(resampling{.input_rate_hz = input_rate_hz, .output_rate_hz = output_rate_hz}) {}
+  stream_resampler(double input_rate_hz, double output_rate_hz)
+      : stream_resampler(resampling{.input_rate_hz = input_rate_hz, .output_rate_hz = output_rate_hz}) {}
 
   /// Samples of a row that the next n of one give, and those that a flush gives.
   [[nodiscard]] std::size_t output_count(std::size_t n) const {
@@ -91,15 +91,15 @@ class resampler {
     return detail::save(resampler_.get(), &lumra_resampler_state_size, &lumra_resampler_save);
   }
   /// A resampler that goes on where the saved one was, which must be of T.
-  [[nodiscard]] static resampler load(std::span<const std::byte> bytes) {
-    return resampler(detail::make<owned>(
+  [[nodiscard]] static stream_resampler load(std::span<const std::byte> bytes) {
+    return stream_resampler(detail::make<owned>(
         [&](lumra_resampler **out) { return lumra_resampler_load(bytes.data(), bytes.size(), out); }));
   }
 
  private:
   using owned = detail::owned<lumra_resampler, &lumra_resampler_free>;
 
-  explicit resampler(owned loaded) : resampler_(std::move(loaded)) {
+  explicit stream_resampler(owned loaded) : resampler_(std::move(loaded)) {
     lumra_resampler_options options = LUMRA_RESAMPLER_OPTIONS;
     check_open(lumra_resampler_get_options(resampler_.get(), &options));
     if (options.type != detail::type_code<T>)

@@ -123,6 +123,12 @@ std::span<T> rows_of(T *first, std::uint64_t stride, std::uint64_t count, std::u
   return array(first, (channels - 1) * stride + count, name);
 }
 
+/// One of those rows.
+template <class T>
+std::span<T> row_of(std::span<T> rows, std::size_t row, std::uint64_t stride, std::uint64_t count) noexcept {
+  return rows.empty() ? rows : rows.subspan(row * static_cast<std::size_t>(stride), static_cast<std::size_t>(count));
+}
+
 /// Where rows of outputs go; checks the room for them.
 template <class Sample>
 std::span<Sample> checked_outputs(void *out, std::uint64_t stride, std::uint64_t room, std::uint64_t count,
@@ -240,8 +246,7 @@ lumra_status lumra_resampler_process(lumra_resampler *resampler, const void *in,
           const auto outputs = checked_outputs<Sample>(out, out_stride, room, count, channels);
           require_apart(outputs, "out", samples, "in");
           for_rows(object.options, n, [&](std::size_t row) {
-            all.rows[row].process({samples.data() + row * in_stride, static_cast<std::size_t>(n)},
-                                  {outputs.data() + row * out_stride, static_cast<std::size_t>(count)});
+            all.rows[row].process(row_of(samples, row, in_stride, n), row_of(outputs, row, out_stride, count));
           });
           if (written) *written = count;
         },
@@ -265,9 +270,8 @@ lumra_status lumra_resampler_flush(lumra_resampler *resampler, void *out, uint64
         [&]<class Sample>(resampled_rows<Sample> &all) {
           const std::uint64_t count = a_row(all).flushed_outputs();
           const auto outputs = checked_outputs<Sample>(out, out_stride, room, count, object.options.channels);
-          for_rows(object.options, a_row(all).latency(), [&](std::size_t row) {
-            all.rows[row].flush({outputs.data() + row * out_stride, static_cast<std::size_t>(count)});
-          });
+          for_rows(object.options, a_row(all).latency(),
+                   [&](std::size_t row) { all.rows[row].flush(row_of(outputs, row, out_stride, count)); });
           if (written) *written = count;
         },
         object.all);

@@ -39,13 +39,13 @@ struct block_design {
 /// The longest transforms of blocks: longer ones leave the second-level cache.
 inline constexpr std::size_t longest_resampling_block = std::size_t{1} << 16;
 
-/// The design with the shortest blocks whose cost is near the lowest, or at most `spare` nanoseconds above it; none where
-/// blocks would be too long.
+/// The design with the shortest blocks whose cost is near the lowest, or at most `spare` nanoseconds above it; none
+/// where blocks would be too long.
 [[nodiscard]] std::optional<block_design> design_block(std::size_t up, std::size_t down, const lowpass_band &band,
                                                        double spare);
 
-/// The response of a design's low pass, scaled for its transforms and with the guard's delay taken out: at the bins from
-/// 0 up to the stop edge, then for complex samples at those from the lowest one to -1. Throws std::bad_alloc,
+/// The response of a design's low pass, scaled for its transforms and with the guard's delay taken out: at the bins
+/// from 0 up to the stop edge, then for complex samples at those from the lowest one to -1. Throws std::bad_alloc,
 /// dfti_failure.
 template <class Sample>
 [[nodiscard]] qsrfhs::aligned_buffer<std::complex<real_of<Sample>>> make_response(const block_design &design);

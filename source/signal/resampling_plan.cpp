@@ -81,7 +81,7 @@ class planner {
           block(static_cast<std::size_t>(up), static_cast<std::size_t>(down), wanted.pass, wanted.half, wanted.spare),
           resampling_plan{});
     // An interpolator's input has four times the half of the lower rate, or a little more.
-    constexpr double cost = 4;  // nanoseconds for an output
+    const double cost = 0.27 * attenuation_;  // nanoseconds for an output
     for (std::size_t b = 1; b <= 8; ++b) {
       const auto a = static_cast<std::size_t>(std::ceil(4 * wanted.half * static_cast<double>(b)));
       if (std::gcd(a, b) != 1) continue;
