@@ -29,8 +29,8 @@ typedef struct lumra_resampler_options {
   int32_t type;          /* of samples: LUMRA_TYPE_F32, _F64, _CF32 or _CF64 (enum lumra_type_code) */
   double input_rate_hz;  /* above 0, taken as exactly the number that it is */
   double output_rate_hz; /* the same; both are less than a factor of 10^9 apart */
-  uint64_t up, down;     /* not 0: output rate / input rate = up / down, whatever doubles can hold. Then output_rate_hz
-                            is 0, and input_rate_hz is 0 or what figures in hertz are made with */
+  uint64_t up, down;     /* not 0: output rate / input rate is up / down, for ratios of rates that doubles do not hold;
+                            output_rate_hz is not read then */
   double passband;       /* the part of half the lower rate that is kept, above 0 to 0.99 */
   double rejection_db;   /* 40 to 150; in single precision to 120, where its rounding begins */
   uint32_t channels;     /* rows of samples, 1 to 1024 */
@@ -38,11 +38,11 @@ typedef struct lumra_resampler_options {
 } lumra_resampler_options;
 
 #define LUMRA_RESAMPLER_OPTIONS \
-  { sizeof(lumra_resampler_options), LUMRA_TYPE_CF32, 0, 0, 0, 0, 0.9, 100.0, 1, 1 }
+  { sizeof(lumra_resampler_options), LUMRA_TYPE_CF32, 1.0, 1.0, 0, 0, 0.9, 100.0, 1, 1 }
 
 /* Makes a resampler.
  *
- * options    its rates, or up and down, must be set
+ * options    null: LUMRA_RESAMPLER_OPTIONS, whose rates are equal
  * resampler  the object's address is written here
  *
  * Returns 0, or in the order of the checks: LUMRA_BAD_SIZE_FIELD options->size; LUMRA_UNKNOWN_CHOICE type;
@@ -102,7 +102,7 @@ enum lumra_resampler_kind {
 typedef struct lumra_resampler_figures {
   uint32_t size;            /* of this record in bytes; set before the call */
   int32_t kind;             /* one of enum lumra_resampler_kind */
-  double input_rate_hz;     /* of the options, or 1 Hz where they have none */
+  double input_rate_hz;     /* of the options */
   double output_rate_hz;    /* rounded to a double */
   uint64_t up, down;        /* output rate / input rate in lowest terms; both 0 where they need more than 64 bits */
   double pass_edge_hz;      /* the last frequency that is kept; half the lower rate at equal rates */

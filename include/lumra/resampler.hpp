@@ -14,8 +14,8 @@ namespace lumra {
 
 /// Rates, or their fraction, and how well they are changed; see resampler.h.
 struct resampling {
-  double input_rate_hz = 0, output_rate_hz = 0;
-  std::uint64_t up = 0, down = 0;
+  double input_rate_hz = 1, output_rate_hz = 1;
+  std::uint64_t up = 0, down = 0;  // the fraction, where doubles do not hold the rates
   double passband = 0.9, rejection_db = 100;
   std::uint32_t channels = 1, threads = 1;
 };

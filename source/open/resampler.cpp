@@ -62,17 +62,14 @@ void require_rate(double rate, std::string_view name) {
 
 dsp::rate_ratio checked_ratio(const lumra_resampler_options &options) {
   constexpr std::string_view near = "; rates are less than a factor of 10^9 apart";
+  require_rate(options.input_rate_hz, "options->input_rate_hz");
   if (options.up == 0 && options.down == 0) {
-    require_rate(options.input_rate_hz, "options->input_rate_hz");
     require_rate(options.output_rate_hz, "options->output_rate_hz");
     require(dsp::rate_ratio::are_near(options.output_rate_hz, options.input_rate_hz), LUMRA_OUT_OF_RANGE,
             "options->output_rate_hz is ", options.output_rate_hz, " for options->input_rate_hz ",
             options.input_rate_hz, near);
     return {options.output_rate_hz, options.input_rate_hz};
   }
-  require(options.output_rate_hz == 0, LUMRA_OUT_OF_RANGE, "options->output_rate_hz is ", options.output_rate_hz,
-          "; it is 0 where options->up and options->down are not");
-  if (options.input_rate_hz != 0) require_rate(options.input_rate_hz, "options->input_rate_hz");
   require(options.up != 0 && options.down != 0, LUMRA_OUT_OF_RANGE, "options->up is ", options.up,
           " and options->down ", options.down, "; both are 0, or none");
   const auto up = static_cast<double>(options.up), down = static_cast<double>(options.down);
@@ -158,8 +155,8 @@ lumra_resampler_figures figures_of(const resampler_object &object) {
         const dsp::resampling_plan &plan = all.change->plan;
         const dsp::rate_ratio &ratio = all.change->ratio;
         const lumra_resampler_options &options = object.options;
-        const double input = options.input_rate_hz == 0 ? 1 : options.input_rate_hz;
-        const double output = options.output_rate_hz == 0 ? input * ratio.value() : options.output_rate_hz;
+        const double input = options.input_rate_hz;
+        const double output = options.up == 0 ? options.output_rate_hz : input * ratio.value();
         const double half = std::min(input, output) / 2;
         double deviation = plan.rest ? std::pow(10, -options.rejection_db / 20) : 0;
         std::size_t longest = 0;

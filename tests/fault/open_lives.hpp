@@ -20,6 +20,7 @@ struct open_life {
   lumra_fir *fir = nullptr, *loaded_fir = nullptr;
   lumra_iir *iir = nullptr, *loaded_iir = nullptr;
   lumra_least_squares *solver = nullptr;
+  lumra_resampler *resampler = nullptr;
   lumra_spectrum_average *spectrum = nullptr;
   lumra_level *level = nullptr;
 
@@ -36,6 +37,7 @@ struct open_life {
     lumra_iir_free(iir);
     lumra_iir_free(loaded_iir);
     lumra_least_squares_free(solver);
+    lumra_resampler_free(resampler);
     lumra_spectrum_free(spectrum);
     lumra_level_free(level);
   }
@@ -149,6 +151,32 @@ inline const named_life open_lives[] = {
       },
       [](open_life &l) {  // singular values are asked for
         return lumra_least_squares_solve(l.solver, l.in.data(), l.in.data(), 0.5, l.out.data(), &l.count);
+      }}},
+    {"resamplers",
+     {[](open_life &l) {
+        lumra_resampler_options options = LUMRA_RESAMPLER_OPTIONS;
+        options.type = LUMRA_TYPE_F32;
+        options.output_rate_hz = 0.7 / 3;
+        options.rejection_db = 60;
+        options.channels = 2;
+        return lumra_resampler_create(&options, &l.resampler);
+      },
+      [](open_life &l) {
+        return first_of(
+            {lumra_resampler_reset(l.resampler),
+             lumra_resampler_process(l.resampler, l.in.data(), 4000, 4000, l.out.data(), 4000, 4000, &l.count)});
+      },
+      [](open_life &l) {
+        return first_of({lumra_resampler_state_size(l.resampler, &l.count),
+                         lumra_resampler_save(l.resampler, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_resampler *loaded = nullptr;
+        std::uint64_t written = 0;
+        lumra_status code = lumra_resampler_load(l.bytes.data(), l.count, &loaded);
+        if (code == 0) code = lumra_resampler_flush(loaded, l.out.data(), 4000, 4000, &written);
+        lumra_resampler_free(loaded);
+        return code;
       }}},
     {"averaged spectra",
      {[](open_life &l) {

@@ -187,11 +187,10 @@ class Resampler(lumra.Test):
             ("LUMRA_UNKNOWN_CHOICE", {"type": 11}),
             *(("LUMRA_OUT_OF_RANGE", {name: bad}) for name in good for bad in (0.0, -1.0, np.nan, np.inf, 1e-9, 3e9)),
             ("LUMRA_OUT_OF_RANGE", {"up": 1}),
-            ("LUMRA_OUT_OF_RANGE", {"up": 1, "down": 2}),
-            ("LUMRA_OUT_OF_RANGE", {"output_rate_hz": 0.0, "up": 1}),
-            ("LUMRA_OUT_OF_RANGE", {"output_rate_hz": 0.0, "up": 1, "down": 10**9}),
-            ("LUMRA_OUT_OF_RANGE", {"output_rate_hz": 0.0, "up": 2**63, "down": 2**33}),
-            ("LUMRA_OUT_OF_RANGE", {"output_rate_hz": 0.0, "up": 1, "down": 2, "input_rate_hz": -1.0}),
+            ("LUMRA_OUT_OF_RANGE", {"down": 1}),
+            ("LUMRA_OUT_OF_RANGE", {"up": 1, "down": 10**9}),
+            ("LUMRA_OUT_OF_RANGE", {"up": 2**63, "down": 2**33}),
+            ("LUMRA_OUT_OF_RANGE", {"up": 1, "down": 2, "input_rate_hz": -1.0}),
             *(("LUMRA_OUT_OF_RANGE", {"passband": bad}) for bad in (0.0, -0.1, 0.991, np.nan)),
             *(("LUMRA_OUT_OF_RANGE", {"rejection_db": bad, "type": C["LUMRA_TYPE_CF64"]}) for bad in (39.0, 151.0, np.nan)),
             ("LUMRA_OUT_OF_RANGE", {"rejection_db": 121.0, **single}),
@@ -200,8 +199,7 @@ class Resampler(lumra.Test):
             ("LUMRA_OUT_OF_RANGE", {"threads": 1025}),
         ):
             self.refused(code, "resampler_create", lumra.record("resampler", **{**good, **changes}), handle)
-        self.refused("LUMRA_OUT_OF_RANGE", "resampler_create", None, handle, says="input_rate_hz is 0")
-        self.refused("LUMRA_NULL_ARGUMENT", "resampler_create", lumra.record("resampler", **good), None)
+        self.refused("LUMRA_NULL_ARGUMENT", "resampler_create", None, None)
         x, out, written = np.zeros((2, 3000), np.float32), np.zeros((2, 2000), np.float32), ctypes.c_uint64()
         two = make((1, 2), "f32", channels=2)
         n, room = 3000, number("output_count", two, 3000)
