@@ -158,7 +158,7 @@ lumra_resampler_figures figures_of(const resampler_object &object) {
         const double input = options.input_rate_hz;
         const double output = options.up == 0 ? options.output_rate_hz : input * ratio.value();
         const double half = std::min(input, output) / 2;
-        double deviation = plan.rest ? std::pow(10, -options.rejection_db / 20) : 0;
+        double deviation = plan.rest ? std::pow(10, -plan.rejection / 20) : 0;
         std::size_t longest = 0;
         for (const dsp::block_design &block : plan.blocks) {
           deviation += std::pow(10, -block.band.attenuation / 20);

@@ -16,8 +16,8 @@ constexpr std::array<Sample, 1024> silence{};
 }  // namespace
 
 template <class Sample>
-rate_change<Sample>::rate_change(const rate_ratio &output_to_input, double passband, double rejection_db)
-    : ratio(output_to_input), rejection(rejection_db), plan(plan_resampling(ratio, passband, rejection)) {
+rate_change<Sample>::rate_change(const rate_ratio &output_to_input, double passband, double rejection)
+    : ratio(output_to_input), plan(plan_resampling(ratio, passband, rejection)) {
   using response = qsrfhs::aligned_buffer<typename block_resampler<Sample>::bin>;
   for (const block_design &block : plan.blocks)
     responses.push_back(std::make_shared<const response>(make_response<Sample>(block)));
@@ -34,7 +34,7 @@ resampler<Sample>::resampler(std::shared_ptr<const rate_change<Sample>> change) 
     const std::size_t lead = is_last ? 0 : block_resampler<Sample>::lead_of(plan.blocks[k], first);
     first = blocks_.emplace_back(plan.blocks[k], change_->responses[k], first, lead).outputs_end(first);
   }
-  if (plan.rest) interpolator_.emplace(*plan.rest, change_->rejection);
+  if (plan.rest) interpolator_.emplace(*plan.rest, plan.rejection);
   if (interpolator_) past_ = qsrfhs::aligned_buffer<Sample>(interpolator_->past().size());
   reset();
 }

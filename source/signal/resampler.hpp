@@ -22,7 +22,6 @@ struct rate_change {
   rate_change(const rate_ratio &output_to_input, double passband, double rejection);
 
   rate_ratio ratio;
-  double rejection;
   resampling_plan plan;
   std::vector<typename block_resampler<Sample>::response> responses;  // of the plan's blocks
 };

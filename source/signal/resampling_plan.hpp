@@ -16,6 +16,7 @@ struct resampling_plan {
   std::vector<block_design> blocks;
   std::optional<rate_ratio> rest;  // of the interpolator's rates
   double cost = 0;                 // of an input sample, as that of blocks
+  double rejection = 0;            // in dB, which every step has; that which was asked for, or more
 };
 
 /// The plan with the lowest cost. The pass band is a fraction of half the lower rate; what lies beyond that half is
