@@ -18,6 +18,7 @@ constexpr std::size_t block = 1024;           // inputs that are taken at once, 
 constexpr std::size_t most_places = 64;       // outputs that are computed at once
 constexpr double transition = 0.5;            // in cycles per input sample: a quarter to three quarters
 constexpr double margin = 6;                  // dB, for several images that add up and for the errors of the pieces
+constexpr double least_rejection = 60;        // dB, for pass bands that are flat within 0.01 dB
 constexpr std::size_t coefficient_count = 4;  // of a polynomial
 
 template <class Sample>
@@ -28,7 +29,7 @@ constexpr std::size_t lanes = 32 / sizeof(real_of<Sample>);
 /// A multiple of 32 bytes for real and for complex samples, so that both have the same filter.
 template <class Sample>
 std::size_t tap_count(double rejection) noexcept {
-  const double needed = kaiser_formulas(rejection + margin).width / transition;
+  const double needed = kaiser_formulas(std::max(rejection, least_rejection) + margin).width / transition;
   constexpr std::size_t group = lanes<Sample>;
   return (static_cast<std::size_t>(std::ceil(needed)) + group - 1) / group * group;
 }
@@ -43,7 +44,8 @@ double attenuation_of(std::size_t taps) noexcept {
 /// filter's taps together by a little more than that.
 std::size_t piece_count(double rejection) noexcept {
   constexpr double fourth_derivative = 97.4 * 4;
-  const double fourth_power = fourth_derivative / 3072 * std::pow(10, (rejection + margin) / 20);
+  const double fourth_power =
+      fourth_derivative / 3072 * std::pow(10, (std::max(rejection, least_rejection) + margin) / 20);
   return std::bit_ceil(static_cast<std::size_t>(std::ceil(std::pow(fourth_power, 0.25))));
 }
 
