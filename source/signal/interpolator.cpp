@@ -26,11 +26,11 @@ constexpr std::size_t values_per_sample = is_complex<Sample> ? 2 : 1;
 template <class Sample>
 constexpr std::size_t lanes = 32 / sizeof(real_of<Sample>);
 
-/// A multiple of 32 bytes for real and for complex samples, so that both have the same filter.
+/// Even, and whole registers.
 template <class Sample>
 std::size_t tap_count(double rejection) noexcept {
   const double needed = kaiser_formulas(std::max(rejection, least_rejection) + margin).width / transition;
-  constexpr std::size_t group = lanes<Sample>;
+  constexpr std::size_t group = lanes<Sample> / values_per_sample<Sample>;
   return (static_cast<std::size_t>(std::ceil(needed)) + group - 1) / group * group;
 }
 
@@ -102,28 +102,33 @@ template <class Sample>
 void interpolator<Sample>::process(std::span<const Sample> in, std::span<Sample> out) noexcept {
   const qsrfhs::kernels::cubic_taps<real> taps{coefficients_.data(), values_per_sample<Sample> * taps_};
   const auto pieces = static_cast<double>(pieces_);
+  const auto last_piece = static_cast<std::int32_t>(pieces_ - 1);
+  const rate_ratio ratio = ratio_;
+  stream_position next = next_;
   std::array<qsrfhs::kernels::sample_place<real>, most_places> places;
   while (!in.empty()) {
     const auto part = in.first(std::min(in.size(), block));
     const Sample *const oldest = line_.append(part) - (taps_ - 1);
-    // The samples of an output at `whole` begin whole - inputs_ behind `oldest`, one more than half the taps later.
-    const std::uint64_t begin = inputs_, end = inputs_ + part.size();
-    while (!out.empty() && next_.whole + taps_ / 2 < end) {
+    // The samples of an output begin half the taps in front of it, and that is so many behind `oldest`:
+    const std::uint64_t behind = taps_ / 2 - inputs_;
+    inputs_ += part.size();
+    while (!out.empty() && next.whole + taps_ / 2 < inputs_) {
+      const std::size_t most = std::min(most_places, out.size());
       std::size_t count = 0;
-      for (; count < std::min(most_places, out.size()) && next_.whole + taps_ / 2 < end; ++count) {
-        const double place = ratio_.fraction(next_) * pieces;
-        const double piece = std::min(std::floor(place), pieces - 1);
-        places[count] = {static_cast<std::uint32_t>(next_.whole + taps_ / 2 - begin), static_cast<std::uint32_t>(piece),
+      for (; count < most && next.whole + taps_ / 2 < inputs_; ++count) {
+        const double place = ratio.fraction(next) * pieces;
+        const std::int32_t piece = std::min(static_cast<std::int32_t>(place), last_piece);
+        places[count] = {static_cast<std::uint32_t>(next.whole + behind), static_cast<std::uint32_t>(piece),
                          static_cast<real>(place - piece - 0.5)};
-        ratio_.advance(next_);
+        ratio.advance(next);
       }
       interpolate(places.data(), count, taps, values_per_sample<Sample>, reinterpret_cast<const real *>(oldest),
                   reinterpret_cast<real *>(out.data()));
       out = out.subspan(count);
     }
-    inputs_ = end;
     in = in.subspan(part.size());
   }
+  next_ = next;
 }
 
 template <class Sample>
