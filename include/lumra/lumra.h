@@ -49,6 +49,7 @@
 #ifndef LUMRA_LUMRA_H
 #define LUMRA_LUMRA_H
 
+#include <lumra/channelizer.h>
 #include <lumra/core_services.h>
 #include <lumra/elementwise.h>
 #include <lumra/error_vector.h>

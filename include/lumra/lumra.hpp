@@ -4,6 +4,7 @@
 
 #include <lumra/lumra.h>
 
+#include <lumra/channelizer.hpp>
 #include <lumra/elementwise.hpp>
 #include <lumra/error.hpp>
 #include <lumra/error_vector.hpp>

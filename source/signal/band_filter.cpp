@@ -47,7 +47,7 @@ void band_filter::make_gains(double first, double step, std::span<double> gains)
 }
 
 double band_filter::ripple(double rejection) noexcept {
-  return 20 * std::log10(1 + std::pow(10, -std::max(rejection, least_attenuation - 1) / 20));
+  return 20 * std::log10(1 + std::pow(10, -std::max(rejection, least_attenuation - margin) / 20));
 }
 
 }  // namespace dsp

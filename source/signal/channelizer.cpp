@@ -117,6 +117,11 @@ class channelizer<Sample>::channel {
     return narrow_ ? narrow_->latency(0) : 0;
   }
 
+  [[nodiscard]] std::size_t filters() const noexcept {
+    if (way_ == channel_way::whole) return 0;
+    return narrow_ ? 1 + narrow_->filters(0) : interpolator_ ? 2 : 1;
+  }
+
   void run(const output *bins, std::uint64_t block, team &with, std::span<output> &room) {
     output *const work = with.work.data();
     const auto begin = first_ + static_cast<std::int64_t>(block) * hop_;
@@ -268,6 +273,11 @@ double channelizer<Sample>::latency(std::size_t index) const noexcept {
   if (of.way() == channel_way::whole) return 0;
   const auto points = static_cast<double>(plan_.points);
   return points - static_cast<double>(plan_.overlap) / 2 + of.latency() * points / static_cast<double>(of.points());
+}
+
+template <class Sample>
+std::size_t channelizer<Sample>::filters(std::size_t index) const noexcept {
+  return channels_[index].filters();
 }
 
 template <class Sample>

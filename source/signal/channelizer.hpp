@@ -17,14 +17,14 @@
 
 namespace dsp {
 
-/// Sample j of a channel lies at j / ratio samples of the stream: the stream, filtered around the channel's centre, times
-/// exp(-2 pi j centre n) at sample n of the stream. Around the stream there is silence. The same bits for any cut of the
-/// stream and any number of threads.
+/// Sample j of a channel lies at j / ratio samples of the stream: the stream, filtered around the channel's centre,
+/// times exp(-2 pi j centre n) at sample n of the stream. Around the stream there is silence. The same bits for any
+/// cut of the stream and any number of threads.
 ///
 /// Blocks of the stream that overlap are transformed once for all channels. A channel takes the bins around its centre
-/// times its filter's gains through a short backward transform, and is turned by what its centre is off a bin. From there
-/// an interpolator may have the rest of the ratio, and a channel that is far narrower than the stream goes through
-/// another such object for itself.
+/// times its filter's gains through a short backward transform, and is turned by what its centre is off a bin. From
+/// there an interpolator may have the rest of the ratio, and a channel that is far narrower than the stream goes
+/// through another such object for itself.
 template <class Sample>
 class channelizer {
  public:
@@ -42,6 +42,8 @@ class channelizer {
   [[nodiscard]] std::uint64_t outputs(std::size_t index, std::uint64_t n) const noexcept;
   /// Samples of the stream behind an output's place that may have to come before it is there.
   [[nodiscard]] double latency(std::size_t index) const noexcept;
+  /// Filters that a channel goes through, one behind the other.
+  [[nodiscard]] std::size_t filters(std::size_t index) const noexcept;
 
   /// Takes the stream's next samples. Each channel writes as many outputs as they give, or as it has room for where the
   /// stream's end is known, and what it wrote is taken off its room. Throws dfti_failure, and after that there is reset

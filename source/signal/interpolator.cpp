@@ -18,7 +18,7 @@ constexpr std::size_t block = 1024;           // inputs that are taken at once, 
 constexpr std::size_t most_places = 64;       // outputs that are computed at once
 constexpr double transition = 0.5;            // in cycles per input sample: a quarter to three quarters
 constexpr double margin = 6;                  // dB, for several images that add up and for the errors of the pieces
-constexpr double least_rejection = 60;        // dB, for pass bands that are flat within 0.01 dB
+constexpr double least_rejection = 66;        // dB, for pass bands that are flat within 0.01 dB
 constexpr std::size_t coefficient_count = 4;  // of a polynomial
 
 template <class Sample>

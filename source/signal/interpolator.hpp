@@ -13,8 +13,8 @@
 namespace dsp {
 
 /// Output k lies at k down / up input samples, for ever; before the stream's first sample there was silence. Signals
-/// within a quarter of the input's rate keep their level, and their images are rejected; outputs whose rate is lower than
-/// the signal's band fold it. The same bits for any cut of the stream. No memory is taken after construction.
+/// within a quarter of the input's rate keep their level, and their images are rejected; outputs whose rate is lower
+/// than the signal's band fold it. The same bits for any cut of the stream. No memory is taken after construction.
 ///
 /// A short filter by Kaiser's window, whose taps are pieces of cubic polynomials in the place between two samples.
 template <class Sample>

@@ -47,8 +47,8 @@ struct sample_place {
   Real offset;          // from the middle of what the row is for
 };
 
-/// Taps as polynomials of the offset. For each 32 bytes of taps stand their coefficients of power 3, then those of powers
-/// 2, 1 and 0. For complex samples each tap stands twice.
+/// Taps as polynomials of the offset. For each 32 bytes of taps stand their coefficients of power 3, then those of
+/// powers 2, 1 and 0. For complex samples each tap stands twice.
 template <class Real>
 struct cubic_taps {
   const Real *coefficients;
@@ -162,8 +162,8 @@ struct kernel_table {
   /// a[k] *= b[k], n complex.
   void (*multiply_double)(double *a, const double *b, std::size_t n);
 
-  /// out[k] = sum over the taps of a row at its offset, times the samples from first on. Samples are `width` values each:
-  /// 1 for real samples, 2 for complex ones.
+  /// out[k] = sum over the taps of a row at its offset, times the samples from first on. Samples are `width` values
+  /// each: 1 for real samples, 2 for complex ones.
   void (*interpolate)(const sample_place<float> *places, std::size_t outputs, const cubic_taps<float> &taps,
                       std::size_t width, const float *x, float *out);
   void (*interpolate_double)(const sample_place<double> *places, std::size_t outputs, const cubic_taps<double> &taps,
