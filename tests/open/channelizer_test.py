@@ -177,7 +177,7 @@ class Channelizer(lumra.Test):
         for code, changes, channels, count, says in (
             ("LUMRA_BAD_SIZE_FIELD", {"size": 3}, one, 1, "size"),
             ("LUMRA_UNKNOWN_CHOICE", {"type": 11}, one, 1, "type"),
-            *(("LUMRA_OUT_OF_RANGE", {"sample_rate_hz": r}, one, 1, "sample_rate") for r in (0.0, -1.0, np.inf, np.nan)),
+            *(("LUMRA_OUT_OF_RANGE", {"sample_rate_hz": r}, one, 1, "sample_rate") for r in (0, -1, np.inf, np.nan)),
             *(("LUMRA_OUT_OF_RANGE", {"rejection_db": r}, one, 1, "rejection_db") for r in (39.0, 121.0, np.nan)),
             ("LUMRA_OUT_OF_RANGE", {"threads": 1025}, one, 1, "threads"),
             ("LUMRA_OUT_OF_RANGE", {"reserved": 1}, one, 1, "reserved"),
