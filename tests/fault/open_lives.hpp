@@ -23,6 +23,7 @@ struct open_life {
   lumra_resampler *resampler = nullptr;
   lumra_spectrum_average *spectrum = nullptr;
   lumra_level *level = nullptr;
+  lumra_channelizer *channels = nullptr;
 
   open_life() : in(8192), out(16384), taps(300), bytes(1 << 16) {
     for (std::size_t k = 0; k < in.size(); ++k) in[k] = static_cast<float>(k * k % 97) / 97 - 0.5F;
@@ -40,6 +41,7 @@ struct open_life {
     lumra_resampler_free(resampler);
     lumra_spectrum_free(spectrum);
     lumra_level_free(level);
+    lumra_channelizer_free(channels);
   }
 };
 
@@ -221,6 +223,31 @@ inline const named_life open_lives[] = {
           code = lumra_level_merge(l.level, loaded) == LUMRA_OUT_OF_RANGE ? LUMRA_SUCCESS : LUMRA_UNEXPECTED;
         lumra_level_free(loaded);
         return code;
+      }}},
+    {"channels",
+     {[](open_life &l) {
+        lumra_channelizer_options options = LUMRA_CHANNELIZER_OPTIONS;
+        options.sample_rate_hz = 1e3;
+        options.rejection_db = 40;
+        const lumra_channelizer_channel channels[] = {{100, 250, 0.5}, {-123.4, 77.7, 0.5}, {321, 2, 0.5}};
+        return lumra_channelizer_create(&options, channels, 3, &l.channels);
+      },
+      [](open_life &l) {
+        void *const out[] = {l.out.data(), l.out.data() + 4000, l.out.data() + 8000};
+        const std::uint64_t room[] = {2000, 2000, 2000};
+        return first_of({lumra_channelizer_reset(l.channels),
+                         lumra_channelizer_process(l.channels, l.in.data(), 4096, out, room, nullptr),
+                         lumra_channelizer_flush(l.channels, out, room, nullptr),
+                         lumra_channelizer_process(l.channels, l.in.data(), 2000, out, room, nullptr)});
+      },
+      [](open_life &l) {
+        return first_of({lumra_channelizer_state_size(l.channels, &l.count),
+                         lumra_channelizer_save(l.channels, l.bytes.data(), l.bytes.size())});
+      },
+      [](open_life &l) {
+        lumra_channelizer_free(l.channels);
+        l.channels = nullptr;
+        return lumra_channelizer_load(l.bytes.data(), l.count, &l.channels);
       }}},
     {"functions",
      {[](open_life &l) {
