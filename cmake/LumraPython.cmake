@@ -1,0 +1,16 @@
+# What the Python package is built with: Debian's Python, or the one that Python_EXECUTABLE names.
+if(NOT DEFINED Python_EXECUTABLE)
+  find_program(LUMRA_SYSTEM_PYTHON python3 PATHS /usr/bin NO_DEFAULT_PATH)
+  mark_as_advanced(LUMRA_SYSTEM_PYTHON)
+  if(LUMRA_SYSTEM_PYTHON)
+    set(Python_EXECUTABLE ${LUMRA_SYSTEM_PYTHON})
+  endif()
+endif()
+find_package(Python 3.9 QUIET COMPONENTS Interpreter Development.Module NumPy)
+find_package(pybind11 2.10 QUIET CONFIG)
+set(python_default OFF)
+# A module cannot bring the thread sanitizer's runtime into a process that began without it.
+if(PROJECT_IS_TOP_LEVEL AND Python_FOUND AND pybind11_FOUND AND NOT LUMRA_SANITIZE MATCHES thread)
+  set(python_default ON)
+endif()
+option(LUMRA_PYTHON "Build the Python package" ${python_default})

@@ -1,0 +1,14 @@
+// The extension module lumra._lumra. Its functions take their arguments in order; the package's Python modules give them
+// names, defaults and documentation. SPDX-License-Identifier: MIT
+#include "module.hpp"
+
+#include "failures.hpp"
+
+PYBIND11_MODULE(_lumra, module) {
+  binding::translate_failures();
+  binding::add_elements(module);
+  binding::add_filters(module);
+  binding::add_least_squares(module);
+  binding::add_transforms(module);
+  binding::add_windows(module);
+}
