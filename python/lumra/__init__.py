@@ -13,7 +13,15 @@ from lumra._failures import Error
 from lumra._filters import (
     FirFilter, IirFilter, convolve, correlate, kaiser_lowpass, lfilter, root_raised_cosine, sosfilter)
 from lumra._least_squares import lstsq
+from lumra._levels import Evm, Level, LevelMeter, ccdf, evm, level
+from lumra._recordings import Annotation, Capture, Recording, write
+from lumra._spectra import (
+    Harmonic, Peak, Spectrum, SpectrumEstimator, Tone, Waterfall, spectrum, waterfall)
 from lumra._transforms import fft, ifft, irfft, rfft
 from lumra._windows import WindowFigures, window, window_figures
 
 __all__ = [name for name in dir() if not name.startswith("_")]
+for _name in __all__:
+    if isinstance(globals()[_name], type):
+        globals()[_name].__module__ = "lumra"
+del _name

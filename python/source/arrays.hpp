@@ -135,7 +135,7 @@ class target {
 };
 
 /// Elements of a piece that is gathered from strided memory.
-inline constexpr std::size_t gathered = 8192;
+inline constexpr std::size_t gathered = std::size_t{1} << 15;
 
 template <class T>
 void gather(const T *from, std::ptrdiff_t step, T *to, std::size_t count) noexcept {

@@ -43,29 +43,34 @@ class turnstile {
   std::atomic<std::thread::id> holder_;
 };
 
-/// One thread's turn, without the GIL. The GIL is given up before the wait, so that who has the turn can take it. A
-/// signal handler that comes back to an object that its own thread is using is refused.
+/// One thread's turn with one or two objects, without the GIL. The GIL is given up before the wait, so that who has the
+/// turn can take it. A signal handler that comes back to an object that its own thread is using is refused.
 class turn {
  public:
-  explicit turn(turnstile &through) : through_(refuse_second(through)) {
-    through.mutex_.lock();
-    through.holder_ = std::this_thread::get_id();
+  explicit turn(turnstile &with) : turn(with, with) {}
+  turn(turnstile &one, turnstile &other) : one_(refuse_second(one)), other_(refuse_second(other)) {
+    if (&one == &other)
+      one.mutex_.lock();
+    else
+      std::lock(one.mutex_, other.mutex_);
+    one.holder_ = other.holder_ = std::this_thread::get_id();
   }
   turn(const turn &) = delete;
   turn &operator=(const turn &) = delete;
   ~turn() {
-    through_.holder_ = std::thread::id();
-    through_.mutex_.unlock();
+    one_.holder_ = other_.holder_ = std::thread::id();
+    one_.mutex_.unlock();
+    if (&one_ != &other_) other_.mutex_.unlock();
   }
 
  private:
-  static turnstile &refuse_second(turnstile &through) {
-    if (through.holder_ == std::this_thread::get_id())
+  static turnstile &refuse_second(turnstile &with) {
+    if (with.holder_ == std::this_thread::get_id())
       throw std::runtime_error("the object is in use by this thread already");
-    return through;
+    return with;
   }
 
-  turnstile &through_;
+  turnstile &one_, &other_;
   py::gil_scoped_release released_;
 };
 

@@ -10,8 +10,6 @@
 #include <string_view>
 #include <utility>
 
-#include "recording/failure.hpp"
-
 namespace binding {
 namespace {
 
@@ -119,11 +117,13 @@ void translate_failures() {
     } catch (const lumra::error &failed) {
       const int code = failed.status().code();
       const std::string sentence = in_our_names(failed.what());
-      if (code == LUMRA_OUT_OF_RANGE || code == LUMRA_UNKNOWN_CHOICE)
+      if (code == LUMRA_OUT_OF_RANGE || code == LUMRA_UNKNOWN_CHOICE || code == LUMRA_WRONG_TYPE)
         PyErr_SetString(PyExc_ValueError, sentence.c_str());
       else
         raise_error(sentence, code);
-    } catch (const recording::failure &failed) {
+    } catch (const py::builtin_exception &) {
+      throw;                                      // ValueError and its like
+    } catch (const std::runtime_error &failed) {  // of files, for one
       raise_error(failed.what(), LUMRA_UNEXPECTED);
     }
   });

@@ -7,8 +7,13 @@
 PYBIND11_MODULE(_lumra, module) {
   binding::translate_failures();
   binding::add_elements(module);
+  binding::add_error_vectors(module);
+  binding::add_figures(module);
   binding::add_filters(module);
   binding::add_least_squares(module);
+  binding::add_levels(module);
+  binding::add_recordings(module);
+  binding::add_spectra(module);
   binding::add_transforms(module);
   binding::add_windows(module);
 }

@@ -12,7 +12,6 @@ void add_filters(pybind11::module_ &module);
 void add_least_squares(pybind11::module_ &module);
 void add_levels(pybind11::module_ &module);
 void add_recordings(pybind11::module_ &module);
-void add_records(pybind11::module_ &module);
 void add_spectra(pybind11::module_ &module);
 void add_transforms(pybind11::module_ &module);
 void add_windows(pybind11::module_ &module);

@@ -4,6 +4,7 @@
 #include <lumra/filter.hpp>
 #include <optional>
 
+#include "accumulators.hpp"
 #include "arrays.hpp"
 #include "coefficients.hpp"
 
@@ -12,12 +13,6 @@ namespace {
 
 /// Samples of one call without the GIL in between.
 constexpr std::size_t piece = std::size_t{1} << 18;
-
-element checked_type(std::int32_t code) {
-  for (const element type : {element::f32, element::f64, element::cf32, element::cf64})
-    if (static_cast<std::int32_t>(type) == code) return type;
-  throw lumra::error(lumra::status(LUMRA_BAD_STATE), "what was saved has no type of samples");
-}
 
 struct recursive {
   using object = lumra_iir;
