@@ -14,6 +14,7 @@ from lumra._filters import (
     FirFilter, IirFilter, convolve, correlate, kaiser_lowpass, lfilter, root_raised_cosine, sosfilter)
 from lumra._least_squares import lstsq
 from lumra._levels import Evm, Level, LevelMeter, ccdf, evm, level
+from lumra._rates import Channelizer, Resampler, resample
 from lumra._recordings import Annotation, Capture, Recording, write
 from lumra._spectra import (
     Harmonic, Peak, Spectrum, SpectrumEstimator, Tone, Waterfall, spectrum, waterfall)

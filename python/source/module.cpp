@@ -12,6 +12,7 @@ PYBIND11_MODULE(_lumra, module) {
   binding::add_filters(module);
   binding::add_least_squares(module);
   binding::add_levels(module);
+  binding::add_rates(module);
   binding::add_recordings(module);
   binding::add_spectra(module);
   binding::add_transforms(module);

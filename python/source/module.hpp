@@ -11,6 +11,7 @@ void add_figures(pybind11::module_ &module);
 void add_filters(pybind11::module_ &module);
 void add_least_squares(pybind11::module_ &module);
 void add_levels(pybind11::module_ &module);
+void add_rates(pybind11::module_ &module);
 void add_recordings(pybind11::module_ &module);
 void add_spectra(pybind11::module_ &module);
 void add_transforms(pybind11::module_ &module);
