@@ -4,6 +4,7 @@
 #include <bit>
 #include <cmath>
 #include <cstring>
+#include <initializer_list>
 #include <numbers>
 #include <utility>
 
@@ -19,21 +20,23 @@ namespace {
 /// types take about the same multiples of these everywhere.
 double point_cost(std::size_t points) noexcept {
   // Between powers of two from 2^8 on, for the caches and for MKL's codes.
-  static constexpr double by_size[] = {0.5, 0.5, 0.53, 0.63, 0.77, 1.0, 1.25, 1.5, 1.7, 3.5};
+  static constexpr double by_size[] = {0.5, 0.5, 0.53, 0.63, 0.8, 1.2, 1.35, 1.55, 1.75, 3.6};
   static constexpr double by_twos[] = {3.0, 2.3, 1.7, 1.35, 1.2};  // few factors of 2
-  constexpr double large_prime = 7, middling_prime = 1.5;
+  constexpr double large_prime = 6, middling_prime = 1.5;
   const double size = std::clamp(std::log2(static_cast<double>(points)) - 8, 0.0, 8.99);
   const auto below = static_cast<std::size_t>(size);
-  double cost = by_size[below] + (size - static_cast<double>(below)) * (by_size[below + 1] - by_size[below]);
+  const double cost = by_size[below] + (size - static_cast<double>(below)) * (by_size[below + 1] - by_size[below]);
   const auto twos = static_cast<std::size_t>(std::countr_zero(points));
-  if (twos < std::size(by_twos)) cost *= by_twos[twos];
   std::size_t rest = points >> twos;
-  for (const unsigned prime : {3U, 5U, 7U})
-    while (rest % prime == 0) rest /= prime;
-  if (rest == 1) return cost;
-  for (const unsigned prime : {11U, 13U})
-    while (rest % prime == 0) rest /= prime;
-  return cost * (rest == 1 ? middling_prime : large_prime);
+  const auto divide_by = [&rest](std::initializer_list<unsigned> primes) {
+    for (const unsigned prime : primes)
+      while (rest % prime == 0) rest /= prime;
+  };
+  divide_by({3, 5, 7});
+  const bool is_smooth = rest == 1;
+  divide_by({11, 13});
+  if (rest != 1) return cost * large_prime;
+  return cost * (is_smooth ? 1 : middling_prime) * (twos < std::size(by_twos) ? by_twos[twos] : 1);
 }
 
 /// In inputs, of the low pass to either side.
