@@ -1,7 +1,9 @@
 # SPDX-License-Identifier: MIT
+import dataclasses
 import datetime
 import os
 from fractions import Fraction
+from functools import cached_property
 from typing import Any, Dict, Iterable, Iterator, List, Mapping, NamedTuple, Optional, Sequence, Tuple, Type, TypeVar, Union
 from typing import Literal, overload
 
@@ -60,9 +62,9 @@ class Recording:
     def duration(self) -> float: ...
     @property
     def dtype(self) -> np.dtype[Any]: ...
-    @property
+    @cached_property
     def captures(self) -> Tuple[Capture, ...]: ...
-    @property
+    @cached_property
     def annotations(self) -> Tuple[Annotation, ...]: ...
     @property
     def metadata(self) -> Dict[str, Any]: ...
@@ -104,38 +106,28 @@ class Tone(NamedTuple):
     enob: float
     harmonics: Tuple[Harmonic, ...]
 
+@dataclasses.dataclass(frozen=True, eq=False, repr=False)
 class Spectrum:
-    @property
-    def power(self) -> NDArray[np.float64]: ...
-    @property
-    def max_hold(self) -> Optional[NDArray[np.float64]]: ...
-    @property
-    def min_hold(self) -> Optional[NDArray[np.float64]]: ...
-    @property
-    def sample_rate(self) -> float: ...
-    @property
-    def nfft(self) -> int: ...
-    @property
-    def window(self) -> _Window: ...
-    @property
-    def overlap(self) -> float: ...
-    @property
-    def segments(self) -> int: ...
-    @property
-    def enbw(self) -> float: ...
-    @property
-    def center(self) -> float: ...
-    @property
-    def sides(self) -> int: ...
+    power: NDArray[np.float64]
+    max_hold: Optional[NDArray[np.float64]]
+    min_hold: Optional[NDArray[np.float64]]
+    sample_rate: float
+    nfft: int
+    window: _Window
+    overlap: float
+    segments: int
+    enbw: float
+    center: float
+    sides: int
     @property
     def df(self) -> float: ...
     @property
     def rbw(self) -> float: ...
-    @property
+    @cached_property
     def frequency(self) -> NDArray[np.float64]: ...
-    @property
+    @cached_property
     def level(self) -> NDArray[np.float64]: ...
-    @property
+    @cached_property
     def density(self) -> NDArray[np.float64]: ...
     def channel_power(self, center: float, bandwidth: float) -> float: ...
     def occupied_bandwidth(self, fraction: float = ...) -> Tuple[float, float]: ...
@@ -166,28 +158,19 @@ class SpectrumEstimator:
     def merge(self: _Self, other: SpectrumEstimator) -> _Self: ...
     def result(self) -> Spectrum: ...
 
+@dataclasses.dataclass(frozen=True, eq=False, repr=False)
 class Waterfall:
-    @property
-    def time(self) -> NDArray[np.float64]: ...
-    @property
-    def frequency(self) -> NDArray[np.float64]: ...
-    @property
-    def power(self) -> NDArray[np.float64]: ...
-    @property
-    def sample_rate(self) -> float: ...
-    @property
-    def nfft(self) -> int: ...
-    @property
-    def window(self) -> _Window: ...
-    @property
-    def overlap(self) -> float: ...
-    @property
-    def segments(self) -> int: ...
-    @property
-    def enbw(self) -> float: ...
-    @property
-    def center(self) -> float: ...
-    @property
+    time: NDArray[np.float64]
+    frequency: NDArray[np.float64]
+    power: NDArray[np.float64]
+    sample_rate: float
+    nfft: int
+    window: _Window
+    overlap: float
+    segments: int
+    enbw: float
+    center: float
+    @cached_property
     def level(self) -> NDArray[np.float64]: ...
     def plot(self, ax: Any = ...) -> Any: ...
     def to_xarray(self) -> Any: ...
@@ -216,23 +199,16 @@ def waterfall(
 
 # Levels and errors
 
+@dataclasses.dataclass(frozen=True)
 class Level:
-    @property
-    def samples(self) -> int: ...
-    @property
-    def rms(self) -> float: ...
-    @property
-    def peak(self) -> float: ...
-    @property
-    def peak_index(self) -> int: ...
-    @property
-    def papr_db(self) -> float: ...
-    @property
-    def dc(self) -> Union[complex, float]: ...
-    @property
-    def rms_dbfs(self) -> float: ...
-    @property
-    def peak_dbfs(self) -> float: ...
+    samples: int
+    rms: float
+    peak: float
+    peak_index: int
+    papr_db: float
+    dc: Union[complex, float]
+    rms_dbfs: float
+    peak_dbfs: float
 
 class LevelMeter:
     def __init__(self, start: int = ...) -> None: ...
@@ -250,25 +226,17 @@ def level(x: Any, client: Any = ..., compute: Literal[True] = ...) -> Level: ...
 def level(x: Any, client: Any = ..., *, compute: bool) -> Any: ...
 def ccdf(x: Union[ArrayLike, Recording], above_db: ArrayLike) -> NDArray[np.float64]: ...
 
+@dataclasses.dataclass(frozen=True)
 class Evm:
-    @property
-    def rms(self) -> float: ...
-    @property
-    def peak(self) -> float: ...
-    @property
-    def magnitude_rms(self) -> float: ...
-    @property
-    def phase_rms(self) -> float: ...
-    @property
-    def gain(self) -> complex: ...
-    @property
-    def delay(self) -> float: ...
-    @property
-    def frequency(self) -> float: ...
-    @property
-    def dc(self) -> complex: ...
-    @property
-    def samples(self) -> int: ...
+    rms: float
+    peak: float
+    magnitude_rms: float
+    phase_rms: float
+    gain: complex
+    delay: float
+    frequency: float
+    dc: complex
+    samples: int
     @property
     def rms_percent(self) -> float: ...
     @property
@@ -378,4 +346,49 @@ class Channelizer:
     def flush(self) -> List[_Array]: ...
     def reset(self) -> None: ...
 
-__all__: List[str]
+__all__ = [
+    "Annotation",
+    "Capture",
+    "Channelizer",
+    "Error",
+    "Evm",
+    "FirFilter",
+    "Harmonic",
+    "IirFilter",
+    "Level",
+    "LevelMeter",
+    "Peak",
+    "Recording",
+    "Resampler",
+    "Spectrum",
+    "SpectrumEstimator",
+    "Tone",
+    "Waterfall",
+    "WindowFigures",
+    "ccdf",
+    "convolve",
+    "correlate",
+    "decibels",
+    "divide",
+    "evm",
+    "fft",
+    "ifft",
+    "irfft",
+    "kaiser_lowpass",
+    "level",
+    "lfilter",
+    "lookup",
+    "lstsq",
+    "magnitude",
+    "polynomial",
+    "power",
+    "resample",
+    "rfft",
+    "root_raised_cosine",
+    "sosfilter",
+    "spectrum",
+    "waterfall",
+    "window",
+    "window_figures",
+    "write",
+]

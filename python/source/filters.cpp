@@ -6,14 +6,12 @@
 #include "axis.hpp"
 #include "coefficients.hpp"
 #include "module.hpp"
+#include "patience.hpp"
 #include "recent.hpp"
 #include "stream_filters.hpp"
 
 namespace binding {
 namespace {
-
-/// Samples of one call without the GIL in between.
-constexpr std::size_t piece = std::size_t{1} << 18;
 
 struct recursion_key {
   element type;
@@ -35,9 +33,9 @@ recursion make_recursion(const recursion_key &of) {
 
 template <class T>
 void filter_row(lumra_iir *filter, const T *in, std::ptrdiff_t in_step, T *out, std::ptrdiff_t out_step,
-                std::size_t count, interruptions &signals) {
+                std::size_t count, std::size_t piece, interruptions &signals) {
   const bool in_place = in_step == 1 && out_step == 1;
-  const std::size_t at_once = in_place ? piece : std::min(gathered, count);
+  const std::size_t at_once = in_place ? piece : std::min({gathered, piece, count});
   std::vector<T> buffer(in_place ? 0 : at_once);
   for (std::size_t done = 0; done < count;) {
     const std::size_t part = std::min(at_once, count - done);
@@ -66,6 +64,7 @@ void filter_rows(const recursion_key &key, const py::array &x, py::array &y, std
   const py::gil_scoped_release released;
   interruptions signals;
   recursion filter = kept.take(key, [&] { return make_recursion(key); });
+  const std::size_t piece = filtered_at_once(key.a.size() + key.b.size());
   const std::size_t order = lumra::detail::number_of(filter.get(), &lumra_iir_order);
   const std::size_t state_bytes = order * (is_complex(key.type) ? 16 : 8);
   rows.each([&](std::ptrdiff_t in, std::ptrdiff_t out) {
@@ -73,7 +72,7 @@ void filter_rows(const recursion_key &key, const py::array &x, py::array &y, std
       lumra::check_open(lumra_iir_set_state(filter.get(), states, order));
     else
       lumra::check_open(lumra_iir_reset(filter.get()));
-    filter_row(filter.get(), from + in, rows.in_step, to + out, rows.out_step, count, signals);
+    filter_row(filter.get(), from + in, rows.in_step, to + out, rows.out_step, count, piece, signals);
     if (states == nullptr) return;
     lumra::check_open(lumra_iir_get_state(filter.get(), states, order));
     states += state_bytes;
@@ -164,9 +163,13 @@ py::array combine(Run run, const samples &x, const samples &y, lumra::mode mode)
   lumra::check_open(lumra_convolve_size(x.size(), y.size(), part, &count));
   py::array result = new_array(x.type(), count);
   auto *const out = lumra::detail::raw(static_cast<T *>(result.mutable_data()));
-  const py::gil_scoped_release released;
-  lumra::check_open(run(lumra::detail::raw(x.first<T>()), x.size(), lumra::detail::raw(y.first<Tap>()), y.size(), part,
-                        LUMRA_METHOD_AUTO, out, count));
+  const auto *const in = lumra::detail::raw(x.first<T>());
+  const auto *const other = lumra::detail::raw(y.first<Tap>());
+  const std::size_t nx = x.size(), ny = y.size();
+  // A nanosecond for each product, or 100 for each sample through transforms.
+  const double expected = 1e-9 * static_cast<double>(nx + ny) * std::min(100.0, static_cast<double>(std::min(nx, ny)));
+  run_patiently(expected, {x.array(), y.array(), result},
+                [=] { lumra::check_open(run(in, nx, other, ny, part, LUMRA_METHOD_AUTO, out, count)); });
   return result;
 }
 

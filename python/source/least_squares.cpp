@@ -5,6 +5,7 @@
 
 #include "arrays.hpp"
 #include "module.hpp"
+#include "patience.hpp"
 
 namespace binding {
 namespace {
@@ -44,11 +45,14 @@ py::array solve(py::handle a_given, py::handle b_given, py::handle rcond_given) 
   py::array x = new_array(type, shape);
   void *const to = x.mutable_data();
   const void *const from_a = left.data(), *const from_b = right.data();
-  const py::gil_scoped_release released;
-  lumra_least_squares *made = nullptr;
-  lumra::check_open(lumra_least_squares_create(&how, &made));
-  const std::unique_ptr<lumra_least_squares, solver_release> solver(made);
-  lumra::check_open(lumra_least_squares_solve(made, from_a, from_b, rcond, to, nullptr));
+  const double rows = static_cast<double>(how.rows), columns = static_cast<double>(how.columns);
+  const double expected = 2e-9 * rows * columns * (std::min(rows, columns) + static_cast<double>(how.right_sides));
+  run_patiently(expected, {left, right, x}, [=] {
+    lumra_least_squares *made = nullptr;
+    lumra::check_open(lumra_least_squares_create(&how, &made));
+    const std::unique_ptr<lumra_least_squares, solver_release> solver(made);
+    lumra::check_open(lumra_least_squares_solve(made, from_a, from_b, rcond, to, nullptr));
+  });
   return x;
 }
 

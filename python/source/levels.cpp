@@ -3,6 +3,7 @@
 
 #include "accumulators.hpp"
 #include "module.hpp"
+#include "patience.hpp"
 
 namespace binding {
 namespace {
@@ -62,36 +63,46 @@ py::tuple read(meter &of) {
                         found.peak_db);
 }
 
-/// run(levels, shares, count) under the lock that it needs.
-template <class Run>
-py::array shares(py::handle above, Run run) {
-  const numbers given(above, "above_db");
-  if (is_complex(given.type))
-    refuse_type("above_db", std::string("of dtype ") + name_of(given.type), "give levels in dB");
-  const py::array levels = given.as(element::f64).attr("copy")("C").cast<py::array>();
-  py::array result = new_array(element::f64, std::vector<py::ssize_t>(levels.shape(), levels.shape() + levels.ndim()));
-  run(static_cast<const double *>(levels.data()), static_cast<double *>(result.mutable_data()),
-      static_cast<std::uint64_t>(levels.size()));
-  return result;
-}
+/// Levels in dB that were asked for, and room for the share of samples above each.
+struct levels_asked {
+  explicit levels_asked(py::handle above) {
+    const numbers given(above, "above_db");
+    if (is_complex(given.type))
+      refuse_type("above_db", std::string("of dtype ") + name_of(given.type), "give levels in dB");
+    levels = given.as(element::f64).attr("copy")("C").cast<py::array>();
+    shares = new_array(element::f64, std::vector<py::ssize_t>(levels.shape(), levels.shape() + levels.ndim()));
+    from = static_cast<const double *>(levels.data());
+    to = static_cast<double *>(shares.mutable_data());
+    count = static_cast<std::uint64_t>(levels.size());
+  }
+
+  py::array levels, shares;
+  const double *from;
+  double *to;
+  std::uint64_t count;
+};
 
 py::array ccdf_so_far(meter &of, py::handle above) {
-  return shares(above, [&](const double *levels, double *result, std::uint64_t count) {
-    of.with_object([&](const auto *object) { lumra::check_open(lumra_level_ccdf(object, levels, result, count)); });
-  });
+  levels_asked asked(above);
+  of.with_object(
+      [&](const auto *object) { lumra::check_open(lumra_level_ccdf(object, asked.from, asked.to, asked.count)); });
+  return std::move(asked.shares);
 }
 
 py::array ccdf(py::handle of, py::handle above) {
   samples x(of, "x");
   if (x.size() == 0) refuse_value("x", "empty", "give one sample or more");
   x.gather();
-  return shares(above, [&](const double *levels, double *result, std::uint64_t count) {
-    with_type(x.type(), [&]<class T>(std::type_identity<T>) {
-      constexpr auto run = lumra::detail::form<T>(&lumra_ccdf_f32, &lumra_ccdf_f64, &lumra_ccdf_cf32, &lumra_ccdf_cf64);
-      const py::gil_scoped_release released;
-      lumra::check_open(run(lumra::detail::raw(x.first<T>()), x.size(), levels, result, count));
-    });
+  levels_asked asked(above);
+  with_type(x.type(), [&]<class T>(std::type_identity<T>) {
+    constexpr auto run = lumra::detail::form<T>(&lumra_ccdf_f32, &lumra_ccdf_f64, &lumra_ccdf_cf32, &lumra_ccdf_cf64);
+    const auto *const in = lumra::detail::raw(x.first<T>());
+    const std::size_t n = x.size();
+    run_patiently(
+        1e-8 * static_cast<double>(n), {x.array(), asked.levels, asked.shares},
+        [=, from = asked.from, to = asked.to, count = asked.count] { lumra::check_open(run(in, n, from, to, count)); });
   });
+  return std::move(asked.shares);
 }
 
 }  // namespace

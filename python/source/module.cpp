@@ -3,6 +3,7 @@
 #include "module.hpp"
 
 #include "failures.hpp"
+#include "patience.hpp"
 
 PYBIND11_MODULE(_lumra, module) {
   binding::translate_failures();
@@ -12,6 +13,7 @@ PYBIND11_MODULE(_lumra, module) {
   binding::add_filters(module);
   binding::add_least_squares(module);
   binding::add_levels(module);
+  binding::add_patience();
   binding::add_rates(module);
   binding::add_recordings(module);
   binding::add_spectra(module);

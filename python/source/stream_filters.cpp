@@ -11,9 +11,6 @@
 namespace binding {
 namespace {
 
-/// Samples of one call without the GIL in between.
-constexpr std::size_t piece = std::size_t{1} << 18;
-
 struct recursive {
   using object = lumra_iir;
   using owned = lumra::detail::owned<lumra_iir, &lumra_iir_free>;
@@ -36,6 +33,8 @@ struct recursive {
     return lumra::detail::make<owned>(
         [&](lumra_iir **out) { return lumra_iir_create(&how, b.data(), b.size(), a.data(), a.size(), out); });
   }
+
+  [[nodiscard]] std::size_t piece() const noexcept { return filtered_at_once(a.size() + b.size()); }
 
   std::vector<double> b, a;
 };
@@ -72,6 +71,9 @@ struct finite {
         [&](lumra_fir **out) { return lumra_fir_create(&how, first, taps.size() / (complex ? 2 : 1), out); });
   }
 
+  /// Long filters go through transforms.
+  [[nodiscard]] std::size_t piece() const noexcept { return filtered_at_once(std::min(taps.size(), std::size_t{100})); }
+
   bool complex = false;
   std::vector<double> taps;  // pairs where they are complex
 };
@@ -101,7 +103,7 @@ class stream {
         fresh_ = false;
         with_type(type, [&]<class T>(std::type_identity<T>) {
           auto *out = static_cast<T *>(to);
-          in_pieces<T>(x, piece, [&](const T *from, std::size_t count) {
+          in_pieces<T>(x, kind_.piece(), [&](const T *from, std::size_t count) {
             lumra::check_open(Kind::process(filter_.get(), from, out, count));
             out += count;
           });

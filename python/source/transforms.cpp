@@ -6,6 +6,7 @@
 #include "arrays.hpp"
 #include "axis.hpp"
 #include "module.hpp"
+#include "patience.hpp"
 #include "recent.hpp"
 
 namespace binding {
@@ -167,8 +168,7 @@ py::array execute(kind with, bool forward, py::handle of, py::handle n, py::hand
   std::vector<py::ssize_t> shape(x.shape(), x.shape() + x.ndim());
   shape[axis] = with == kind::real && forward ? points / 2 + 1 : points;
   target result(out, out_type, shape, {&x});
-  const py::array &to = result.array();
-  const axis_rows rows(x, to, axis);
+  const axis_rows rows(x, result.array(), axis);
   row_set set{};
   set.layout = forward ? lumra_fft_layout{rows.in_step, rows.in_distance, rows.out_step, rows.out_distance}
                        : lumra_fft_layout{rows.out_step, rows.out_distance, rows.in_step, rows.in_distance};
@@ -177,12 +177,11 @@ py::array execute(kind with, bool forward, py::handle of, py::handle n, py::hand
   set.out_distance = rows.out_distance * bytes_of(out_type);
   const auto *const from = static_cast<const char *>(x.data());
   char *const into = result.first<char>();
-  {
-    const py::gil_scoped_release released;
+  const auto transform_all = [=, bytes_in = bytes_of(in_type), bytes_out = bytes_of(out_type)]() mutable {
     interruptions signals;
-    rows.each([&](std::ptrdiff_t in, std::ptrdiff_t at) {
-      set.in = from + in * bytes_of(in_type);
-      set.out = into + at * bytes_of(out_type);
+    rows.each([&](std::ptrdiff_t in_at, std::ptrdiff_t out_at) {
+      set.in = from + in_at * bytes_in;
+      set.out = into + out_at * bytes_out;
       run(wanted, set, workers, signals);
       if (!fills) return;
       for (std::uint64_t row = 0; row < set.rows; ++row) {
@@ -193,6 +192,13 @@ py::array execute(kind with, bool forward, py::handle of, py::handle n, py::hand
           complete(reinterpret_cast<std::complex<double> *>(bins), rows.out_step, wanted.points);
       }
     });
+  };
+  if (wanted.points > points_at_once) {
+    run_patiently(1e-7 * static_cast<double>(wanted.points), {x, result.array()}, transform_all);
+  } else {
+    const py::gil_scoped_release released;
+    auto work = transform_all;
+    work();
   }
   return result.finish();
 }

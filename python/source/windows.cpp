@@ -3,11 +3,14 @@
 
 #include "arrays.hpp"
 #include "module.hpp"
+#include "patience.hpp"
 
 namespace binding {
 namespace {
 
 constexpr const char *known = "hann, flattop, blackmanharris and (\"kaiser\", 8.6) are some";
+/// A value takes about so long.
+constexpr double seconds_each = 2e-8;
 /// More than fits in any machine's memory as doubles.
 constexpr std::int64_t most = std::int64_t{1} << 40;
 
@@ -31,23 +34,22 @@ py::array make(py::handle name, py::handle n, bool symmetric, py::handle dtype) 
   const auto span = symmetric ? lumra::window_span::symmetric : lumra::window_span::periodic;
   py::array values = new_array(of(false, wanted.itemsize() == 4), length);
   void *const to = values.mutable_data();
-  const py::gil_scoped_release released;
-  if (wanted.itemsize() == 4)
-    lumra::make_window(shape, std::span(static_cast<float *>(to), length), span);
-  else
-    lumra::make_window(shape, std::span(static_cast<double *>(to), length), span);
+  const bool single = wanted.itemsize() == 4;
+  run_patiently(seconds_each * static_cast<double>(length), {values}, [=] {
+    if (single)
+      lumra::make_window(shape, std::span(static_cast<float *>(to), length), span);
+    else
+      lumra::make_window(shape, std::span(static_cast<double *>(to), length), span);
+  });
   return values;
 }
 
 py::tuple figures(py::handle name, py::handle n) {
   const lumra::window_shape shape = window_of(name);
   const std::uint64_t length = length_of(n, 1);
-  lumra_window_quality found{};
-  {
-    const py::gil_scoped_release released;
-    found = lumra::window_figures(shape, length);
-  }
-  return py::make_tuple(found.coherent_gain, found.noise_bandwidth_bins, found.scalloping_loss_db);
+  const auto found = std::make_shared<lumra_window_quality>();
+  run_patiently(seconds_each * static_cast<double>(length), {}, [=] { *found = lumra::window_figures(shape, length); });
+  return py::make_tuple(found->coherent_gain, found->noise_bandwidth_bins, found->scalloping_loss_db);
 }
 
 }  // namespace
