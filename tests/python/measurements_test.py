@@ -178,6 +178,47 @@ class Levels(Test):
         self.assertEqual(lumra.evm([1, 2], [1, 2]).rms_db, -np.inf)
 
 
+class Shown(Test):
+    def test_pictures(self):
+        try:
+            import matplotlib
+        except ImportError:
+            self.skipTest("no Matplotlib")
+        matplotlib.use("Agg")
+        x = noise(100_000, np.complex64)
+        for nfft, hold, center in [(64, False, 0), (16384, True, 1e12), (64, True, 2.4e9)]:
+            found = lumra.spectrum(x, 2e6, nfft=nfft, hold=hold, frequency=center)
+            ax = found.plot()
+            line = ax.lines[0].get_xydata()
+            self.assertEqual(ax.get_ylabel(), "Level (dBFS)")
+            self.assertIn(ax.get_xlabel(), ("Frequency (kHz)", "Frequency (MHz)", "Offset from 1000 GHz (MHz)"))
+            if nfft == 64:
+                self.assert_close(line[:, 1], found.level)
+                self.assert_close(line[:, 0] * {"k": 1e3, "M": 1e6}[ax.get_xlabel()[11]], found.frequency)
+            low, high = ax.get_ylim()
+            self.assertTrue(low < line[:, 1].min() and line[:, 1].max() < high)
+            self.assertIs(found.plot(ax), ax)
+            rows = lumra.waterfall(x, 2e6, nfft=nfft, frequency=center)
+            ax = rows.plot()
+            self.assertTrue(same(ax.images[0].get_array().data, rows.level))
+            self.assertGreater(ax.get_ylim()[0], ax.get_ylim()[1])  # time runs down
+            matplotlib.pyplot.close("all")
+        for silent in (lumra.spectrum(np.zeros(64), nfft=16), lumra.waterfall(np.zeros(16), nfft=16)):
+            silent.plot().figure.canvas.draw()
+
+    def test_datasets(self):
+        try:
+            import xarray  # noqa: F401
+        except ImportError:
+            self.skipTest("no xarray")
+        x = noise(1000, np.complex64)
+        for found in (lumra.spectrum(x, 2e6, nfft=64, hold=True), lumra.waterfall(x, 2e6, nfft=64, window=("kaiser", 9))):
+            data = found.to_xarray()
+            self.assertTrue(same(data.power.values, found.power) and same(data.frequency.values, found.frequency))
+            self.assertEqual((data.frequency.units, data.attrs["nfft"]), ("Hz", 64))
+        self.assertEqual((data.time.units, data.attrs["window"]), ("s", "kaiser:9"))
+
+
 class Refusals(Test):
     def test_each_names_argument_and_value(self):
         x = noise(100, np.complex64)
