@@ -46,11 +46,11 @@ typedef struct lumra_channelizer_options {
 } lumra_channelizer_options;
 
 #define LUMRA_CHANNELIZER_OPTIONS \
-  { sizeof(lumra_channelizer_options), LUMRA_TYPE_CF32, 0, 80.0, 1, 0 }
+  { sizeof(lumra_channelizer_options), LUMRA_TYPE_CF32, 1.0, 80.0, 1, 0 }
 
 /* Makes a channelizer.
  *
- * options      its sample rate must be set
+ * options      null: LUMRA_CHANNELIZER_OPTIONS, with a sample rate of 1 Hz
  * channels     `count` records, which are copied
  * count        1 to 4096
  * channelizer  the object's address is written here

@@ -27,7 +27,7 @@ def _ratio(rate_in, rate_out):
     if not Fraction(1, 10**9) < ratio < 10**9:
         raise ValueError(f"rate_in is {rate_in!r} and rate_out {rate_out!r}; give rates less than 10**9 times apart")
     if ratio.numerator < _MOST and ratio.denominator < _MOST:
-        return ratio, (ratio.numerator, ratio.denominator, 0.0, 0.0)
+        return ratio, (ratio.numerator, ratio.denominator, 1.0, 1.0)
     for name, rate, exact in (("rate_in", rate_in, exact_in), ("rate_out", rate_out, exact_out)):
         if Fraction(float(exact)) != exact:
             raise ValueError(f"{name} is {rate!r}; give rates whose ratio has less than 65 bits, or that floats hold")

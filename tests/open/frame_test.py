@@ -43,7 +43,7 @@ class Frame(lumra.Test):
             with self.subTest(kind):
                 options = lumra.record(kind)
                 between = lumra.functions[f"{kind}_create"].argtypes[1:-1]
-                data = [np.ones(16) if t is ctypes.c_void_p else 1 for t in between]
+                data = [np.full(16, 0.25) if t is ctypes.c_void_p else 1 for t in between]
                 size = ctypes.sizeof(options)
                 self.assertEqual(size, sum(ctypes.sizeof(t) for _, t in options._fields_))
                 initialiser = lumra.initialisers[f"lumra_{kind}_options"]
