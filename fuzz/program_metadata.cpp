@@ -60,15 +60,15 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t *data, std::size_t size
     const auto samples = static_cast<std::uint64_t>(static_cast<double>(source.chosen_samples) / ratio) + 1;
     tool::results given(source.files);
     const recording::sigmf_files files = recording::sigmf_files_of(folder.path() / "y");
-    recording::sigmf_writer writer(given.add_file(files.data), given.add_file(files.metadata));
-    writer.write(recording::derived_metadata(source, {.first = source.chosen_first,
-                                                      .samples_in = source.chosen_samples,
-                                                      .ratio = ratio,
-                                                      .samples = samples,
-                                                      .rate = source.rate / ratio,
-                                                      .frequency = {},
-                                                      .datatype = "cf32_le",
-                                                      .description = "resampled"}));
+    const std::vector<recording::derived_piece> whole = {{source.chosen_first, source.chosen_samples, 0, samples}};
+    const std::string text =
+        recording::metadata_text(recording::derived_metadata(source, {.pieces = whole,
+                                                                      .rate = source.rate / ratio,
+                                                                      .frequency = {},
+                                                                      .datatype = "cf32_le",
+                                                                      .description = "resampled"}));
+    (void)given.add_file(files.data);
+    given.add_file(files.metadata).write(std::as_bytes(std::span(text)));
     given.deliver();
   } catch (const recording::failure &failure) {
     fuzz::require_one_line(tool::printable(failure.what()));

@@ -18,16 +18,46 @@ constexpr const char *no_longer_true[] = {
     "core:metadata_only", "core:trailing_bytes", "core:offset",   "core:collection",
 };
 
-/// Maps indices of the source's samples to those of the result.
-struct index_map {
-  const derivation &made;
+/// Samples [first, end) of the source.
+struct range {
+  std::uint64_t first, end;
+  range(std::uint64_t begin, std::uint64_t samples) : first(begin), end(begin + std::min(samples, endless - begin)) {}
+};
 
-  [[nodiscard]] std::uint64_t end() const noexcept { return made.first + made.samples_in; }
-  [[nodiscard]] std::uint64_t operator()(std::uint64_t index) const {
-    const std::uint64_t offset = std::clamp(index, made.first, end()) - made.first;
-    if (made.ratio == 1) return std::min(offset, made.samples);  // exact beyond 2^53, too
-    return std::min(static_cast<std::uint64_t>(std::llround(static_cast<double>(offset) / made.ratio)), made.samples);
+/// Maps indices of the source's samples to those of the result.
+class index_map {
+ public:
+  index_map(const source &from, const derivation &made) : pieces_(made.pieces), factor_(made.rate / from.rate) {}
+
+  [[nodiscard]] std::uint64_t samples() const noexcept { return pieces_.back().at + pieces_.back().samples; }
+  /// The first piece that holds samples of a range; null where none does.
+  [[nodiscard]] const derived_piece *piece_of(const range &sought) const {
+    for (const derived_piece &piece : pieces_)
+      if (sought.first < piece.first + piece.samples_in && sought.end > piece.first) return &piece;
+    return nullptr;
   }
+  /// Indices between pieces are those of the next piece's first sample.
+  [[nodiscard]] std::uint64_t operator()(std::uint64_t index) const {
+    for (const derived_piece &piece : pieces_) {
+      if (index < piece.first) return piece.at;
+      if (index - piece.first < piece.samples_in) return piece.at + offset(piece, index - piece.first);
+    }
+    return samples();
+  }
+  /// Of a first sample: it is there even where nothing is behind it.
+  [[nodiscard]] std::uint64_t first(std::uint64_t index) const {
+    return std::min((*this)(index), std::max<std::uint64_t>(samples(), 1) - 1);
+  }
+
+ private:
+  [[nodiscard]] std::uint64_t offset(const derived_piece &piece, std::uint64_t inputs) const {
+    if (factor_ == 1) return std::min(inputs, piece.samples);  // exact beyond 2^53, too
+    const double outputs = std::round(static_cast<double>(inputs) * factor_), most = static_cast<double>(piece.samples);
+    return outputs < most ? static_cast<std::uint64_t>(outputs) : piece.samples;
+  }
+
+  const std::vector<derived_piece> &pieces_;
+  double factor_;
 };
 
 /// The item of a list of the source's metadata, or an empty object.
@@ -41,17 +71,17 @@ json captures_of(const source &from, const derivation &made, const index_map &ma
   json captures = json::array();
   for (std::size_t i = 0; i < from.captures.size(); ++i) {
     const capture &each = from.captures[i];
-    if (each.samples == 0 || each.start >= map.end() || each.samples <= made.first - std::min(made.first, each.start))
-      continue;
+    const derived_piece *const piece = each.samples == 0 ? nullptr : map.piece_of({each.start, each.samples});
+    if (!piece) continue;
     json item = item_of(from, "captures", i);
     for (const char *field : {"core:header_bytes", "core:global_index"}) item.erase(field);
-    const std::uint64_t at = std::min(map(each.start), std::max<std::uint64_t>(made.samples, 1) - 1);
+    const std::uint64_t at = map.first(std::max(each.start, piece->first));
     item["core:sample_start"] = at;
-    if (each.start < made.first) {
+    if (each.start < piece->first) {
       item.erase("core:datetime");
       if (each.begin)
         item["core:datetime"] =
-            text_of(later(*each.begin, static_cast<long double>(made.first - each.start) / from.rate));
+            text_of(later(*each.begin, static_cast<long double>(piece->first - each.start) / from.rate));
     }
     const std::optional<double> frequency = made.frequency ? made.frequency : each.frequency;
     if (frequency)
@@ -67,15 +97,36 @@ json captures_of(const source &from, const derivation &made, const index_map &ma
   return captures;
 }
 
+/// The source's centre at a sample, where it is known.
+double frequency_at(const source &from, std::uint64_t index) {
+  double frequency = 0;
+  for (const capture &each : from.captures)
+    if (each.start <= index) frequency = each.frequency.value_or(0);
+  return frequency;
+}
+
+/// Cuts an annotation's frequencies to a band; false where none are left.
+bool cut_to_band(json &item, const annotation &each, double low, double high) {
+  if (!each.low || !each.high) return true;
+  if (*each.high <= low || *each.low >= high) return false;
+  if (*each.low < low) item["core:freq_lower_edge"] = low;
+  if (*each.high > high) item["core:freq_upper_edge"] = high;
+  return true;
+}
+
 json annotations_of(const source &from, const derivation &made, const index_map &map) {
+  const bool keeps_band = made.rate == from.rate && !made.frequency;
   json annotations = json::array();
   for (const annotation &each : from.annotations) {
-    const bool ends_before = each.start < made.first && each.start + each.samples.value_or(0) <= made.first;
-    if (ends_before || each.start >= map.end()) continue;
+    const range where(each.start, std::max<std::uint64_t>(each.samples.value_or(1), 1));
+    const derived_piece *const piece = map.piece_of(where);
+    if (!piece) continue;
     json item = item_of(from, "annotations", each.item);
-    const std::uint64_t at = std::min(map(each.start), std::max<std::uint64_t>(made.samples, 1) - 1);
+    const std::uint64_t first = std::max(where.first, piece->first), at = map.first(first);
+    const double centre = made.frequency.value_or(frequency_at(from, first));
+    if (!keeps_band && !cut_to_band(item, each, centre - made.rate / 2, centre + made.rate / 2)) continue;
     item["core:sample_start"] = at;
-    if (each.samples) item["core:sample_count"] = std::max<std::uint64_t>(map(each.start + *each.samples), at + 1) - at;
+    if (each.samples) item["core:sample_count"] = std::max<std::uint64_t>(map(where.end), at + 1) - at;
     annotations.push_back(std::move(item));
   }
   return annotations;
@@ -84,7 +135,7 @@ json annotations_of(const source &from, const derivation &made, const index_map 
 }  // namespace
 
 json derived_metadata(const source &from, const derivation &made) {
-  const index_map map{made};
+  const index_map map(from, made);
   json global = json::object();
   std::string description = from.name;
   if (from.metadata) {

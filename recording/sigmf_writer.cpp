@@ -42,9 +42,4 @@ std::string metadata_text(const nlohmann::json &metadata) {
   return text;
 }
 
-void sigmf_writer::write(const nlohmann::json &metadata) {
-  const std::string text = metadata_text(metadata);
-  metadata_.write(std::as_bytes(std::span(text)));
-}
-
 }  // namespace recording

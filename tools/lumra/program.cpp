@@ -56,7 +56,7 @@ const CLI::App *check_words(const CLI::App &program, int count, const char *cons
 }
 
 int run(int count, const char *const *arguments) {
-  CLI::App program("Spectra, levels, error vectors and resampling of recorded radio signals", "lumra");
+  CLI::App program("Spectra, levels, error vectors, channels and resampling of recorded radio signals", "lumra");
   program.formatter(std::make_shared<help_formatter>());
   program.set_help_flag("--help,-h", "Show this and end");
   program.set_version_flag("--version", "lumra " + lumra::library().version_text, "Show the version and end");
@@ -77,6 +77,7 @@ int run(int count, const char *const *arguments) {
   add_level(program, work);
   add_evm(program, work);
   add_resample(program, work);
+  add_channels(program, work);
   add_convert(program, work);
   std::string name;
   const auto refuse = [&](const std::string &reason) {

@@ -44,6 +44,11 @@ void require_samples(const recording::source &source) {
 
 }  // namespace
 
+selection select_all(const recording::source &source) {
+  require_samples(source);
+  return of_stretches(source, source.stretches);
+}
+
 selection select_frequency(const recording::source &source) {
   require_samples(source);
   std::vector<std::vector<stretch>> groups;

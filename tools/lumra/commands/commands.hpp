@@ -12,6 +12,7 @@ namespace tool {
 /// Its results are delivered when all else is released, so that nothing can fail behind that.
 using work_to_do = std::function<results()>;
 
+void add_channels(CLI::App &program, work_to_do &work);
 void add_convert(CLI::App &program, work_to_do &work);
 void add_evm(CLI::App &program, work_to_do &work);
 /// The value of --align may be left out, which cannot be told from a recording behind it: "--align gain,dc" and

@@ -10,6 +10,7 @@
 
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
+#include "commands/sigmf_result.hpp"
 #include "recording/derived_metadata.hpp"
 #include "recording/open.hpp"
 #include "recording/sample_encoder.hpp"
@@ -41,16 +42,6 @@ struct conversion {
   std::uint64_t samples = 0, clipped = 0;
 };
 
-recording::sample_format wanted_format(const convert_command &command, const recording::source &source) {
-  recording::sample_format format = source.format;
-  if (format.type == recording::component::i24) format.type = recording::component::i32;
-  if (!command.datatype.empty()) format = recording::parse_format(command.datatype);
-  if (source.format.is_complex && !format.is_complex)
-    throw failure("{}: its samples are complex, of which {} would keep a half; use a type that begins with c",
-                  source.data.string(), command.datatype);
-  return format;
-}
-
 /// Reads the samples chosen and writes them; gives how many they were.
 std::uint64_t copy(const recording::source &source, recording::sample_encoder &to, bool to_complex) {
   recording::sample_reader reader(source, source.chosen_first, source.chosen_samples);
@@ -69,10 +60,7 @@ std::uint64_t copy(const recording::source &source, recording::sample_encoder &t
 }
 
 json metadata_of(const recording::source &source, std::uint64_t samples, const std::string &datatype) {
-  return recording::derived_metadata(source, {.first = source.chosen_first,
-                                              .samples_in = samples,
-                                              .ratio = 1,
-                                              .samples = samples,
+  return recording::derived_metadata(source, {.pieces = {{source.chosen_first, samples, 0, samples}},
                                               .rate = source.rate,
                                               .frequency = {},
                                               .datatype = datatype,
@@ -108,17 +96,15 @@ conversion write_pair(const recording::source &source, const recording::sample_f
                       output_file &metadata) {
   recording::sample_encoder encoder(data, format);
   const std::uint64_t samples = copy(source, encoder, format.is_complex);
-  const std::string text = recording::metadata_text(metadata_of(source, samples, format.name()));
-  metadata.write(std::as_bytes(std::span(text)));
+  write_metadata(metadata, metadata_of(source, samples, format.name()));
   return {format.name(), samples, encoder.clipped()};
 }
 
 results run(const convert_command &command) {
   const recording::source source = recording::open(command.path, command.options);
   if (source.chosen_samples == 0) throw failure("{}: holds no samples", source.data.string());
-  const recording::sample_format format = wanted_format(command, source);
-  fs::path target = command.output;
-  if (!target.has_filename()) throw failure("{}: is a folder; give the result a name in it", target.string());
+  const recording::sample_format format = result_format(source, command.datatype, source.format);
+  const fs::path target = result_base(command.output);
 
   results given(source.files);
   const output_files files = begin_outputs(given, command.outputs);
@@ -131,7 +117,6 @@ results run(const convert_command &command) {
     made = write_archive(source, format, given.add_file(target), target.stem().string());
     given.add_line("Archive", target.string());
   } else {
-    if (target.extension() == ".sigmf-data" || target.extension() == ".sigmf-meta") target.replace_extension();
     const recording::sigmf_files names = recording::sigmf_files_of(target);
     output_file &data = given.add_file(names.data);
     made = write_pair(source, format, data, given.add_file(names.metadata));

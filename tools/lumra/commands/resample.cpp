@@ -1,19 +1,17 @@
 // lumra resample: a recording at a new rate, as SigMF. SPDX-License-Identifier: MIT
 #include <fmt/core.h>
 
-#include <cmath>
+#include <complex>
 #include <lumra/lumra.hpp>
 #include <memory>
 #include <nlohmann/json.hpp>
+#include <vector>
 
-#include "analysis/resampling.hpp"
 #include "commands/arguments.hpp"
 #include "commands/commands.hpp"
-#include "recording/derived_metadata.hpp"
+#include "commands/resampling_options.hpp"
 #include "recording/open.hpp"
-#include "recording/sigmf_writer.hpp"
 #include "terminal/failure.hpp"
-#include "terminal/results.hpp"
 #include "terminal/units.hpp"
 
 namespace tool {
@@ -24,82 +22,85 @@ namespace fs = std::filesystem;
 struct resample_command {
   std::string path, output;
   recording::options options;
+  resampling_arguments resampling{100};
   output_arguments outputs;
   double rate = 0;  // 0: not said
-  std::uint64_t block = std::uint64_t{1} << 16;
 };
 
-/// The common name of the files to write.
+/// Rates are at most this factor apart: more would take a second's samples at once for one of the other rate.
+constexpr double largest_ratio = 65536;
+
 fs::path output_base(const resample_command &command, const recording::source &source) {
-  fs::path base = command.output;
-  if (base.empty())
-    return source.files.front().parent_path() /
-           fmt::format("{}-{:.12g}Hz", source.files.front().stem().string(), command.rate);
-  if (base.extension() == ".sigmf-data" || base.extension() == ".sigmf-meta") base.replace_extension();
-  if (!base.has_filename()) throw failure("{}: is a folder; give the result a name in it", base.string());
-  return base;
+  if (!command.output.empty()) return result_base(command.output);
+  if (source.files.empty()) throw failure("the standard input: say how the result is called, with --output BASE");
+  return source.files.front().parent_path() /
+         fmt::format("{}-{:.12g}Hz", source.files.front().stem().string(), command.rate);
 }
 
-std::string length_text(std::uint64_t samples, double rate) {
-  return fmt::format("{} ({:.6g} s) at {}", samples, static_cast<double>(samples) / rate, short_text(rate));
+lumra::resampling settings_for(const resample_command &command, const recording::source &source) {
+  const double ratio = source.rate / command.rate;
+  if (!(ratio <= largest_ratio && ratio >= 1 / largest_ratio))
+    throw failure("{}: from {} to {} is beyond a factor of {:g}; resample in several steps", source.data.string(),
+                  exact_text(source.rate), exact_text(command.rate), largest_ratio);
+  lumra::resampling how{.input_rate_hz = source.rate, .output_rate_hz = command.rate};
+  how.passband = command.resampling.passband;
+  how.rejection_db = command.resampling.rejection_db;
+  return how;
 }
 
-void summarise(results &shown, const resample_command &command, const recording::source &source, const resampling &work,
-               const recording::sigmf_files &files) {
-  const resampling_filter &filter = work.filter();
-  const double lower = std::min(source.rate, work.rate());
-  shown.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.datatype));
-  shown.add_line("Input samples", length_text(work.samples_in(), source.rate));
-  shown.add_line("Output samples", length_text(work.samples(), work.rate()));
-  shown.add_line("Centre frequency", source.frequency ? exact_text(*source.frequency) : "unknown");
-  shown.add_line("Ratio", fmt::format("{:.17g} input samples per output sample", work.ratio()));
-  if (work.rate() != command.rate)
-    shown.add_line("Note", fmt::format("the ratio is rounded to single precision: the new rate, as in the metadata, is "
-                                       "{:.17g} Hz ({:+.2g} ppm)",
-                                       work.rate(), 1e6 * (work.rate() / command.rate - 1)));
-  shown.add_line("Prototype", fmt::format("Kaiser low-pass, {} coefficients, {} phases, interpolated linearly",
-                                          filter.coefficients.size(), filter.phases));
-  shown.add_line("Pass band", fmt::format("up to {} off the centre, ripple {:.2g} dB",
-                                          short_text(filter.pass_edge * lower), 20 * std::log10(1 + filter.ripple)));
-  shown.add_line("Stop band", fmt::format("from {} off the centre, rejection {:.1f} dB",
-                                          short_text(filter.stop_edge * lower), -20 * std::log10(filter.rejection)));
-  shown.add_line("Data", files.data.string());
-  shown.add_line("Metadata", files.metadata.string());
-}
+struct resampled {
+  std::uint64_t samples_in;
+  filter_figures filter;
+};
 
-nlohmann::ordered_json json_of(const recording::source &source, const resampling &work) {
-  const resampling_filter &filter = work.filter();
-  return {{"samples_in", work.samples_in()},
-          {"samples_out", work.samples()},
-          {"rate_hz", work.rate()},
-          {"passband_hz", filter.pass_edge * std::min(source.rate, work.rate())},
-          {"rejection_db", -20 * std::log10(filter.rejection)},
-          {"ripple_db", 20 * std::log10(1 + filter.ripple)}};
+/// Writes the samples of all stretches, each from its first to its last.
+template <class T>
+resampled run(const recording::source &source, const selection &chosen, const lumra::resampling &how,
+              std::uint64_t block, resampled_result &result) {
+  lumra::stream_resampler<T> resampler(how);
+  std::vector<T> out;
+  const auto take = [&](const sample_block &samples) {
+    out.resize(resampler.output_count(samples.count));
+    (void)resampler(samples_of<T>(samples), out);
+    result.file.write(std::span<const T>(out));
+  };
+  const auto end = [&](const sample_range &stretch) {
+    out.resize(resampler.flush_count());
+    (void)resampler.flush(out);
+    result.file.write(std::span<const T>(out));
+    result.end_stretch(stretch);
+  };
+  const auto done = each_stretch(source, chosen, static_cast<std::size_t>(block), "Resampling", take, end);
+  const lumra_resampler_figures is = resampler.figures();
+  return {done, {how.output_rate_hz, is.pass_edge_hz, is.stop_edge_hz, is.ripple_db, is.rejection_db}};
 }
 
 results run(const resample_command &command) {
   const recording::source source = recording::open(command.path, command.options);
-  const recording::stretch &over = recording::only_stretch(source, command.options.names);
-  const resampling work(source, over, command.rate);
-  const recording::sigmf_files files = recording::sigmf_files_of(output_base(command, source));
+  const selection chosen = select_all(source);
+  const lumra::resampling how = settings_for(command, source);
+  const recording::sample_format usual{.is_complex = source.format.is_complex},
+      format = result_format(source, command.resampling.datatype, usual);
   results given(source.files);
   const output_files reports = begin_outputs(given, command.outputs);
-  output_file &data = given.add_file(files.data);
-  recording::sigmf_writer output(data, given.add_file(files.metadata));
-  const nlohmann::json metadata = recording::derived_metadata(
-      source, {.first = over.first,
-               .samples_in = over.samples,
-               .ratio = work.ratio(),
-               .samples = work.samples(),
-               .rate = work.rate(),
-               .frequency = {},
-               .datatype = "cf32_le",
-               .description = fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate),
-                                          short_text(work.rate()), lumra::library().version_text)});
-  work.run(command.block, [&](std::span<const std::complex<float>> x) { output.write(x); });
-  output.write(metadata);
-  summarise(given, command, source, work, files);
-  if (reports.json) write_json(*reports.json, json_of(source, work));
+  resampled_result result{sigmf_result(given, source, output_base(command, source), format), {}};
+  const auto work = source.format.is_complex ? &run<std::complex<float>> : &run<float>;
+  const resampled made = work(source, chosen, how, command.resampling.block, result);
+  result.finish(source, {.pieces = {},
+                         .rate = command.rate,
+                         .frequency = {},
+                         .datatype = {},
+                         .description = fmt::format("resampled from {} to {} by lumra {}", exact_text(source.rate),
+                                                    exact_text(command.rate), lumra::library().version_text)});
+
+  given.add_line("Recording", fmt::format("{} ({})", source.data.string(), source.datatype));
+  given.add_line("Input samples", length_text(made.samples_in, source.rate));
+  given.add_line("Centre frequency", source.frequency   ? exact_text(*source.frequency)
+                                     : chosen.frequency ? "another one in each capture"
+                                                        : "unknown");
+  add_filter_lines(given, made.filter);
+  add_result_lines(given, result.file, command.rate);
+  if (reports.json) write_json(*reports.json, resampling_json(made.samples_in, result.file.samples(), made.filter));
   add_output_lines(given, command.outputs);
   return given;
 }
@@ -110,21 +111,19 @@ void add_resample(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<resample_command>();
   CLI::App *app = add_command(program, "resample", "A recording at a new rate, as SigMF");
   app->footer(
-      "Output sample k lies at input sample k * ratio, from the first on, as far as the recording reaches. The pass "
-      "band "
-      "is 0.9 of the lower of both rates, half to either side of the centre; what lies beyond half the lower rate is "
-      "rejected. Samples are written as cf32_le. Metadata are carried over where they are still true.");
+      "Output sample k lies at the time k / rate, exactly, as far as the recording reaches. What lies beyond half the "
+      "lower rate is rejected. Every capture is resampled for itself, unless it continues the one before. Captures "
+      "and annotations are carried over; annotations are cut to the new band.");
   app->add_option("RECORDING", command->path, recording_help)->required();
   app->add_option("--to", command->rate, "The new sample rate (required)")
       ->option_text("HZ")
       ->transform(positive_number());
+  add_resampling_options(*app, command->resampling);
   add_recording_options(*app, command->options);
   add_capture_option(*app, command->options, capture_help);
   app->add_option("--output", command->output,
                   "Write BASE.sigmf-data and BASE.sigmf-meta (default: the recording's name with the new rate)")
       ->option_text("BASE");
-  // Tests alone use this option: how much is read at a time must not change the result.
-  app->add_option("--block", command->block)->group("")->check(CLI::Range(1, 1 << 27));
   add_outputs(*app, command->outputs, {nullptr, nullptr, false, false});
   app->callback([command, &work] {
     if (command->rate == 0)
