@@ -15,11 +15,11 @@
 
 namespace qsrfhs::mkl_memory {
 
-constinit thread_local std::uint64_t refusals = 0;
+[[gnu::tls_model("initial-exec")]] constinit thread_local std::uint64_t refusals = 0;
 
 namespace {
 
-constinit thread_local descriptor_watch *making = nullptr;
+[[gnu::tls_model("initial-exec")]] constinit thread_local descriptor_watch *making = nullptr;
 
 void unlink(block &linked) noexcept {
   if (!linked.next) return;

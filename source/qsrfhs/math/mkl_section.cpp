@@ -30,7 +30,9 @@ struct thread_state {
   int depth = 0;
   thread_state *older = nullptr, *newer = nullptr;  // under gate_mutex
 };
-constinit thread_local thread_state own;
+// In the memory that a thread has from its start, as all thread-local data of the library: the first use could not report
+// a failure. Those of the C++ library are not ours to place: a host may have loaded and used it before.
+[[gnu::tls_model("initial-exec")]] constinit thread_local thread_state own;
 
 /// Not inlined: compilers ask for the address of thread-local data at each use, which takes longer than all the rest.
 [[gnu::noinline]] thread_state &own_state() noexcept {
