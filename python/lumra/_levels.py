@@ -6,7 +6,7 @@ from typing import Union
 import numpy as np
 
 from lumra import _lumra
-from lumra._recordings import Recording
+from lumra._recordings import Recording, _finite
 from lumra._spectra import _is_distributed
 
 
@@ -162,7 +162,7 @@ def level(x, client=None, compute=True):
     >>> found.rms, found.peak, found.peak_index
     (2.5, 4.0, 1)
     """
-    if _is_distributed(x, client, compute):
+    if _is_distributed(client, compute, x=x):
         from lumra import _distribution
 
         return _distribution.level(x, client, compute)
@@ -284,11 +284,16 @@ def evm(reference, measured, *, align=(), sample_rate=1.0, client=None, compute=
     >>> complex(round(found.gain.real, 9), round(found.gain.imag, 9)), found.rms < 1e-9
     (2j, True)
     """
+    from lumra import _comparison
+
     wanted = _alignment(align)
     if isinstance(reference, Recording):
         sample_rate = reference.sample_rate
-    if _is_distributed(reference, client, compute):
+    rate = _finite("sample_rate", sample_rate)
+    if rate <= 0:
+        raise ValueError(f"sample_rate is {rate}; give hertz above 0")
+    if _is_distributed(client, compute, reference=reference, measured=measured):
         from lumra import _distribution
 
-        return _distribution.evm(reference, measured, wanted, sample_rate, client, compute)
-    return Evm(*_lumra.evm(reference, measured, wanted, sample_rate))
+        return _distribution.evm(reference, measured, wanted, rate, client, compute)
+    return Evm(*_comparison.measure(_comparison.Streams(reference, measured), wanted, rate))

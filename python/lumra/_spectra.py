@@ -476,7 +476,7 @@ def spectrum(x, sample_rate=1.0, *, nfft=4096, window="flattop", overlap=0.5, ho
     >>> round(float(found.level.max()), 6), float(found.frequency[found.level.argmax()])
     (-20.0, 250000.0)
     """
-    if _is_distributed(x, client, compute):
+    if _is_distributed(client, compute, x=x):
         from lumra import _distribution
 
         return _distribution.spectrum(x, sample_rate, nfft, window, overlap, hold, frequency, threads, client, compute)
@@ -492,11 +492,18 @@ def spectrum(x, sample_rate=1.0, *, nfft=4096, window="flattop", overlap=0.5, ho
     return estimator.result()
 
 
-def _is_distributed(x, client, compute):
-    if hasattr(x, "__dask_graph__"):
+def _is_dask(x):
+    # Labelled arrays have the function whether or not a Dask array is in them.
+    graph = getattr(x, "__dask_graph__", None)
+    return graph is not None and graph() is not None
+
+
+def _is_distributed(client, compute, **streams):
+    if any(map(_is_dask, streams.values())):
         return True
-    if client is not None and not isinstance(x, Recording):
-        raise TypeError(f"x is {type(x).__name__}; give a Recording or a Dask array with a client")
+    for name, x in streams.items():
+        if client is not None and not isinstance(x, Recording):
+            raise TypeError(f"{name} is {type(x).__name__}; give a Recording or a Dask array with a client")
     if client is None and not compute:
         raise ValueError("compute is False; give a Dask array, or a Recording and a client")
     return client is not None
@@ -651,7 +658,7 @@ def waterfall(x, sample_rate=1.0, *, nfft=1024, window="hann", overlap=0.5, rows
     ((20, 51), 0.0005)
     """
     rows = _positive("rows", rows)
-    if _is_distributed(x, client, compute):
+    if _is_distributed(client, compute, x=x):
         from lumra import _distribution
 
         return _distribution.waterfall(x, sample_rate, nfft, window, overlap, rows, frequency, threads, client, compute)
