@@ -19,7 +19,7 @@ try:
     import dask
     import dask.array
 except ImportError as reason:
-    raise ImportError(f"Dask is not installed ({reason}); install python3-dask and python3-distributed, or "
+    raise ImportError("Dask arrays and clients need Dask: install python3-dask and python3-distributed, or "
                       "dask[distributed] with pip") from reason  # fmt: skip
 
 _MERGED_AT_ONCE = 16
@@ -134,8 +134,8 @@ def _require_client(client):
     try:
         from distributed import Client
     except ImportError as reason:
-        raise ImportError(f"Dask's scheduler is not installed ({reason}); install python3-distributed, or "
-                          "dask[distributed] with pip") from reason  # fmt: skip
+        raise ImportError(
+            "a client needs Dask's scheduler: install python3-distributed, or distributed with pip") from reason
     if not isinstance(client, Client):
         raise TypeError(f"client is {client!r} ({type(client).__name__}); give a distributed.Client")
     if client.asynchronous:

@@ -119,7 +119,7 @@ class Distribution(Test):
             (lumra.level, ValueError, "x is of shape (2, 3)", dict(x=dask.array.zeros((2, 3)))),
             (lumra.level, TypeError, "x is a Dask object", dict(x=dask.delayed(3))),
             (lumra.spectrum, ValueError, "nfft is 600001 & 600000", dict(x=lazy, nfft=600_001)),
-            (lumra.waterfall, ValueError, "window is 'none'", dict(x=lazy, window="none")),
+            (lumra.waterfall, ValueError, "window is 'no such'", dict(x=lazy, window="no such")),
             (lumra.spectrum, ValueError, "threads", dict(x=recording, client=self.client, threads=0)),
             (lumra.evm, ValueError, "measured is of 3 samples & 600000", dict(reference=lazy, measured=[1, 2, 3])),
             (lumra.evm, ValueError, "sample_rate is 0.0", dict(reference=lazy, measured=lazy, sample_rate=0)),
