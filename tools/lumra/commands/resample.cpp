@@ -27,8 +27,8 @@ struct resample_command {
   double rate = 0;  // 0: not said
 };
 
-/// Rates are at most this factor apart: more would take a second's samples at once for one of the other rate.
-constexpr double largest_ratio = 65536;
+/// Blocks of the recording give so many times their samples at once, which are held; downwards the library sets the end.
+constexpr double highest_factor = 1e4, lowest_factor = 1e-9;
 
 fs::path output_base(const resample_command &command, const recording::source &source) {
   if (!command.output.empty()) return result_base(command.output);
@@ -38,10 +38,10 @@ fs::path output_base(const resample_command &command, const recording::source &s
 }
 
 lumra::resampling settings_for(const resample_command &command, const recording::source &source) {
-  const double ratio = source.rate / command.rate;
-  if (!(ratio <= largest_ratio && ratio >= 1 / largest_ratio))
+  const double factor = command.rate / source.rate;
+  if (!(factor <= highest_factor && factor > lowest_factor))
     throw failure("{}: from {} to {} is beyond a factor of {:g}; resample in several steps", source.data.string(),
-                  exact_text(source.rate), exact_text(command.rate), largest_ratio);
+                  exact_text(source.rate), exact_text(command.rate), factor > 1 ? highest_factor : 1 / lowest_factor);
   lumra::resampling how{.input_rate_hz = source.rate, .output_rate_hz = command.rate};
   how.passband = command.resampling.passband;
   how.rejection_db = command.resampling.rejection_db;

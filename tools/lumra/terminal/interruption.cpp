@@ -7,6 +7,7 @@
 #include <atomic>
 #include <climits>
 #include <cstring>
+#include <iterator>
 
 #include "terminal/failure.hpp"
 
@@ -21,7 +22,7 @@ struct slot {
   std::atomic<bool> armed{false};  // the handler reads the name only then
   char name[PATH_MAX] = {};
 };
-slot slots[4];
+slot slots[1024];  // two for each channel of a recording that is taken apart; untouched pages take no memory
 std::atomic<bool> bar_shown{false};
 
 void end_by_signal(int number) {
@@ -65,7 +66,8 @@ unfinished_file::unfinished_file(const std::filesystem::path &file) : slot_(-1) 
   const std::string name = std::filesystem::absolute(file).string();
   if (name.size() >= sizeof slot::name) throw failure("{}: name too long; use a shorter one", file.string());
   const auto *free = std::find_if(std::begin(slots), std::end(slots), [](slot &s) { return !s.taken.exchange(true); });
-  if (free == std::end(slots)) throw failure("{}: too many output files at once", file.string());
+  if (free == std::end(slots))
+    throw failure("{}: is one of more than {} output files; write fewer at once", file.string(), std::size(slots));
   slot_ = static_cast<int>(free - slots);
   slot &mine = slots[slot_];
   std::copy_n(name.c_str(), name.size() + 1, mine.name);
