@@ -20,7 +20,8 @@ void add_resampling_options(CLI::App &app, resampling_arguments &arguments) {
                  fmt::format("Reject aliases and images by so much (default {:g})", arguments.rejection_db))
       ->option_text("DB")
       ->transform(number_where("a number from 40 to 120", [](double x) { return x >= 40 && x <= 120; }));
-  app.add_option("--datatype", arguments.datatype, "Sample type to write (default: cf32_le, or rf32_le where the result is real)")
+  app.add_option("--datatype", arguments.datatype,
+                 "Sample type to write (default: cf32_le, or rf32_le where the result is real)")
       ->option_text("NAME");
   // Tests alone use this option: how much is read at a time must not change the result.
   app.add_option("--block", arguments.block)->group("")->check(CLI::Range(1, 1 << 27));
