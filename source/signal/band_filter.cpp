@@ -2,6 +2,7 @@
 #include "signal/band_filter.hpp"
 
 #include <cmath>
+#include <cstddef>
 #include <numbers>
 
 namespace dsp {
@@ -36,8 +37,10 @@ void band_filter::make_gains(double first, double step, std::span<double> gains)
   std::fill(gains.begin(), gains.end(), 0.0);
   for (const double side : {1.0, -1.0}) {
     double at = first + side * edge_, sum = 0;
-    const double steps = std::ceil(std::abs(at) / step);
-    for (double k = 0; k < steps; ++k) sum += integral(at * k / steps, at * (k + 1) / steps);
+    const auto steps = static_cast<std::size_t>(std::ceil(std::abs(at) / step));
+    const double part = at / static_cast<double>(std::max<std::size_t>(steps, 1));
+    for (std::size_t k = 0; k < steps; ++k)
+      sum += integral(part * static_cast<double>(k), part * static_cast<double>(k + 1));
     for (double &gain : gains) {
       gain += side * sum;
       sum += integral(at, at + step);

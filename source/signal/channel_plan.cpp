@@ -57,7 +57,8 @@ class planner {
 
   /// Cost of a sample of the stream, infinite where no such blocks will do.
   double choose(std::size_t points, std::size_t parts, std::vector<channel_step> &steps) const {
-    const double hop = static_cast<double>(points - points / parts);
+    const std::size_t taken = points - points / parts;
+    const auto hop = static_cast<double>(taken);
     double cost = transform_cost(static_cast<double>(points)) / hop;
     steps.clear();
     for (const channel_request &channel : channels_) {
@@ -81,7 +82,8 @@ class planner {
     const double ratio = channel.ratio.value(), band = ratio * length, overlap = length / static_cast<double>(parts);
     if (width_ / ((1 - channel.passband) * ratio / 2) <= overlap) {
       const wide_unsigned samples = channel.ratio.up() * points;
-      if (samples % channel.ratio.down() == 0 && samples / channel.ratio.down() % (2 * parts) == 0)
+      const wide_unsigned granule = 2 * wide_unsigned{parts};
+      if (samples % channel.ratio.down() == 0 && samples / channel.ratio.down() % granule == 0)
         return {channel_way::exact, static_cast<std::size_t>(samples / channel.ratio.down())};
       return {channel_way::interpolated, fast_multiple(2 * band, 2 * parts)};
     }
