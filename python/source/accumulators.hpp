@@ -43,11 +43,10 @@ class accumulator {
     const element type = settle(from.type());
     const turn mine(turnstile_);
     with_type(type, [&]<class T>(std::type_identity<T>) {
-      if constexpr (std::is_same_v<T, std::complex<double>> || std::is_same_v<T, std::complex<float>>) {
-        add_read<T>(from.reader(first, count));
-      } else if (from.type() == element::f32) {
-        add_read<T>(from.reader(first, count));
-      }
+      // Complex samples never come to a stream of real ones.
+      if constexpr (std::is_floating_point_v<T>)
+        if (is_complex(from.type())) return;
+      add_read<T>(from.reader(first, count));
     });
   }
 

@@ -43,7 +43,7 @@ constexpr element real_of(element type) noexcept {
   return of(false, is_single(type));
 }
 constexpr py::ssize_t bytes_of(element type) noexcept {
-  return (is_single(type) ? 4 : 8) * (is_complex(type) ? 2 : 1);
+  return py::ssize_t{is_single(type) ? 4 : 8} * (is_complex(type) ? 2 : 1);
 }
 py::dtype dtype_of(element type);
 /// NumPy's name of it.

@@ -111,6 +111,7 @@ double number(py::handle object, const char *name) {
 }
 
 void translate_failures() {
+  // pybind11 wants this signature. NOLINTNEXTLINE(performance-unnecessary-value-param)
   py::register_exception_translator([](std::exception_ptr thrown) {
     try {
       if (thrown) std::rethrow_exception(thrown);
