@@ -109,4 +109,46 @@ TEST(PolyphaseKernels, TapsAtOffsets) {
   }
 }
 
+/// Outputs of both builds for real samples (width 1) and complex ones.
+template <class Real>
+void expect_cubic_sums(void (*kernel_table::*kernel)(const sample_place<Real> *, std::size_t, const cubic_taps<Real> &,
+                                                     std::size_t, const Real *, Real *),
+                       double tolerance) {
+  constexpr std::size_t group = 32 / sizeof(Real), rows = 3;
+  for (const std::size_t length : {group, 2 * group, 6 * group})
+    for (const std::size_t width : {1U, 2U}) {
+      const guarded c(tests::noise_of<Real>(rows * 4 * length, 1), edge::back);
+      const guarded x(tests::noise_of<Real>(length + 4 * width, 2), edge::back);
+      std::vector<sample_place<Real>> places;
+      for (std::uint32_t k = 0; k < 5; ++k) places.push_back({k, k % 3, static_cast<Real>(0.2 * k - 0.4)});
+      std::vector<Real> results[2];
+      for (const bool is_active : {false, true}) {
+        auto &out = results[is_active];
+        out.resize(width * places.size());
+        const cubic_taps<Real> taps{c.as<Real>(), length};
+        const kernel_table &table = is_active ? active() : baseline_kernels;
+        (table.*kernel)(places.data(), places.size(), taps, width, x.as<Real>(), out.data());
+      }
+      EXPECT_EQ(results[0], results[1]);
+      for (std::size_t k = 0; k < places.size(); ++k) {
+        double sums[2] = {};
+        for (std::size_t j = 0; j < length; ++j) {
+          double tap = 0;
+          for (std::size_t power = 0; power < 4; ++power)
+            tap = tap * static_cast<double>(places[k].offset) +
+                  static_cast<double>(
+                      c.as<Real>()[(places[k].row * length + j / group * group) * 4 + power * group + j % group]);
+          sums[j % width] += tap * static_cast<double>(x.as<Real>()[width * places[k].first + j]);
+        }
+        for (std::size_t part = 0; part < width; ++part)
+          EXPECT_NEAR(sums[part], static_cast<double>(results[0][width * k + part]), tolerance) << length;
+      }
+    }
+}
+
+TEST(PolyphaseKernels, TapsThatArePolynomials) {
+  expect_cubic_sums(&kernel_table::interpolate, 2e-5);
+  expect_cubic_sums(&kernel_table::interpolate_double, 1e-13);
+}
+
 }  // namespace
