@@ -20,6 +20,7 @@ def main(path, picture):
                             vmin=np.percentile(waterfall.level, 5), rasterized=True)
     axes.set(xlabel="Frequency in MHz", ylabel="Time in ms", title=str(path))
     axes.invert_yaxis()
+    axes.ticklabel_format(axis="x", useOffset=False)
     figure.colorbar(drawn, label=f"dB of full scale in {waterfall.enbw * waterfall.sample_rate / waterfall.nfft:.0f} Hz")
 
     for each in recording.annotations:

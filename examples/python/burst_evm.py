@@ -38,7 +38,7 @@ def main(reference, path, samples_per_symbol, picture):
     axes.plot(measured.real, measured.imag, ".", markersize=3, label="measured")
     axes.plot(wanted.real, wanted.imag, "+", color="orange", label="reference")
     axes.set(xlabel="I", ylabel="Q", aspect="equal", title=f"EVM {found.rms_percent:.2f} %")
-    axes.legend(loc="upper right")
+    axes.legend(loc="center")
     figure.savefig(picture)
 
 
