@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <atomic>
 #include <exception>
-#include <future>
+#include <latch>
 #include <vector>
 
 #include "platform/fork.hpp"
@@ -72,16 +72,20 @@ std::size_t thread_count(std::size_t wanted) noexcept {
 
 void run_parts(std::size_t parts, const std::function<void(std::size_t)> &part) {
   handed_out all(parts, part);
-  std::vector<std::future<void>> helpers;
-  helpers.reserve(parts);
+  std::ptrdiff_t queued = 0;
+  const auto most = std::max<std::ptrdiff_t>(static_cast<std::ptrdiff_t>(parts) - 1, 0);
+  std::latch running(most);
   try {
-    for (std::size_t k = 1; k < parts; ++k)
-      helpers.push_back(workers::instance().pool().push([&all](std::int32_t) { all.run(); }));
+    for (; queued < most; ++queued)
+      workers::instance().pool().post([&](std::int32_t) {
+        all.run();
+        running.count_down();
+      });
   } catch (const std::exception &) {
-    // Those that there are share the work.
+    running.count_down(most - queued);  // those that there are share the work
   }
   all.run();
-  for (const std::future<void> &helper : helpers) helper.wait();
+  running.wait();
   all.throw_first();
 }
 

@@ -15,11 +15,11 @@
 
 namespace qsrfhs::mkl_memory {
 
-[[gnu::tls_model("initial-exec")]] constinit thread_local std::uint64_t refusals = 0;
+constinit thread_local std::uint64_t refusals = 0;
 
 namespace {
 
-[[gnu::tls_model("initial-exec")]] constinit thread_local descriptor_watch *making = nullptr;
+constinit thread_local descriptor_watch *making = nullptr;
 
 void unlink(block &linked) noexcept {
   if (!linked.next) return;

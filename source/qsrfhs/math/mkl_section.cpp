@@ -30,9 +30,7 @@ struct thread_state {
   int depth = 0;
   thread_state *older = nullptr, *newer = nullptr;  // under gate_mutex
 };
-// In the memory that a thread has from its start, as all thread-local data of the library: the first use could not report
-// a failure. Those of the C++ library are not ours to place: a host may have loaded and used it before.
-[[gnu::tls_model("initial-exec")]] constinit thread_local thread_state own;
+constinit thread_local thread_state own;
 
 /// Not inlined: compilers ask for the address of thread-local data at each use, which takes longer than all the rest.
 [[gnu::noinline]] thread_state &own_state() noexcept {
@@ -140,7 +138,7 @@ platform::thread_end &end_of_thread() noexcept {
 
 /// What MKL does once for the process, at the first call of a kind: it looks at the processor and the environment and
 /// chooses its error handler.
-void set_up_process() noexcept {
+bool set_up_process() noexcept {
   constexpr MKL_INT none = 0, one = 1;
   const float in = 1;
   float out = 1, unused = 0;
@@ -148,6 +146,7 @@ void set_up_process() noexcept {
   cblas_saxpy(one, 1.0F, &in, one, &out, one);
   vmsSub(one, &in, &in, &out, VML_HA);
   sgeqrf(&none, &none, &out, &one, &unused, &out, &one, &info);
+  return true;
 }
 
 void set_up(thread_state &self) noexcept {
@@ -158,10 +157,9 @@ void set_up(thread_state &self) noexcept {
   }
   add(self);
   self.at = thread_state::stage::known;
-  static std::once_flag process_is_set_up;
   const mkl_section section;
   const mkl_memory::watch not_of_the_caller;  // what is refused here, the computation asks for again
-  std::call_once(process_is_set_up, &set_up_process);
+  [[maybe_unused]] static const bool process_is_set_up = set_up_process();
   mkl_free(mkl_malloc(1, 64));  // opens the thread's account
 }
 

@@ -70,7 +70,7 @@ void thread_pool::start_missing(state &shared) {
   }
 }
 
-void thread_pool::enqueue(job added) {
+void thread_pool::post(job added) {
   {
     const std::lock_guard lock(shared_->mutex);
     if (!shared_->done) start_missing(*shared_);

@@ -19,6 +19,11 @@ class thread_pool {
   thread_pool &operator=(const thread_pool &) = delete;
   ~thread_pool();
 
+  using job = std::function<void(std::int32_t)>;
+
+  /// Queues work that throws nothing. Throws the system's error where no worker can be started, std::bad_alloc.
+  void post(job added);
+
   /// Queues task(worker index); its result or exception arrives in the future. Throws the system's error where no
   /// worker can be started.
   template <class Task>
@@ -26,7 +31,7 @@ class thread_pool {
     using result = std::invoke_result_t<Task &, std::int32_t>;
     auto packaged = std::make_shared<std::packaged_task<result(std::int32_t)>>(std::forward<Task>(task));
     auto future = packaged->get_future();
-    enqueue([packaged](std::int32_t worker) { (*packaged)(worker); });
+    post([packaged](std::int32_t worker) { (*packaged)(worker); });
     return future;
   }
 
@@ -50,10 +55,8 @@ class thread_pool {
  private:
   struct state;
   struct member;
-  using job = std::function<void(std::int32_t)>;
 
   void finish() noexcept;
-  void enqueue(job added);
   static void start_missing(state &shared);
   static void *serve(void *own);
 
