@@ -15,7 +15,7 @@ version = re.search(r"project\(LumraAlgo VERSION ([\d.]+)", (root / "CMakeLists.
 
 class BuildWithCMake(build_ext):
     def build_extension(self, extension):
-        """The module, and the library beside it."""
+        """The module, which holds the library."""
         package = pathlib.Path(self.get_ext_fullpath(extension.name)).resolve().parent
         build = pathlib.Path(self.build_temp).resolve() / "cmake"
         only_python = [f"-DLUMRA_{part}=OFF" for part in ("TOOLS", "TESTS", "EXAMPLES")]
@@ -23,8 +23,7 @@ class BuildWithCMake(build_ext):
                         f"-DPython_EXECUTABLE={sys.executable}", "-DLUMRA_PYTHON_DIR=.", *only_python], check=True)  # fmt: skip
         jobs = str(self.parallel or len(os.sched_getaffinity(0)))
         subprocess.run(["cmake", "--build", build, "--target", "lumra_python", "-j", jobs], check=True)
-        for component in ("python", "python_library"):
-            subprocess.run(["cmake", "--install", build, "--component", component, "--prefix", package.parent], check=True)
+        subprocess.run(["cmake", "--install", build, "--component", "python", "--prefix", package.parent], check=True)
 
 
 setup(
