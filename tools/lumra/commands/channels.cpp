@@ -1,5 +1,5 @@
 // lumra channels: channels of a wideband recording as recordings of their own. SPDX-License-Identifier: MIT
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <algorithm>
 #include <cmath>
@@ -169,7 +169,7 @@ results run(const channels_command &command) {
 
 void add_channels(CLI::App &program, work_to_do &work) {
   auto command = std::make_shared<channels_command>();
-  CLI::App *app = program.add_subcommand("channels", "Channels of a wideband recording as recordings of their own");
+  CLI::App *app = add_command(program, "channels", "Channels of a wideband recording as recordings of their own");
   app->footer(
       "Sample k of a channel lies at the time k / rate, exactly, as far as the recording reaches; its frequency is "
       "that "

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "commands/resampling_options.hpp"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include <nlohmann/json.hpp>
 #include <utility>
