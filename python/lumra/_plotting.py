@@ -38,8 +38,9 @@ def _frequency_scale(frequency, df, center):
 
 
 def _frame(ax, title, settings, xlabel, ylabel):
-    ax.set_title(f"{title}\n", fontweight="bold")
-    ax.text(0.5, 1.015, settings, transform=ax.transAxes, ha="center", va="bottom", color="#505050", fontsize="small")
+    ax.set_title(title, fontweight="bold", pad=22)
+    ax.annotate(settings, (0.5, 1), (0, 6), xycoords="axes fraction", textcoords="offset points", ha="center", va="bottom",
+                color="#505050", fontsize="small")  # fmt: skip
     ax.set_xlabel(xlabel)
     ax.set_ylabel(ylabel)
     for spine in ax.spines.values():
