@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "recording/sigmf_writer.hpp"
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include <iterator>
 #include <nlohmann/json.hpp>

@@ -83,7 +83,7 @@ TEST(ReaderConcurrency, EndsWheneverNobodyWantsMore) {
 }
 
 TEST(ReaderConcurrency, FailureComesBehindWhatWasReadBefore) {
-  for (const std::uint64_t fails_at : {0, 1, 3500, 9999}) {
+  for (const std::uint64_t fails_at : {0U, 1U, 3500U, 9999U}) {
     const recording::source source = counting_source(10'000, fails_at);
     tool::sample_blocks blocks(source, chosen({{0, 10'000, {}, 0}}), 1000);
     for (std::uint64_t k = 0; k < fails_at / 1000; ++k) {
