@@ -7,6 +7,7 @@ from typing import NamedTuple, Optional, Tuple
 import numpy as np
 
 from lumra import _lumra
+from lumra._mapped import pieces
 from lumra._recordings import Recording, _positive
 
 
@@ -418,7 +419,8 @@ class _Stream:
         if isinstance(self._of, Recording):
             average.add_recording(self._of._file, first, count)
         else:
-            average.add(self._of[first : first + count])
+            for part in pieces(self._of, first, count):
+                average.add(part)
 
 
 def _segments_of(stretches, nfft, overlap):

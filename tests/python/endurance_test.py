@@ -2,6 +2,8 @@
 """Long work that is interrupted, objects that threads share, children of a process that has used the package."""
 import os
 import signal
+import subprocess
+import sys
 import tempfile
 import threading
 import time
@@ -105,6 +107,23 @@ class Sharing(Test):
         for workers in (2, -1):
             self.assertEqual(lumra.fft(x.reshape(64, -1), workers=workers).tobytes(), lumra.fft(x.reshape(64, -1)).tobytes())
         self.assertEqual(lumra.spectrum(x, threads=2).power.tobytes(), lumra.spectrum(x, threads=1).power.tobytes())
+
+
+class Memory(Test):
+    def test_of_maps_stays_small(self):
+        with tempfile.NamedTemporaryFile() as file:
+            file.write(noise(2**20, np.complex64).tobytes())
+            file.truncate(2**28 + 8)
+            mapped, peak = np.memmap(file.name, np.complex64, "r+"), "open('/proc/self/status').read().split('VmHWM:')[1]"
+            script = (f"import lumra, numpy; x = numpy.memmap({file.name!r}, numpy.complex64, 'r')[1:]; "
+                      f"before = {peak}; found = lumra.spectrum(x); lumra.waterfall(x[::3]); "
+                      f"print(before.split()[0], {peak}.split()[0], found.power.sum())")  # fmt: skip
+            before, after, power = subprocess.check_output([sys.executable, "-c", script], text=True).split()
+            self.assertLess(int(after), int(before) + 100_000)  # KiB
+            self.assertEqual(power, str(lumra.spectrum(np.array(mapped[1:])).power.sum()))
+            mapped[-1] = 3
+            lumra.spectrum(mapped)
+            self.assertEqual(3, np.memmap(file.name, np.complex64, "r")[-1], "what was written is in the file")
 
 
 if __name__ == "__main__":
