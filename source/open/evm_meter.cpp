@@ -5,8 +5,8 @@
 
 #include <cmath>
 #include <cstdint>
-#include <cstring>
 #include <memory>
+#include <tuple>
 #include <utility>
 #include <variant>
 
@@ -82,9 +82,12 @@ void require_compared(any_meter &object) {
 }
 
 /// All but the start.
-bool same_kind(lumra_evm_meter_options a, const lumra_evm_meter_options &b) noexcept {
-  a.start = b.start;
-  return std::memcmp(&a, &b, sizeof a) == 0;
+bool same_kind(const lumra_evm_meter_options &a, const lumra_evm_meter_options &b) noexcept {
+  const auto kind = [](const lumra_evm_meter_options &of) {
+    return std::tie(of.size, of.type, of.align, of.reserved, of.sample_rate_hz, of.gain_re, of.gain_im,
+                    of.delay_samples, of.frequency_hz, of.dc_re, of.dc_im);
+  };
+  return kind(a) == kind(b);
 }
 
 void write(state_writer &to, any_meter &object) {
