@@ -17,6 +17,7 @@
 #include "open/door.hpp"
 #include "open/element.hpp"
 #include "open/handle.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "open/state.hpp"
 #include "signal/band_filter.hpp"
@@ -29,9 +30,7 @@ using cf32 = std::complex<float>;
 using cf64 = std::complex<double>;
 
 constexpr std::uint64_t most_channels = 4096, longest_stream = std::uint64_t{1} << 60;
-constexpr std::uint32_t most_threads = 1024;
 constexpr double usual_passband = 0.9;
-constexpr double least_rejection = 40, most_rejection = 150, most_single_rejection = 120;
 
 /// A channelizer with what it needs for each call, so that none takes memory.
 template <class Sample>
@@ -57,14 +56,9 @@ constexpr state_kind saved_channelizer{{'c', 'h', 'n'}, 1};
 
 void check(const lumra_channelizer_options &options) {
   require_type(options.type);
-  require(options.sample_rate_hz > 0 && std::isfinite(options.sample_rate_hz), LUMRA_OUT_OF_RANGE,
-          "options->sample_rate_hz is ", options.sample_rate_hz, "; it is a number of hertz above 0");
-  const double most = is_single(options.type) ? most_single_rejection : most_rejection;
-  require(options.rejection_db >= least_rejection && options.rejection_db <= most, LUMRA_OUT_OF_RANGE,
-          "options->rejection_db is ", options.rejection_db, "; it is ", least_rejection, " to ", most,
-          is_single(options.type) ? " in single precision" : "");
-  require(options.threads <= most_threads, LUMRA_OUT_OF_RANGE, "options->threads is ", options.threads, "; it is 0 to ",
-          most_threads);
+  require_rate(options.sample_rate_hz, "options->sample_rate_hz");
+  require_rejection(options.rejection_db, options.type);
+  require_threads(options.threads, "options->threads");
   require(options.reserved == 0, LUMRA_OUT_OF_RANGE, "options->reserved is ", options.reserved, "; it is 0");
 }
 
@@ -80,8 +74,7 @@ lumra_channelizer_channel checked(lumra_channelizer_channel channel, double samp
           "channels[", index, "].rate_hz is ", rate, "; it is above 10^-9 of the sample rate and at most ",
           sample_rate);
   if (channel.passband == 0) channel.passband = usual_passband;
-  require(channel.passband > 0 && channel.passband <= dsp::most_passband, LUMRA_OUT_OF_RANGE, "channels[", index,
-          "].passband is ", channel.passband, "; it is above 0 to ", dsp::most_passband, " of half the rate");
+  require_passband(channel.passband, "channels[", index, "].passband");
   const double half = sample_rate / 2, centre = channel.centre_hz;
   require(centre >= -half && centre <= half, LUMRA_OUT_OF_RANGE, "channels[", index, "].centre_hz is ", centre,
           "; it is from ", -half, " to ", half);

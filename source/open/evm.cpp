@@ -5,6 +5,7 @@
 
 #include "open/door.hpp"
 #include "open/evm_checks.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "signal/error_vectors.hpp"
 
@@ -16,7 +17,7 @@ constexpr std::uint64_t least_for_search = 64;
 lumra_evm_options checked_options(const lumra_evm_options *given) {
   const auto options = read_options(given, lumra_evm_options LUMRA_EVM_OPTIONS);
   (void)checked_alignment(options.align);
-  require_rate(options.sample_rate_hz);
+  require_rate(options.sample_rate_hz, "options->sample_rate_hz");
   return options;
 }
 

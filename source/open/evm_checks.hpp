@@ -22,11 +22,6 @@ inline dsp::alignment checked_alignment(std::uint32_t align) {
           (align & LUMRA_ALIGN_DC) != 0};
 }
 
-inline void require_rate(double sample_rate_hz) {
-  require(std::isfinite(sample_rate_hz) && sample_rate_hz > 0, LUMRA_OUT_OF_RANGE, "options->sample_rate_hz is ",
-          sample_rate_hz, "; it is above 0 and finite");
-}
-
 /// The traces of n samples, null or apart from each other, the streams, and the result.
 template <class Sample, class Complex, class Real>
 void require_traces_apart(std::span<const Sample> reference, std::span<const Sample> measured,

@@ -13,6 +13,7 @@
 #include "open/door.hpp"
 #include "open/evm_checks.hpp"
 #include "open/handle.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "open/state.hpp"
 #include "signal/error_vectors.hpp"
@@ -39,7 +40,7 @@ lumra_evm_meter_options checked(const lumra_evm_meter_options *given) {
   require(options.reserved == 0, LUMRA_OUT_OF_RANGE, "options->reserved is ", options.reserved, "; it is 0");
   require(options.start <= most_samples, LUMRA_OUT_OF_RANGE, "options->start is ", options.start,
           "; a position is at most 2^62");
-  require_rate(options.sample_rate_hz);
+  require_rate(options.sample_rate_hz, "options->sample_rate_hz");
   const double gain = std::abs(std::complex<double>(options.gain_re, options.gain_im));
   require(std::isfinite(gain) && gain > 0, LUMRA_OUT_OF_RANGE, "options->gain_re and gain_im make ", gain,
           "; the gain's length is above 0 and finite");

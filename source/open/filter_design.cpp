@@ -8,6 +8,7 @@
 #include <cstdint>
 
 #include "open/door.hpp"
+#include "open/option_checks.hpp"
 #include "qsrfhs/util/aligned_buffer.hpp"
 
 namespace doors {
@@ -19,11 +20,6 @@ std::uint64_t checked_length(double length) {
   return static_cast<std::uint64_t>(length);
 }
 
-void check_rate(double sample_rate) {
-  require(sample_rate > 0 && std::isfinite(sample_rate), LUMRA_OUT_OF_RANGE, "sample_rate is ", sample_rate,
-          "; it is a number of hertz above 0");
-}
-
 /// The number of taps is known before they are made.
 struct kaiser_lowpass {
   dsp::lowpass_request request;
@@ -31,7 +27,7 @@ struct kaiser_lowpass {
   std::uint64_t count;
 
   kaiser_lowpass(double sample_rate, double pass_edge, double stop_edge, double rejection) {
-    check_rate(sample_rate);
+    require_rate(sample_rate, "sample_rate");
     request = {pass_edge / sample_rate, stop_edge / sample_rate, std::pow(10, -rejection / 20)};
     require(request.pass >= 0 && request.pass < 0.5, LUMRA_OUT_OF_RANGE, "pass_edge is ", pass_edge,
             "; it is 0 Hz or more, and below half the sample rate");
@@ -53,7 +49,7 @@ struct root_raised_cosine {
 
   root_raised_cosine(double sample_rate, double symbol_rate, double given_roll_off, double span)
       : samples(sample_rate / symbol_rate), roll_off(given_roll_off) {
-    check_rate(sample_rate);
+    require_rate(sample_rate, "sample_rate");
     require(symbol_rate > 0 && symbol_rate <= sample_rate && std::isfinite(samples), LUMRA_OUT_OF_RANGE,
             "symbol_rate is ", symbol_rate, "; it is above 0 Hz and at most the sample rate");
     require(roll_off >= 0 && roll_off <= 1, LUMRA_OUT_OF_RANGE, "roll_off is ", roll_off, "; it is 0 to 1");

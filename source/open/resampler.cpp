@@ -17,6 +17,7 @@
 #include "open/door.hpp"
 #include "open/element.hpp"
 #include "open/handle.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "open/state.hpp"
 #include "signal/workers.hpp"
@@ -52,13 +53,7 @@ struct resampler_object {
 using resamplers = handles<lumra_resampler, resampler_object>;
 
 constexpr state_kind saved_resampler{{'r', 'a', 't'}, 1};
-constexpr std::uint32_t most_channels = 1024, most_threads = 1024;
-constexpr double widest_passband = 0.99;
-constexpr double least_rejection = 40, most_rejection = 150, most_single_rejection = 120;
-
-void require_rate(double rate, std::string_view name) {
-  require(rate > 0 && std::isfinite(rate), LUMRA_OUT_OF_RANGE, name, " is ", rate, "; it is a number of hertz above 0");
-}
+constexpr std::uint32_t most_channels = 1024;
 
 dsp::rate_ratio checked_ratio(const lumra_resampler_options &options) {
   constexpr std::string_view near = "; rates are less than a factor of 10^9 apart";
@@ -81,16 +76,11 @@ dsp::rate_ratio checked_ratio(const lumra_resampler_options &options) {
 std::unique_ptr<resampler_object> make(const lumra_resampler_options &options) {
   require_type(options.type);
   const dsp::rate_ratio ratio = checked_ratio(options);
-  require(options.passband > 0 && options.passband <= widest_passband, LUMRA_OUT_OF_RANGE, "options->passband is ",
-          options.passband, "; it is above 0 to ", widest_passband, " of half the lower rate");
-  const double most = is_single(options.type) ? most_single_rejection : most_rejection;
-  require(options.rejection_db >= least_rejection && options.rejection_db <= most, LUMRA_OUT_OF_RANGE,
-          "options->rejection_db is ", options.rejection_db, "; it is ", least_rejection, " to ", most,
-          is_single(options.type) ? " in single precision" : "");
+  require_passband(options.passband, "options->passband");
+  require_rejection(options.rejection_db, options.type);
   require(options.channels >= 1 && options.channels <= most_channels, LUMRA_OUT_OF_RANGE, "options->channels is ",
           options.channels, "; it is 1 to ", most_channels);
-  require(options.threads <= most_threads, LUMRA_OUT_OF_RANGE, "options->threads is ", options.threads, "; it is 0 to ",
-          most_threads);
+  require_threads(options.threads, "options->threads");
   return with_type(options.type, [&](auto type) { return std::make_unique<resampler_object>(type, ratio, options); });
 }
 

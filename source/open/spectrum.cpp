@@ -12,6 +12,7 @@
 #include "open/door.hpp"
 #include "open/element.hpp"
 #include "open/handle.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "open/state.hpp"
 #include "signal/spectrum_average.hpp"
@@ -33,16 +34,10 @@ using spectra = handles<lumra_spectrum_average, spectrum_object>;
 
 constexpr state_kind saved_spectrum{{'a', 'v', 'g'}, 2};
 constexpr std::uint64_t fewest_points = 16;
-constexpr std::uint32_t most_threads = 1024;
-
-void require_threads(std::uint32_t threads, std::string_view name) {
-  require(threads <= most_threads, LUMRA_OUT_OF_RANGE, name, " is ", threads, "; it is 0 to ", most_threads);
-}
 
 dsp::spectrum_settings checked_settings(const lumra_spectrum_options &options) {
   require_type(options.type);
-  require(options.sample_rate_hz > 0 && std::isfinite(options.sample_rate_hz), LUMRA_OUT_OF_RANGE,
-          "options->sample_rate_hz is ", options.sample_rate_hz, "; it is above 0");
+  require_rate(options.sample_rate_hz, "options->sample_rate_hz");
   require(std::isfinite(options.centre_hz), LUMRA_OUT_OF_RANGE, "options->centre_hz is ", options.centre_hz,
           "; it is a number");
   require(options.points >= fewest_points && options.points <= dsp::most_fft_points, LUMRA_OUT_OF_RANGE,

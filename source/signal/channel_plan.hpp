@@ -14,13 +14,11 @@ namespace dsp {
 struct channel_request {
   exact_cycles centre;  // per sample of the stream
   rate_ratio ratio;     // at most 1
-  double passband;      // fraction of half the channel's rate, above 0 and at most most_passband
+  double passband;      // fraction of half the channel's rate, above 0, below 1
 
   /// Nothing to be shifted, nothing to be filtered.
   [[nodiscard]] bool is_whole() const noexcept { return ratio.is_one() && centre.units == 0; }
 };
-
-inline constexpr double most_passband = 0.99;
 
 /// What becomes of a channel's bins.
 enum class channel_way {

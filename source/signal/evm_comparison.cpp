@@ -17,10 +17,6 @@ using wide = std::complex<double>;
 
 constexpr std::size_t run = error_sums::longest_run;
 
-double power(wide v) noexcept {
-  return v.real() * v.real() + v.imag() * v.imag();
-}
-
 /// Angles of a run of products, those of 0 being 0.
 void find_angles(std::span<const wide> products, double *angles) noexcept {
   std::array<double, run> re, im;
@@ -45,13 +41,13 @@ void error_sums::add(std::span<const wide> carried, const std::complex<Real> *me
   for (std::size_t k = 0; k < count; ++k) {
     const wide z = times(wide(measured[k]) - model.dc, inverse_gain), u = carried[k];
     errors[k] = (z - u) * scale;
-    magnitudes[k] = (std::sqrt(power(z)) - std::sqrt(power(u))) * scale;
+    magnitudes[k] = (std::sqrt(std::norm(z)) - std::sqrt(std::norm(u))) * scale;
     products[k] = times(z, std::conj(u));
   }
   find_angles({products.data(), count}, angles.data());
   double sums[3] = {};
   for (std::size_t k = 0; k < count; ++k) {
-    const double p = power(errors[k]);
+    const double p = std::norm(errors[k]);
     peak.take(p, position + k);
     sums[0] += p;
     sums[1] += magnitudes[k] * magnitudes[k];

@@ -13,10 +13,6 @@ namespace {
 
 using wide = std::complex<double>;
 
-double power(wide v) noexcept {
-  return v.real() * v.real() + v.imag() * v.imag();
-}
-
 // The unknowns: parts of the gain and of dc, delay, and frequency.
 enum : std::size_t { gain_re, gain_im, dc_re, dc_im, delay, frequency, unknown_count };
 using unknowns = std::array<double, unknown_count>;
@@ -89,9 +85,9 @@ void stream_moments::add(std::span<const wide> carried, std::span<const wide> sl
   stream_moments here;
   for (std::size_t k = 0; k < carried.size(); ++k) {
     const wide u = carried[k], m = wide(measured_samples[k]), mu = times(m, std::conj(u));
-    const double at = t + static_cast<double>(k), p = power(u);
+    const double at = t + static_cast<double>(k), p = std::norm(u);
     here.reference += p;
-    here.measured += power(m);
+    here.measured += std::norm(m);
     here.product += mu;
     here.reference_dc += u;
     here.measured_dc += m;
@@ -102,7 +98,7 @@ void stream_moments::add(std::span<const wide> carried, std::span<const wide> sl
   }
   for (std::size_t k = 0; k < slopes.size(); ++k) {
     const wide u = carried[k], m = wide(measured_samples[k]), v = slopes[k], vu = times(v, std::conj(u));
-    here.slope += power(v);
+    here.slope += std::norm(v);
     here.slope_reference += vu;
     here.slope_measured += times(m, std::conj(v));
     here.slope_dc += v;
@@ -133,12 +129,12 @@ alignment_outcome improve(const stream_moments &sums, double samples, const alig
   const double centre = sums.timed / sums.reference;
   const stream_moments s = sums.later(-centre);
   const double share = wanted.dc ? 1 / samples : 0;
-  const double reference = s.reference - share * power(s.reference_dc);
+  const double reference = s.reference - share * std::norm(s.reference_dc);
   const wide product = s.product - share * times(s.measured_dc, std::conj(s.reference_dc));
   if (!(reference > no_variation * s.reference)) return alignment_outcome::undetermined;
   const wide gain = product / reference, dc = share * (s.measured_dc - times(gain, s.reference_dc));
-  change.fitted = power(gain) * reference;
-  change.measured = s.measured - share * power(s.measured_dc);
+  change.fitted = std::norm(gain) * reference;
+  change.measured = s.measured - share * std::norm(s.measured_dc);
 
   unknowns x{};
   const std::array<bool, unknown_count> is_free{true, true, wanted.dc, wanted.dc, wanted.delay, wanted.frequency};
