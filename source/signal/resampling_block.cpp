@@ -108,8 +108,8 @@ std::optional<block_design> design_block(std::size_t up, std::size_t down, const
   return shortest;
 }
 
-/// By a transform of the filter's taps: an integral for each bin, which band_filter takes for centres between bins, would
-/// make objects two to seven times as slow to make.
+/// By a transform of the filter's taps: an integral for each bin, as band_filter has it for centres between bins, would
+/// take two to seven times as long.
 template <class Sample>
 qsrfhs::aligned_buffer<std::complex<real_of<Sample>>> make_response(const block_design &design) {
   constexpr double points_a_stop_edge = 8;  // so that the sampled filter folds nothing that counts
