@@ -616,15 +616,22 @@ def _row_parts(stretches, nfft, overlap, rows):
     return per_row, parted
 
 
-def _row_power(stream, parts, options):
-    estimator = SpectrumEstimator(
-        stream.sample_rate, start=parts[0][0], origin=parts[0][2], real=stream.real, frequency=stream.frequency,
-        **options)
-    for number, (first, count, _) in enumerate(parts):
-        if number:
-            estimator.gap()
-        stream.add_to(estimator._average, first, count)
-    return estimator.result()
+def _row_spectra(stream, parted, options):
+    """The rows' spectra from one estimator, which goes on where rows follow each other."""
+    estimator, at = None, 0
+    for parts in parted:
+        for first, count, origin in parts:
+            if estimator is None or first > at:
+                at = first
+                estimator = SpectrumEstimator(
+                    stream.sample_rate, start=first, origin=origin, real=stream.real, frequency=stream.frequency,
+                    **options)
+            elif first == origin:
+                estimator.gap()
+            stream.add_to(estimator._average, at, first + count - at)
+            at = first + count
+        yield estimator.result()
+        estimator._average.clear()
 
 
 def _join_rows(results, parted, sample_rate, per_row):
@@ -670,4 +677,4 @@ def waterfall(x, sample_rate=1.0, *, nfft=1024, window="hann", overlap=0.5, rows
     SpectrumEstimator(stream.sample_rate, frequency=stream.frequency, **options)
     _require_segment(stream.stretches, nfft)
     per_row, parted = _row_parts(stream.stretches, nfft, overlap, rows)
-    return _join_rows([_row_power(stream, parts, options) for parts in parted], parted, stream.sample_rate, per_row)
+    return _join_rows(list(_row_spectra(stream, parted, options)), parted, stream.sample_rate, per_row)
