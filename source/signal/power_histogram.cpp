@@ -3,7 +3,6 @@
 
 #include <bit>
 #include <cmath>
-#include <new>
 
 namespace dsp {
 namespace {
@@ -23,14 +22,9 @@ double part_above(double power) noexcept {
 
 }  // namespace
 
-power_histogram::power_histogram()
-    : counts_(static_cast<std::uint64_t *>(std::calloc(octaves * bins_in_octave, sizeof(std::uint64_t)))) {
-  if (!counts_) throw std::bad_alloc();
-}
-
 void power_histogram::add(std::span<const double> power, double smallest, double largest) noexcept {
   const std::size_t first = bin_of(smallest), last = bin_of(largest);
-  std::uint64_t *const counts = counts_.get();
+  std::uint64_t *const counts = bins_of(0);
   if (first == last) {  // constant envelopes, and silence
     counts[first] += power.size();
     used_[first / bins_in_octave] = true;

@@ -4,9 +4,9 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
-#include <cstdlib>
-#include <memory>
 #include <span>
+
+#include "platform/pages.hpp"
 
 namespace dsp {
 
@@ -17,7 +17,7 @@ class power_histogram {
   static constexpr std::size_t octaves = 2048, bins_in_octave = 512;
 
   /// Throws std::bad_alloc.
-  power_histogram();
+  power_histogram() : counts_(octaves * bins_in_octave * sizeof(std::uint64_t)) {}
 
   /// Powers that are not negative, all between smallest and largest; or NaN, which counts in a bin of its own.
   void add(std::span<const double> power, double smallest, double largest) noexcept;
@@ -39,15 +39,11 @@ class power_histogram {
   }
 
  private:
-  struct release {
-    void operator()(std::uint64_t *counts) const noexcept { std::free(counts); }
-  };
-
   [[nodiscard]] std::uint64_t *bins_of(std::size_t octave) const noexcept {
-    return counts_.get() + octave * bins_in_octave;
+    return static_cast<std::uint64_t *>(counts_.data()) + octave * bins_in_octave;
   }
 
-  std::unique_ptr<std::uint64_t[], release> counts_;
+  platform::zero_pages counts_;
   std::array<bool, octaves> used_{};
 };
 
