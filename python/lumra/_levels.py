@@ -6,6 +6,7 @@ from typing import Union
 import numpy as np
 
 from lumra import _lumra
+from lumra._accumulator import Accumulator, one_dimension
 from lumra._recordings import Recording, _finite
 from lumra._spectra import _is_distributed
 
@@ -39,7 +40,7 @@ class Level:
     peak_dbfs: float
 
 
-class LevelMeter:
+class LevelMeter(Accumulator):
     """The levels of a stream, as an accumulator.
 
     Streams may be cut into calls and into meters that are merged: the result has the same bits. Meters can be pickled
@@ -58,54 +59,10 @@ class LevelMeter:
     2
     """
 
-    __slots__ = ("_meter",)
+    __slots__ = ()
 
     def __init__(self, start=0):
-        self._meter = _lumra.Meter(start)
-
-    @property
-    def start(self):
-        """int : Position of the first sample."""
-        return self._meter.where()[0]
-
-    @property
-    def samples(self):
-        """int : How many were added."""
-        return self._meter.where()[1]
-
-    def add(self, x):
-        """Adds the stream's next samples. The first block that is not empty fixes their type.
-
-        Parameters
-        ----------
-        x : array_like
-            Samples of one dimension.
-
-        Returns
-        -------
-        LevelMeter
-            This one.
-        """
-        self._meter.add(x)
-        return self
-
-    def merge(self, other):
-        """Joins the neighbour whose start is where this one ends.
-
-        Parameters
-        ----------
-        other : LevelMeter
-            It is not changed.
-
-        Returns
-        -------
-        LevelMeter
-            This one.
-        """
-        if not isinstance(other, LevelMeter):
-            raise TypeError(f"other is {other!r} ({type(other).__name__}); give a LevelMeter")
-        self._meter.merge(other._meter)
-        return self
+        self._of = _lumra.Meter(start)
 
     def result(self):
         """The levels of the samples so far.
@@ -114,26 +71,24 @@ class LevelMeter:
         -------
         Level
         """
-        return Level(*self._meter.read())
+        return Level(*self._of.read())
 
     def __getstate__(self):
-        return (self._meter.save(),)
+        return (self._of.save(),)
 
     def __setstate__(self, state):
         self.__init__()
-        self._meter.load(*state)
+        self._of.load(*state)
 
     def __repr__(self):
-        start, samples = self._meter.where()
+        start, samples = self._of.where()
         return f"<lumra.LevelMeter: {samples} samples from {start} on>"
 
 
 def _metered(x):
+    of = one_dimension(x)
     meter = LevelMeter()
-    if isinstance(x, Recording):
-        meter._meter.add_recording(x._file, 0, None)
-    else:
-        meter.add(x)
+    meter._add_from(of, 0, len(of))
     if not meter.samples:
         raise ValueError("x is empty; give one sample or more")
     return meter
@@ -192,7 +147,7 @@ def ccdf(x, above_db):
     array([0.25, 0.25, 0.25, 0.  ])
     """
     if isinstance(x, Recording):
-        return _metered(x)._meter.ccdf(above_db)
+        return _metered(x)._of.ccdf(above_db)
     return _lumra.ccdf(x, above_db)
 
 

@@ -7,7 +7,7 @@ from typing import NamedTuple, Optional, Tuple
 import numpy as np
 
 from lumra import _lumra
-from lumra._mapped import pieces
+from lumra._accumulator import Accumulator, one_dimension
 from lumra._recordings import Recording, _positive
 
 
@@ -260,7 +260,7 @@ class Spectrum:
                 f"RBW {self.rbw:g} Hz, {self.window} window, mean of {self.segments} segment(s)>")  # fmt: skip
 
 
-class SpectrumEstimator:
+class SpectrumEstimator(Accumulator):
     """The averaged power spectrum of a stream, as an accumulator.
 
     Streams may be cut into calls and into estimators that are merged: the result has the same bits, with any number of
@@ -300,45 +300,19 @@ class SpectrumEstimator:
     True
     """
 
-    __slots__ = ("_average", "_options")
+    __slots__ = ("_options",)
 
     def __init__(self, sample_rate=1.0, *, nfft=4096, window="flattop", overlap=0.5, hold=False, frequency=0.0,
                  start=0, origin=0, real=False, threads=None):  # fmt: skip
         hold, real = bool(hold), bool(real)
-        self._average = _lumra.Average(
+        self._of = _lumra.Average(
             sample_rate, nfft, window, overlap, hold, frequency, start, origin, real, threads)
         self._options = (sample_rate, nfft, window, overlap, hold, frequency, real, threads)
 
     @property
-    def start(self):
-        """int : Position of the first sample."""
-        return self._average.where()[0]
-
-    @property
-    def samples(self):
-        """int : How many were added."""
-        return self._average.where()[1]
-
-    @property
     def segments(self):
         """int : How many are complete."""
-        return self._average.where()[2]
-
-    def add(self, x):
-        """Adds the stream's next samples. The first block that is not empty fixes the precision.
-
-        Parameters
-        ----------
-        x : array_like
-            Samples of one dimension.
-
-        Returns
-        -------
-        SpectrumEstimator
-            This one.
-        """
-        self._average.add(x)
-        return self
+        return self._of.where()[2]
 
     def gap(self):
         """Ends the present run of samples: the next one begins new segments.
@@ -348,25 +322,7 @@ class SpectrumEstimator:
         SpectrumEstimator
             This one.
         """
-        self._average.gap()
-        return self
-
-    def merge(self, other):
-        """Joins the neighbour whose start is where this one ends; segments across the border are completed.
-
-        Parameters
-        ----------
-        other : SpectrumEstimator
-            Of the same options; it is not changed.
-
-        Returns
-        -------
-        SpectrumEstimator
-            This one.
-        """
-        if not isinstance(other, SpectrumEstimator):
-            raise TypeError(f"other is {other!r} ({type(other).__name__}); give a SpectrumEstimator")
-        self._average.merge(other._average)
+        self._of.gap()
         return self
 
     def result(self):
@@ -377,24 +333,24 @@ class SpectrumEstimator:
         Spectrum
         """
         rate, nfft, window, overlap, _, frequency, _, _ = self._options
-        power, highest, lowest, sides, segments, enbw = self._average.read()
+        power, highest, lowest, sides, segments, enbw = self._of.read()
         return Spectrum(
             power, highest, lowest, float(rate), int(nfft), window, float(overlap), segments, enbw, float(frequency),
             sides)
 
     def __getstate__(self):
-        return self._options, self._average.save()
+        return self._options, self._of.save()
 
     def __setstate__(self, state):
         options, saved = state
         rate, nfft, window, overlap, hold, frequency, real, threads = options
         self.__init__(rate, nfft=nfft, window=window, overlap=overlap, hold=hold, frequency=frequency, real=real,
                       threads=threads)  # fmt: skip
-        self._average.load(saved)
+        self._of.load(saved)
 
     def __repr__(self):
         rate, nfft, window, *_ = self._options
-        start, samples, segments = self._average.where()
+        start, samples, segments = self._of.where()
         return (f"<lumra.SpectrumEstimator at {rate:g} Hz, {nfft} points, {window} window: {samples} samples from "
                 f"{start} on, {segments} segment(s)>")  # fmt: skip
 
@@ -403,24 +359,13 @@ class _Stream:
     """What an analysis runs over: an array or a recording, in stretches without a gap."""
 
     def __init__(self, x, sample_rate, frequency):
+        self.of = one_dimension(x)
+        self.real = self.of.dtype.kind != "c"
         if isinstance(x, Recording):
-            self.sample_rate = x.sample_rate
-            self.frequency = 0.0 if x.frequency is None else x.frequency
-            self.stretches, self.samples, self.dtype, self._of = x._stretches(), x.samples, x.dtype, x
+            self.sample_rate, self.frequency = x.sample_rate, 0.0 if x.frequency is None else x.frequency
+            self.stretches = x._stretches()
         else:
-            self._of = np.asarray(x)
-            if self._of.ndim != 1:
-                raise ValueError(f"x is of shape {self._of.shape}; give an array of one dimension")
-            self.sample_rate, self.frequency, self.samples = sample_rate, frequency, len(self._of)
-            self.stretches, self.dtype = [(0, self.samples)], self._of.dtype
-        self.real = self.dtype.kind != "c"
-
-    def add_to(self, average, first, count):
-        if isinstance(self._of, Recording):
-            average.add_recording(self._of._file, first, count)
-        else:
-            for part in pieces(self._of, first, count):
-                average.add(part)
+            self.sample_rate, self.frequency, self.stretches = sample_rate, frequency, [(0, len(self.of))]
 
 
 def _segments_of(stretches, nfft, overlap):
@@ -490,7 +435,7 @@ def spectrum(x, sample_rate=1.0, *, nfft=4096, window="flattop", overlap=0.5, ho
     for number, (first, count) in enumerate(stream.stretches):
         if number:
             estimator.gap()
-        stream.add_to(estimator._average, first, count)
+        estimator._add_from(stream.of, first, count)
     return estimator.result()
 
 
@@ -628,10 +573,10 @@ def _row_spectra(stream, parted, options):
                     **options)
             elif first == origin:
                 estimator.gap()
-            stream.add_to(estimator._average, at, first + count - at)
+            estimator._add_from(stream.of, at, first + count - at)
             at = first + count
         yield estimator.result()
-        estimator._average.clear()
+        estimator._of.clear()
 
 
 def _join_rows(results, parted, sample_rate, per_row):

@@ -116,7 +116,7 @@ class Memory(Test):
             file.truncate(2**28 + 8)
             mapped, peak = np.memmap(file.name, np.complex64, "r+"), "open('/proc/self/status').read().split('VmHWM:')[1]"
             script = (f"import lumra, numpy; x = numpy.memmap({file.name!r}, numpy.complex64, 'r')[1:]; "
-                      f"before = {peak}; found = lumra.spectrum(x); lumra.waterfall(x[::3]); "
+                      f"before = {peak}; found = lumra.spectrum(x); lumra.waterfall(x[::3]); lumra.level(x); "
                       f"print(before.split()[0], {peak}.split()[0], found.power.sum())")  # fmt: skip
             before, after, power = subprocess.check_output([sys.executable, "-c", script], text=True).split()
             self.assertLess(int(after), int(before) + 100_000)  # KiB
