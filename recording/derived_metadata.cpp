@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <nlohmann/json.hpp>
 
 #include "recording/metadata_fields.hpp"
@@ -32,17 +33,14 @@ class index_map {
   [[nodiscard]] std::uint64_t samples() const noexcept { return pieces_.back().at + pieces_.back().samples; }
   /// The first piece that holds samples of a range; null where none does.
   [[nodiscard]] const derived_piece *piece_of(const range &sought) const {
-    for (const derived_piece &piece : pieces_)
-      if (sought.first < piece.first + piece.samples_in && sought.end > piece.first) return &piece;
-    return nullptr;
+    const auto piece = ends_behind(sought.first);
+    return piece != pieces_.end() && sought.end > piece->first ? &*piece : nullptr;
   }
   /// Indices between pieces are those of the next piece's first sample.
   [[nodiscard]] std::uint64_t operator()(std::uint64_t index) const {
-    for (const derived_piece &piece : pieces_) {
-      if (index < piece.first) return piece.at;
-      if (index - piece.first < piece.samples_in) return piece.at + offset(piece, index - piece.first);
-    }
-    return samples();
+    const auto piece = ends_behind(index);
+    if (piece == pieces_.end()) return samples();
+    return index < piece->first ? piece->at : piece->at + offset(*piece, index - piece->first);
   }
   /// Of a first sample: it is there even where nothing is behind it.
   [[nodiscard]] std::uint64_t first(std::uint64_t index) const {
@@ -50,6 +48,12 @@ class index_map {
   }
 
  private:
+  /// The first piece with samples behind an index, or at it.
+  [[nodiscard]] std::vector<derived_piece>::const_iterator ends_behind(std::uint64_t index) const {
+    return std::partition_point(pieces_.begin(), pieces_.end(), [index](const derived_piece &piece) {
+      return piece.first + piece.samples_in <= index;
+    });
+  }
   [[nodiscard]] std::uint64_t offset(const derived_piece &piece, std::uint64_t inputs) const {
     if (factor_ == 1) return std::min(inputs, piece.samples);  // exact beyond 2^53, too
     const double outputs = std::round(static_cast<double>(inputs) * factor_), most = static_cast<double>(piece.samples);
@@ -99,10 +103,9 @@ json captures_of(const source &from, const derivation &made, const index_map &ma
 
 /// The source's centre at a sample, where it is known.
 double frequency_at(const source &from, std::uint64_t index) {
-  double frequency = 0;
-  for (const capture &each : from.captures)
-    if (each.start <= index) frequency = each.frequency.value_or(0);
-  return frequency;
+  const auto behind = std::partition_point(from.captures.begin(), from.captures.end(),
+                                           [index](const capture &each) { return each.start <= index; });
+  return behind == from.captures.begin() ? 0 : std::prev(behind)->frequency.value_or(0);
 }
 
 /// Cuts an annotation's frequencies to a band; false where none are left.
