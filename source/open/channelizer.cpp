@@ -52,7 +52,7 @@ struct channelizer_object {
 };
 using channelizers = handles<lumra_channelizer, channelizer_object>;
 
-constexpr state_kind saved_channelizer{{'c', 'h', 'n'}, 1};
+constexpr state_kind saved_channelizer{{'c', 'h', 'n'}, 2};
 
 void check(const lumra_channelizer_options &options) {
   require_type(options.type);

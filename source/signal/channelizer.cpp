@@ -97,7 +97,10 @@ class channelizer<Sample>::channel {
         turns_.data()[k] = output(on_circle(-turn * static_cast<double>(lead_ + k) / points_out));
     }
     const rate_ratio rest = request.ratio.times(plan.points, points_);
-    if (way_ == channel_way::interpolated) interpolator_.emplace(rest, rejection);
+    if (way_ == channel_way::interpolated) {
+      interpolator_.emplace(rest, rejection);
+      past_ = qsrfhs::aligned_buffer<output>(interpolator_->past().size());
+    }
     if (is_coarse) {
       const channel_request narrow{off / static_cast<std::int64_t>(points_), rest, request.passband};
       narrow_ = std::make_unique<channelizer<output>>(std::span(&narrow, 1), rejection, 1);
@@ -122,9 +125,10 @@ class channelizer<Sample>::channel {
     return narrow_ ? 1 + narrow_->filters(0) : interpolator_ ? 2 : 1;
   }
 
-  void run(const output *bins, std::uint64_t block, team &with, std::span<output> &room) {
+  void run(const output *bins, std::int64_t block, team &with, std::span<output> &room) {
+    if (block < 0 && way_ == channel_way::exact) return;
     output *const work = with.work.data();
-    const auto begin = first_ + static_cast<std::int64_t>(block) * hop_;
+    const auto begin = first_ + block * hop_;
     const std::complex<double> phase = on_circle(-(shift_ * begin).value());
     const real_of<Sample> *gains = gains_.data();
     for (const bin_run &run : runs_) {
@@ -143,7 +147,9 @@ class channelizer<Sample>::channel {
     }
     const std::span<output> samples(work + lead_, kept_);
     if (turns_.size() != 0) multiply_bins(samples.data(), turns_.data(), kept_);
-    if (narrow_) {
+    if (block < 0) {
+      lead_in(samples);
+    } else if (narrow_) {
       narrow_->process(samples, &room);
     } else {
       const wide_unsigned given = interpolator_->next_outputs(kept_);
@@ -153,6 +159,21 @@ class channelizer<Sample>::channel {
     }
   }
 
+  /// Fills the room with what silence gives; there is reset only behind that.
+  void end_in_silence(std::span<output> &room) {
+    if (narrow_) return narrow_->flush(&room);
+    if (!interpolator_) {
+      std::fill(room.begin(), room.end(), output{});
+      return;
+    }
+    static constexpr std::array<output, 64> silence{};
+    while (!room.empty()) {
+      const wide_unsigned given = interpolator_->next_outputs(silence.size());
+      const auto count = static_cast<std::size_t>(std::min<wide_unsigned>(given, room.size()));
+      interpolator_->process(silence, room.first(count));
+      room = room.subspan(count);
+    }
+  }
   void reset() noexcept {
     if (interpolator_) interpolator_->reset();
     if (narrow_) narrow_->reset();
@@ -171,6 +192,13 @@ class channelizer<Sample>::channel {
   }
 
  private:
+  /// Of block -1.
+  void lead_in(std::span<const output> samples) {
+    if (narrow_) return narrow_->lead_in(samples);
+    const auto last = samples.last(std::min(samples.size(), past_.size()));
+    std::copy(last.begin(), last.end(), past_.elements().last(last.size()).begin());
+    interpolator_->set_past(0, past_.elements());
+  }
   void make_gains(const band_edges &edges, double rejection, double turn, std::int64_t centre, std::size_t points) {
     const auto length = static_cast<double>(points);
     const auto first = static_cast<std::int64_t>(std::ceil(turn - edges.stop * length));
@@ -196,6 +224,7 @@ class channelizer<Sample>::channel {
   std::size_t empty_first_ = 0, empty_count_ = 0;
   qsrfhs::aligned_buffer<output> turns_;
   std::optional<interpolator<output>> interpolator_;
+  qsrfhs::aligned_buffer<output> past_;  // for the interpolator, in front of the stream
   std::unique_ptr<channelizer<output>> narrow_;
 };
 
@@ -207,7 +236,9 @@ channelizer<Sample>::channelizer(std::span<const channel_request> channels, doub
   std::vector<std::size_t> through_blocks;
   for (std::size_t k = 0; k < channels.size(); ++k) {
     channels_.emplace_back(channels[k], plan_.steps[k], plan_, rejection);
-    if (channels_.back().way() != channel_way::whole) through_blocks.push_back(k);
+    const channel_way way = channels_.back().way();
+    if (way != channel_way::whole) through_blocks.push_back(k);
+    if (way == channel_way::interpolated || way == channel_way::coarse) first_block_ = -1;
   }
   if (through_blocks.empty()) return;
 
@@ -246,12 +277,30 @@ channelizer<Sample>::channelizer(std::span<const channel_request> channels, doub
 template <class Sample>
 channelizer<Sample>::~channelizer() = default;
 
-/// In front of the stream is what the first block drops.
+/// Nothing is held where no channel goes through blocks, otherwise the first block's silence.
 template <class Sample>
 void channelizer<Sample>::begin() noexcept {
-  held_count_ = plan_.overlap / 2;
+  next_block_ = first_block_;
+  held_count_ = held_of(0);
   std::fill_n(held_.data(), held_.size(), Sample{});
-  inputs_ = block_count_ = 0;
+  inputs_ = 0;
+}
+
+/// Of the stream's first n samples and the silence in front of them, what lies in the next block.
+template <class Sample>
+std::size_t channelizer<Sample>::held_of(std::uint64_t n) const noexcept {
+  return teams_.empty() ? 0 : static_cast<std::size_t>(static_cast<std::int64_t>(n) - begin_of_next());
+}
+
+template <class Sample>
+std::int64_t channelizer<Sample>::begin_of_next() const noexcept {
+  return next_block_ * static_cast<std::int64_t>(plan_.hop()) - static_cast<std::int64_t>(plan_.overlap / 2);
+}
+
+template <class Sample>
+void channelizer<Sample>::lead_in(std::span<const Sample> x) noexcept {
+  x = x.last(std::min(x.size(), held_count_));
+  std::copy(x.begin(), x.end(), held_.elements().first(held_count_).last(x.size()).begin());
 }
 
 template <class Sample>
@@ -303,14 +352,13 @@ void channelizer<Sample>::process(std::span<const Sample> in, std::span<output> 
 template <class Sample>
 void channelizer<Sample>::flush(std::span<output> *rooms) {
   const qsrfhs::mkl_runtime::use in_use;
-  const auto has_room = [&] {
-    return std::any_of(rooms, rooms + channels_.size(), [](const auto &room) { return !room.empty(); });
-  };
-  while (has_room()) {
+  // Blocks that begin behind the stream's last sample are silent, however long a narrow channel's filter is.
+  while (!teams_.empty() && begin_of_next() < static_cast<std::int64_t>(inputs_)) {
     const std::span<Sample> silence = held_.elements().subspan(held_count_);
     std::fill(silence.begin(), silence.end(), Sample{});
     run_block(silence, rooms);
   }
+  for (std::size_t k = 0; k < channels_.size(); ++k) channels_[k].end_in_silence(rooms[k]);
   reset();
 }
 
@@ -338,7 +386,7 @@ void channelizer<Sample>::run_block(std::span<const Sample> rest, std::span<outp
               std::copy_n(held + held_count_ - from_held, from_held, held));
   held_count_ = plan_.overlap;
 
-  const std::uint64_t block = block_count_++;
+  const std::int64_t block = next_block_++;
   const auto run_team = [&](std::size_t index) {
     const qsrfhs::mkl_runtime::use in_use;
     team &with = teams_[index];
@@ -366,10 +414,10 @@ template <class Sample>
 void channelizer<Sample>::load(std::uint64_t inputs, const std::function<void(std::span<std::byte>)> &take) {
   begin();
   inputs_ = inputs;
-  block_count_ = blocks(inputs);
-  if (!teams_.empty()) held_count_ += static_cast<std::size_t>(inputs - block_count_ * plan_.hop());
+  if (inputs >= plan_.overlap / 2) next_block_ = static_cast<std::int64_t>(blocks(inputs));
+  held_count_ = held_of(inputs);
   take(std::as_writable_bytes(held_.elements().first(held_count_)));
-  for (channel &each : channels_) each.load(block_count_, take);
+  for (channel &each : channels_) each.load(blocks(inputs), take);
 }
 
 template class channelizer<float>;

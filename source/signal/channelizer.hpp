@@ -58,12 +58,17 @@ class channelizer {
   /// Fills that again, by calls of take.
   void load(std::uint64_t inputs, const std::function<void(std::span<std::byte>)> &take);
 
+  /// What lies in front of the stream's first sample instead of silence, its end at the end of x; before process.
+  void lead_in(std::span<const Sample> x) noexcept;
+
  private:
   class channel;
   struct team;
 
   [[nodiscard]] std::uint64_t blocks(std::uint64_t n) const noexcept;
   void begin() noexcept;
+  [[nodiscard]] std::int64_t begin_of_next() const noexcept;
+  [[nodiscard]] std::size_t held_of(std::uint64_t n) const noexcept;
   void transform(std::span<const Sample> rest);
   void run_block(std::span<const Sample> rest, std::span<output> *rooms);
 
@@ -76,7 +81,10 @@ class channelizer {
   qsrfhs::aligned_buffer<Sample> held_, block_;
   qsrfhs::aligned_buffer<output> bins_;
   std::size_t held_count_ = 0;
-  std::uint64_t inputs_ = 0, block_count_ = 0;
+  std::uint64_t inputs_ = 0;
+  // Block 0 gives the first outputs. A filter answers before a sample, too: what filters behind a channel's first need
+  // of that, in front of the stream, is in block -1.
+  std::int64_t first_block_ = 0, next_block_ = 0;
 };
 
 }  // namespace dsp

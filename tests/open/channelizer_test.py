@@ -136,6 +136,27 @@ class Channelizer(lumra.Test):
             told = figures.centre_hz, figures.rate_hz, figures.stop_edge_hz, figures.rejection_db
             self.assertEqual((centre, own, own / 2, rejection), told)
 
+    def test_silence_around_a_stream_changes_nothing(self):
+        # Through one filter, two, three and four; those behind the first see what it gives in front of the stream.
+        x, silence = lumra.noise(5000, np.complex128), np.zeros(10**6)
+        for own in (1e6, 1.2e6, 1e5, 3e4, 1e3, 10.0):
+            bare, padded = (all_of(channelizer(10e6, [(1e6, own)], "cf64", rejection_db=120), "cf64", 1, [piece])[0]
+                            for piece in (x, np.concatenate((silence, x, silence))))  # fmt: skip
+            padded = padded[round(own / 10) :][: len(bare)]
+            self.assertLess(np.abs(bare - padded).max(), 1e-6 * np.abs(padded).max(), own)
+
+    def test_the_widest_and_the_narrowest(self):
+        # A stream far shorter than a filter gives one sample: its sum times the filter's peak, which is the area of the
+        # response. Silence behind the stream is not computed, so that this ends.
+        for kind in lumra.types:
+            samples = all_of(channelizer(1e8, [(0, 1.0)], kind), kind, 1, [np.ones(1000, lumra.types[kind])])[0]
+            np.testing.assert_allclose(samples, [1000 * 0.95e-8], rtol=0.01, err_msg=kind)
+        # Where all channels have the whole band nothing is held, before a stream and behind one.
+        made, x = channelizer(10e6, [(0, 10e6)]), lumra.noise(1000, np.complex64)
+        for _ in range(2):
+            made = lumra.load("channelizer", lumra.save(made))
+            np.testing.assert_array_equal(x, all_of(made, "cf32", 1, [x[:300], x[300:]])[0])
+
     def test_a_stream_of_10_to_the_12_samples(self):
         # A tone at a channel's centre stays 1, however long the stream was. Its samples repeat, so that a state with
         # another position is that of a longer stream.
