@@ -6,6 +6,7 @@
 
 #include <complex>
 #include <cstdint>
+#include <span>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
@@ -79,6 +80,14 @@ inline void multiply(std::complex<float> *a, const std::complex<float> *b, std::
 }
 inline void multiply(std::complex<double> *a, const std::complex<double> *b, std::int64_t n) noexcept {
   for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);
+}
+
+/// out[k] = sum over j, in this order, of taps[j] x[k - j width]; out and x share no memory.
+inline void convolve(const float *x, std::span<const float> taps, std::size_t width, std::span<float> out) noexcept {
+  qsrfhs::kernels::active().fir(x, taps.data(), taps.size(), width, out.data(), out.size());
+}
+inline void convolve(const double *x, std::span<const double> taps, std::size_t width, std::span<double> out) noexcept {
+  qsrfhs::kernels::active().fir_double(x, taps.data(), taps.size(), width, out.data(), out.size());
 }
 
 /// out[k] = |x[k]|^2 * factor: the sum in the element's type, the product in double. `mirror`, unless null, receives

@@ -24,16 +24,16 @@ namespace {
 /// result must not be written while a later one needs its sample. `before` holds earlier samples, newest first.
 template <int parts, class Real>
 void convolve_in_place(Real *x, std::int64_t n, std::span<const Real> b, const Real *before) noexcept {
-  constexpr std::int64_t width = 64 / sizeof(Real);
-  using results = lanes<Real, width>;  // a plain loop over them ends up vectorised over j
+  constexpr std::int64_t group = 32 / sizeof(Real), most = 64 * group;  // whole groups read no sample behind them
   const auto nb = static_cast<std::int64_t>(b.size());
   const std::int64_t first = std::min((nb - 1) * parts, n * parts);  // values from here on need no earlier samples
   std::int64_t i = n * parts;
-  for (; i - width >= first; i -= width) {
-    Real *const y = x + i - width;
-    results sum = results::load(y) * b[0];
-    for (std::int64_t j = 1; j < nb; ++j) sum += results::load(y - j * parts) * b[static_cast<std::size_t>(j)];
-    sum.store(y);
+  while (i - first >= group) {
+    std::array<Real, most> sums;
+    const std::int64_t count = std::min(i - first, most) / group * group;
+    i -= count;
+    convolve(x + i, b, parts, std::span(sums).first(static_cast<std::size_t>(count)));
+    std::copy_n(sums.begin(), count, x + i);
   }
   while (--i >= 0) {
     Real sum = b[0] * x[i];
