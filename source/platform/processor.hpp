@@ -5,8 +5,13 @@
 
 namespace platform {
 
-/// True when the processor has AVX and the operating system saves its registers.
+// True when the processor has the instructions and the operating system saves their registers. Each needs those above.
+
 bool has_avx() noexcept;
+/// AVX2 and fused multiply-add.
+bool has_avx2() noexcept;
+/// AVX-512 with its instructions for bytes, words, double and quad words and for shorter registers.
+bool has_avx512() noexcept;
 
 /// Processors online, at least 1.
 std::int32_t processor_count() noexcept;

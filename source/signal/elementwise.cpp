@@ -15,7 +15,7 @@
 namespace dsp {
 namespace {
 
-using qsrfhs::kernels::active;
+using qsrfhs::kernels::exact;
 using cf32 = std::complex<float>;
 
 /// The parts of complex numbers, and real numbers themselves.
@@ -41,7 +41,7 @@ void divide_one(const Real *a, Real br, Real bi, Real r, Real *out) noexcept {
 template <class T>
 void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    active().divide(parts(x), parts(y), parts(out), out.size());
+    exact().divide(parts(x), parts(y), parts(out), out.size());
   } else if constexpr (is_complex<T>) {
     const auto *const a = parts(x), *const b = parts(y);
     auto *const q = parts(out);
@@ -57,7 +57,7 @@ void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexce
 template <class T>
 void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    active().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), out.size());
+    exact().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), out.size());
   } else if constexpr (is_complex<T>) {
     const real_of<T> br = value.real(), bi = value.imag(), r = 1 / (br * br + bi * bi);
     for (std::size_t i = 0; i < 2 * out.size(); i += 2) divide_one(parts(x) + i, br, bi, r, parts(out) + i);
@@ -77,7 +77,7 @@ void scale(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept {
 template <class T>
 void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    active().magnitude(parts(x), out.data(), out.size());
+    exact().magnitude(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
     const auto *const in = parts(x);
     for (std::size_t i = 0; i < out.size(); ++i)
@@ -90,7 +90,7 @@ void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept {
 template <class T>
 void power(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    active().magnitude_squared(parts(x), out.data(), out.size());
+    exact().magnitude_squared(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
     const auto *const in = parts(x);
     for (std::size_t i = 0; i < out.size(); ++i) out[i] = in[2 * i] * in[2 * i] + in[2 * i + 1] * in[2 * i + 1];
@@ -185,9 +185,9 @@ void polynomial_of_block(const T *x, std::span<const C> c, C *out, std::size_t n
 template <class T, class C>
 void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept {
   if constexpr (std::is_same_v<C, float>) {
-    active().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
+    exact().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else if constexpr (std::is_same_v<T, float>) {
-    active().complex_polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
+    exact().complex_polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else {
     for (std::size_t i = 0; i < out.size(); i += polynomial_block)
       polynomial_of_block(x.data() + i, c, out.data() + i, std::min(polynomial_block, out.size() - i));
@@ -228,7 +228,7 @@ void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, 
       entries.data()[2 * k + 1] = k + 1 < gains.size() ? gains[k + 1] - gains[k] : 0;
     }
     if constexpr (std::is_same_v<Real, float>)
-      active().lookup({parts(entries.elements()), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
+      exact().lookup({parts(entries.elements()), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
                       parts(x), parts(out), out.size());
     return;
   }

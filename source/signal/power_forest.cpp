@@ -9,7 +9,7 @@ namespace dsp {
 namespace {
 
 void add(const float *x, float *sum, std::size_t n) noexcept {
-  qsrfhs::kernels::active().add(x, sum, n);
+  qsrfhs::kernels::exact().add(x, sum, n);
 }
 
 void add(const double *x, double *sum, std::size_t n) noexcept {

@@ -125,7 +125,7 @@ void recurse_carefully(const recursion_coefficients &c, const block_recursion &p
   std::array<double, block> rest{};
   std::copy(y + good, y + block, rest.begin());
   std::fill(y + good, y + block, 0.0);
-  qsrfhs::kernels::active().recursion(plan, 1, &y, 1);
+  qsrfhs::kernels::exact().recursion(plan, 1, &y, 1);
   std::copy_n(rest.begin(), block - good, y + good);
   recurse_in_order(c, y + good, block - good);
 }
@@ -207,7 +207,7 @@ void recursive_filter::add_preset(const stage_view &stage, const planes &data, s
 
 /// n samples, which lie in one block or begin with one, from `in` to `out`; both have room for histories in front.
 void recursive_filter::run_stage(const stage_view &stage, const planes &in, const planes &out, std::size_t n) noexcept {
-  const auto &kernels = qsrfhs::kernels::active();
+  const auto &kernels = qsrfhs::kernels::exact();
   const recursion_coefficients &c = stage.coefficients;
   const std::size_t width = stage.width, order = c.order();
   for (std::size_t s = 0; s < streams_; ++s) {

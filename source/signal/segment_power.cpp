@@ -18,9 +18,9 @@ float *floats(cf32 *x) noexcept {
 template <class Sample, class Real>
 void apply_window(const Sample *x, const Real *w, Sample *out, std::size_t n) noexcept {
   if constexpr (std::is_same_v<Sample, cf32>) {
-    qsrfhs::kernels::active().apply_window(floats(x), w, floats(out), n);
+    qsrfhs::kernels::exact().apply_window(floats(x), w, floats(out), n);
   } else if constexpr (std::is_same_v<Sample, float>) {
-    qsrfhs::kernels::active().weigh(x, w, out, n / 2);  // pairs
+    qsrfhs::kernels::exact().weigh(x, w, out, n / 2);  // pairs
     if (n % 2 != 0) out[n - 1] = x[n - 1] * w[n - 1];
   } else {
     for (std::size_t k = 0; k < n; ++k) out[k] = x[k] * w[k];
@@ -30,7 +30,7 @@ void apply_window(const Sample *x, const Real *w, Sample *out, std::size_t n) no
 template <class Real>
 void write_power(const std::complex<Real> *x, Real *power, row_goes how, std::size_t n) noexcept {
   if constexpr (std::is_same_v<Real, float>) {
-    const auto &kernels = qsrfhs::kernels::active();
+    const auto &kernels = qsrfhs::kernels::exact();
     (how == row_goes::on_top ? kernels.accumulate_power : kernels.store_power)(floats(x), power, n);
   } else {
     if (how == row_goes::in) std::fill_n(power, n, Real{});
@@ -61,7 +61,7 @@ void segment_power<Sample>::finish(real *power, row_goes how, const Sample *next
   const std::size_t n = window_.size();
   if constexpr (std::is_same_v<Sample, cf32>) {
     transform_.forward(work_.data(), around);
-    const auto &kernels = qsrfhs::kernels::active();
+    const auto &kernels = qsrfhs::kernels::exact();
     float *const work = floats(work_.data());
     if (!next) return write_power(work_.data(), power, how, n);
     (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
@@ -79,7 +79,7 @@ void segment_power<Sample>::finish(real *power, row_goes how, const Sample *next
 
 template <class Sample>
 void segment_power<Sample>::order(std::span<real> power) noexcept {
-  if constexpr (std::is_same_v<real, float>) qsrfhs::kernels::active().order_power(power.data(), power.size());
+  if constexpr (std::is_same_v<real, float>) qsrfhs::kernels::exact().order_power(power.data(), power.size());
 }
 
 template class segment_power<float>;

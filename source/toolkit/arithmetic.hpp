@@ -65,7 +65,7 @@ inline void scale(std::int32_t n, double a, std::complex<double> *x) noexcept {
 
 /// out[k] = conj(x[n - 1 - k]); x and out share no memory.
 inline void reverse_conjugate(const std::complex<float> *x, std::complex<float> *out, std::int64_t n) noexcept {
-  qsrfhs::kernels::active().reverse_conjugate(reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out),
+  qsrfhs::kernels::exact().reverse_conjugate(reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out),
                                               static_cast<std::size_t>(n));
 }
 template <class T>
@@ -75,7 +75,7 @@ void reverse_conjugate(const T *x, T *out, std::int64_t n) noexcept {
 
 /// a[k] *= b[k]; a and b may be the same.
 inline void multiply(std::complex<float> *a, const std::complex<float> *b, std::int64_t n) noexcept {
-  qsrfhs::kernels::active().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b),
+  qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b),
                                      static_cast<std::size_t>(n));
 }
 inline void multiply(std::complex<double> *a, const std::complex<double> *b, std::int64_t n) noexcept {
@@ -84,17 +84,17 @@ inline void multiply(std::complex<double> *a, const std::complex<double> *b, std
 
 /// out[k] = sum over j, in this order, of taps[j] x[k - j width]; out and x share no memory.
 inline void convolve(const float *x, std::span<const float> taps, std::size_t width, std::span<float> out) noexcept {
-  qsrfhs::kernels::active().fir(x, taps.data(), taps.size(), width, out.data(), out.size());
+  qsrfhs::kernels::exact().fir(x, taps.data(), taps.size(), width, out.data(), out.size());
 }
 inline void convolve(const double *x, std::span<const double> taps, std::size_t width, std::span<double> out) noexcept {
-  qsrfhs::kernels::active().fir_double(x, taps.data(), taps.size(), width, out.data(), out.size());
+  qsrfhs::kernels::exact().fir_double(x, taps.data(), taps.size(), width, out.data(), out.size());
 }
 
 /// out[k] = |x[k]|^2 * factor: the sum in the element's type, the product in double. `mirror`, unless null, receives
 /// the same in reverse order.
 inline void scaled_power(const std::complex<float> *x, float *out, float *mirror, double factor,
                          std::int64_t n) noexcept {
-  qsrfhs::kernels::active().scaled_power(reinterpret_cast<const float *>(x), out, mirror, factor,
+  qsrfhs::kernels::exact().scaled_power(reinterpret_cast<const float *>(x), out, mirror, factor,
                                          static_cast<std::size_t>(n));
 }
 inline void scaled_power(const std::complex<double> *x, double *out, double *mirror, double factor,

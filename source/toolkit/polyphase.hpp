@@ -39,21 +39,21 @@ void polyphase(const tap_place<Real> *places, std::int64_t outputs, const tap_ro
 }
 inline void polyphase(const tap_place<float> *places, std::int64_t outputs, const tap_rows<float> &rows, const float *x,
                       float *out) noexcept {
-  qsrfhs::kernels::active().polyphase(places, static_cast<std::size_t>(outputs), rows, x, out);
+  qsrfhs::kernels::exact().polyphase(places, static_cast<std::size_t>(outputs), rows, x, out);
 }
 inline void polyphase(const tap_place<float> *places, std::int64_t outputs, const tap_rows<float> &rows,
                       const std::complex<float> *x, std::complex<float> *out) noexcept {
-  qsrfhs::kernels::active().complex_polyphase(places, static_cast<std::size_t>(outputs), rows,
+  qsrfhs::kernels::exact().complex_polyphase(places, static_cast<std::size_t>(outputs), rows,
                                               reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
 }
 
 inline void stretched(const tap_place<float> *places, std::int64_t outputs, const tap_offsets &taps, const float *x,
                       float *out) noexcept {
-  qsrfhs::kernels::active().stretched(places, static_cast<std::size_t>(outputs), taps, x, out);
+  qsrfhs::kernels::exact().stretched(places, static_cast<std::size_t>(outputs), taps, x, out);
 }
 inline void stretched(const tap_place<float> *places, std::int64_t outputs, const tap_offsets &taps,
                       const std::complex<float> *x, std::complex<float> *out) noexcept {
-  qsrfhs::kernels::active().complex_stretched(places, static_cast<std::size_t>(outputs), taps,
+  qsrfhs::kernels::exact().complex_stretched(places, static_cast<std::size_t>(outputs), taps,
                                               reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
 }
 

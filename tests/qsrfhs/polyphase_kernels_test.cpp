@@ -1,7 +1,8 @@
-// Filters between the coefficients of a prototype: both builds give the same bits, and the sums of the definition.
+// Filters between the coefficients of a prototype: all builds give the same bits, and the sums of the definition.
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
 #include <vector>
 
@@ -14,7 +15,7 @@ namespace {
 using namespace qsrfhs::kernels;
 using tests::edge, tests::guarded;
 
-/// Real outputs, then complex ones, of one kernel of either kind in both builds.
+/// Real outputs, then complex ones, of one kernel of either kind in all builds.
 template <class Taps, class Kernel>
 void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
                  Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places, std::size_t samples,
@@ -26,10 +27,10 @@ void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_
     const guarded reals(std::vector<float>(x.begin(), x.begin() + static_cast<std::ptrdiff_t>(samples)), at),
         both(x, at);
     const guarded given(places, at), out(3 * places.size() * sizeof(float), at);
-    for (const kernel_table *table : {&baseline_kernels, &active()}) {
+    for (const build &b : builds()) {
       const auto *const first = given.as<tap_place<float>>();
-      (table->*real)(first, places.size(), real_taps, reals.as<float>(), out.as<float>());
-      (table->*complex)(first, places.size(), complex_taps, both.as<float>(), out.as<float>() + places.size());
+      (b.exact->*real)(first, places.size(), real_taps, reals.as<float>(), out.as<float>());
+      (b.exact->*complex)(first, places.size(), complex_taps, both.as<float>(), out.as<float>() + places.size());
       got.emplace_back(out.as<float>(), out.as<float>() + 3 * places.size());
       EXPECT_EQ(got[0], got.back());
     }
@@ -109,7 +110,7 @@ TEST(PolyphaseKernels, TapsAtOffsets) {
   }
 }
 
-/// Outputs of both builds for real samples (width 1) and complex ones.
+/// Outputs of all builds, exact and fused, for real samples (width 1) and complex ones.
 template <class Real>
 void expect_cubic_sums(void (*kernel_table::*kernel)(const sample_place<Real> *, std::size_t, const cubic_taps<Real> &,
                                                      std::size_t, const Real *, Real *),
@@ -121,15 +122,16 @@ void expect_cubic_sums(void (*kernel_table::*kernel)(const sample_place<Real> *,
       const guarded x(tests::noise_of<Real>(length + 4 * width, 2), edge::back);
       std::vector<sample_place<Real>> places;
       for (std::uint32_t k = 0; k < 5; ++k) places.push_back({k, k % 3, static_cast<Real>(0.2 * k - 0.4)});
-      std::vector<Real> results[2];
-      for (const bool is_active : {false, true}) {
-        auto &out = results[is_active];
-        out.resize(width * places.size());
-        const cubic_taps<Real> taps{c.as<Real>(), length};
-        const kernel_table &table = is_active ? active() : baseline_kernels;
-        (table.*kernel)(places.data(), places.size(), taps, width, x.as<Real>(), out.data());
+      const auto outputs = [&](const kernel_table &table) {
+        std::vector<Real> out(width * places.size());
+        (table.*kernel)(places.data(), places.size(), {c.as<Real>(), length}, width, x.as<Real>(), out.data());
+        return out;
+      };
+      const std::vector<Real> results[] = {outputs(baseline_kernels), outputs(*builds().back().fused)};
+      for (const build &b : builds()) {
+        EXPECT_EQ(results[0], outputs(*b.exact)) << b.name;
+        EXPECT_EQ(results[b.fused != b.exact], outputs(*b.fused)) << b.name;
       }
-      EXPECT_EQ(results[0], results[1]);
       for (std::size_t k = 0; k < places.size(); ++k) {
         double sums[2] = {};
         for (std::size_t j = 0; j < length; ++j) {
@@ -141,7 +143,8 @@ void expect_cubic_sums(void (*kernel_table::*kernel)(const sample_place<Real> *,
           sums[j % width] += tap * static_cast<double>(x.as<Real>()[width * places[k].first + j]);
         }
         for (std::size_t part = 0; part < width; ++part)
-          EXPECT_NEAR(sums[part], static_cast<double>(results[0][width * k + part]), tolerance) << length;
+          for (const auto &out : results)
+            EXPECT_NEAR(sums[part], static_cast<double>(out[width * k + part]), tolerance) << length;
       }
     }
 }
@@ -149,6 +152,48 @@ void expect_cubic_sums(void (*kernel_table::*kernel)(const sample_place<Real> *,
 TEST(PolyphaseKernels, TapsThatArePolynomials) {
   expect_cubic_sums(&kernel_table::interpolate, 2e-5);
   expect_cubic_sums(&kernel_table::interpolate_double, 1e-13);
+}
+
+// Two streams of 5 blocks through a stable recursion of each order, beside the same sums in long double.
+TEST(PolyphaseKernels, RecursionsByBlocks) {
+  constexpr std::size_t blocks = 5, width = 8;
+  for (std::size_t order = 1; order <= 6; ++order) {
+    const auto responses = tests::noise_of<double>(8 * order, 3), shares = tests::noise_of<double>(32, 4);
+    std::vector<double> scaled(responses);
+    for (double &r : scaled) r /= static_cast<double>(order);
+    const block_recursion plan{order, scaled.data(), shares.data(), shares.data() + 16};
+    const auto outputs = [&](const kernel_table &table) {
+      std::vector<double> first = tests::noise_of<double>(width + 8 * blocks, 5), second = first;
+      second[width] = 3;
+      double *const streams[] = {first.data() + width, second.data() + width};
+      table.recursion(plan, blocks, streams, 2);
+      first.insert(first.end(), second.begin(), second.end());
+      return first;
+    };
+    const auto exact_outputs = outputs(baseline_kernels), fused_outputs = outputs(*builds().back().fused);
+    for (const build &b : builds()) {
+      EXPECT_EQ(exact_outputs, outputs(*b.exact)) << b.name;
+      EXPECT_EQ(b.fused != b.exact ? fused_outputs : exact_outputs, outputs(*b.fused)) << b.name;
+    }
+    auto expected = tests::noise_of<double>(width + 8 * blocks, 5);
+    for (std::size_t at = width; at < expected.size(); at += 8) {
+      long double sums[8] = {};
+      for (std::size_t l = 0; l < 8; ++l) {
+        for (std::size_t i = 0; i < 4; ++i) {
+          const long double low = static_cast<long double>(expected[at + i]),
+                            high = static_cast<long double>(expected[at + 4 + i]);
+          sums[l] += low * static_cast<long double>(shares[(l < 4 ? 0 : 16) + 4 * i + l % 4]);
+          if (l >= 4) sums[l] += high * static_cast<long double>(shares[4 * i + l % 4]);
+        }
+        for (std::size_t j = 0; j < order; ++j)
+          sums[l] += static_cast<long double>(expected[at - 1 - j]) * static_cast<long double>(scaled[8 * j + l]);
+      }
+      for (std::size_t l = 0; l < 8; ++l) expected[at + l] = static_cast<double>(sums[l]);
+    }
+    for (const auto *got : {&exact_outputs, &fused_outputs})
+      for (std::size_t k = 0; k < expected.size(); ++k)
+        EXPECT_NEAR(expected[k], (*got)[k], 1e-13 * std::max(1.0, std::abs(expected[k]))) << order << ' ' << k;
+  }
 }
 
 }  // namespace

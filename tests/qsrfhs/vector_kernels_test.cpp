@@ -1,4 +1,4 @@
-// Both builds of the element loops against their formulas, bit for bit. SPDX-License-Identifier: MIT
+// All builds of the element loops against their formulas, bit for bit. SPDX-License-Identifier: MIT
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
 #include <gtest/gtest.h>
@@ -14,24 +14,34 @@
 #include <random>
 #include <set>
 #include <span>
+#include <string>
+#include <utility>
 #include <vector>
 
-#include "platform/processor.hpp"
 #include "support/guarded.hpp"
 
 namespace {
 
 using qsrfhs::kernels::kernel_table;
 
-struct build {
-  const char *name;
-  const kernel_table *table;
-};
+using qsrfhs::kernels::builds;
 
-std::vector<build> builds() {
-  std::vector<build> all{{"baseline", &qsrfhs::kernels::baseline_kernels}};
-  if (platform::has_avx()) all.push_back({"avx", &qsrfhs::kernels::avx_kernels});
+/// How products are rounded that something is added to.
+enum class products { separate, fused };
+
+/// The tables of this processor that round products so.
+std::vector<std::pair<std::string, const kernel_table *>> tables(products how) {
+  std::vector<std::pair<std::string, const kernel_table *>> all;
+  for (const auto &b : builds()) {
+    if (how == products::separate) all.emplace_back(b.name, b.exact);
+    if (how == products::fused && b.fused != b.exact) all.emplace_back(std::string(b.name) + " fused", b.fused);
+  }
   return all;
+}
+
+/// a b + c.
+float multiply_add(products how, float a, float b, float c) {
+  return how == products::fused ? std::fma(a, b, c) : a * b + c;
 }
 
 /// Where the arrays of a call lie: behind a page that faults, in front of one, or at an odd float.
@@ -139,13 +149,10 @@ float define_log2(float v) {
 }
 
 /// The element (k, width) of an array of coefficients, by Horner's scheme in x.
-float define_polynomial(const std::vector<float> &c, std::size_t part, std::size_t width, float x) {
+float define_polynomial(products how, const std::vector<float> &c, std::size_t part, std::size_t width, float x) {
   const std::size_t m = c.size() / width;
   float acc = c[(m - 1) * width + part];
-  for (std::size_t k = m - 1; k-- > 0;) {
-    const float product = acc * x;
-    acc = product + c[k * width + part];
-  }
+  for (std::size_t k = m - 1; k-- > 0;) acc = multiply_add(how, acc, x, c[k * width + part]);
   return acc;
 }
 
@@ -174,7 +181,7 @@ void define_lookup(const qsrfhs::kernels::lookup_table &table, float key, const 
 }
 
 /// The loops around transforms. Those that work on their output itself find x there.
-void add_transform_loops(std::vector<operation> &all) {
+void add_transform_loops(std::vector<operation> &all, products how) {
   const auto window = [](auto x, auto w, auto out) { out[0] = x[0] * *w, out[1] = x[1] * *w; };
   const auto twice_the_power = [](auto x, auto, auto out) { *out = define_power(x) + define_power(x); };
   all.push_back({"copy", 2, 0, 2, [](auto &t, auto x, auto, auto out, auto n) { t.copy(x, out, n); },
@@ -192,9 +199,9 @@ void add_transform_loops(std::vector<operation> &all) {
                    std::copy_n(x, 2 * n, out);
                    t.multiply(out, y, n);
                  },
-                 [](auto x, auto y, auto out) {
-                   out[0] = x[0] * y[0] - x[1] * y[1];
-                   out[1] = x[1] * y[0] + x[0] * y[1];
+                 [how](auto x, auto y, auto out) {
+                   out[0] = multiply_add(how, x[0], y[0], -(x[1] * y[1]));
+                   out[1] = multiply_add(how, x[1], y[0], x[0] * y[1]);
                  },
                  false});
   // Two segments into zeros: the order of the powers is the build's own until they are put into theirs.
@@ -254,14 +261,14 @@ void add_transform_loops(std::vector<operation> &all) {
                  [](auto x, auto w, auto out) { out[0] = x[0] * w[0], out[1] = x[1] * w[1]; }});
   all.push_back({"weigh_and_rotate", 2, 2, 2,
                  [](auto &t, auto x, auto w, auto out, auto n) { t.weigh_and_rotate(x, w, 0.6F, -0.8F, out, n); },
-                 [](auto x, auto w, auto out) {
+                 [how](auto x, auto w, auto out) {
                    const float re = x[0] * w[0], im = x[1] * w[1];
-                   out[0] = re * 0.6F - im * -0.8F;
-                   out[1] = im * 0.6F + re * -0.8F;
+                   out[0] = multiply_add(how, re, 0.6F, im * 0.8F);
+                   out[1] = multiply_add(how, im, 0.6F, re * -0.8F);
                  }});
 }
 
-std::vector<operation> operations() {
+std::vector<operation> operations(products how) {
   std::vector<operation> all;
   all.push_back(
       {"divide", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.divide(x, y, out, n); }, define_division});
@@ -300,13 +307,13 @@ std::vector<operation> operations() {
     const std::vector<float> real(c.begin(), c.begin() + static_cast<std::ptrdiff_t>(m));
     all.push_back({"polynomial", 1, 0, 1,
                    [m, p = at_a_page(real)](auto &t, auto x, auto, auto out, auto n) { t.polynomial(x, p, m, out, n); },
-                   [real](auto x, auto, auto out) { *out = define_polynomial(real, 0, 1, *x); }});
+                   [how, real](auto x, auto, auto out) { *out = define_polynomial(how, real, 0, 1, *x); }});
     all.push_back(
         {"complex_polynomial", 1, 0, 2,
          [m, p = at_a_page(c)](auto &t, auto x, auto, auto out, auto n) { t.complex_polynomial(x, p, m, out, n); },
-         [c](auto x, auto, auto out) {
-           out[0] = define_polynomial(c, 0, 2, *x);
-           out[1] = define_polynomial(c, 1, 2, *x);
+         [how, c](auto x, auto, auto out) {
+           out[0] = define_polynomial(how, c, 0, 2, *x);
+           out[1] = define_polynomial(how, c, 1, 2, *x);
          }});
   }
   // Keys reach below, into and beyond the tables; an infinite and a negative zero value must come out as they are.
@@ -322,7 +329,7 @@ std::vector<operation> operations() {
     all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
                    [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
   }
-  add_transform_loops(all);
+  add_transform_loops(all, how);
   return all;
 }
 
@@ -336,35 +343,57 @@ std::vector<float> define(const operation &op, std::span<const float> x, std::sp
 /// Which input the output is, too.
 enum class output { apart, over_x, over_y };
 
-void check(const rooms &in, const operation &op, std::size_t n, place at) {
+void check(const rooms &in, products how, const operation &op, std::size_t n, place at) {
   const auto first = filled(n * op.x_width, static_cast<unsigned>(n));
   const auto second = filled(n * op.y_width, static_cast<unsigned>(n + 1));
   const std::vector<float> expected = define(op, first, second, n), before(expected.size(), -77.0F);
-  for (const build &b : builds())
+  for (const auto &[name, table] : tables(how))
     for (const output where : {output::apart, output::over_x, output::over_y}) {
       const std::size_t width = where == output::over_x ? op.x_width : op.y_width;
       if (where != output::apart && (!op.in_place || op.out_width > width)) continue;
       float *const x = in.x.put(first, at), *const y = in.y.put(second, at);
       float *const out = where == output::over_x ? x : where == output::over_y ? y : in.out.put(before, at);
-      op.run(*b.table, x, y, out, n);
+      op.run(*table, x, y, out, n);
       EXPECT_TRUE(same(expected, {out, expected.size()}))
-          << b.name << ' ' << op.name << " n " << n << " place " << static_cast<int>(at) << " output "
+          << name << ' ' << op.name << " n " << n << " place " << static_cast<int>(at) << " output "
           << static_cast<int>(where);
     }
 }
 
 std::vector<std::size_t> lengths() {
   std::vector<std::size_t> all = {63, 64, 65, 127, 1003};
-  for (std::size_t n = 0; n <= 40; ++n) all.push_back(n);
+  for (std::size_t n = 0; n <= 3 * 16 + 1; ++n) all.push_back(n);
   return all;
 }
 constexpr place places[] = {place::front, place::back, place::odd};
 
-TEST(VectorKernels, BothBuildsFollowTheFormulasAndTouchNothingElse) {
+TEST(VectorKernels, AllBuildsFollowTheFormulasAndTouchNothingElse) {
   const rooms in(2048);
-  for (const operation &op : operations())
-    for (const std::size_t n : lengths())
-      for (const place at : places) check(in, op, n, at);
+  for (const products how : {products::separate, products::fused})
+    for (const operation &op : operations(how))
+      for (const std::size_t n : lengths())
+        for (const place at : places) check(in, how, op, n, at);
+}
+
+// Horner's scheme with m coefficients is within 2 m units of rounding of the sum of the terms' sizes.
+TEST(VectorKernels, PolynomialsAreNearThoseInDoublePrecision) {
+  constexpr std::size_t m = 9, n = 100;
+  const auto x = filled(n, 1), c = std::vector<float>{3, -1, 0.3F, 7, -2.7F, 0.01F, 5, -0.6F, 0.1F};
+  for (const products how : {products::separate, products::fused})
+    for (const auto &[name, table] : tables(how)) {
+      std::vector<float> out(n);
+      table->polynomial(x.data(), c.data(), m, out.data(), n);
+      for (std::size_t i = 0; i < n; ++i) {
+        if (!(std::abs(x[i]) < 1e3F)) continue;
+        double sum = 0, sizes = 0;
+        for (std::size_t k = 0; k < m; ++k) {
+          const double term = static_cast<double>(c[k]) * std::pow(static_cast<double>(x[i]), static_cast<double>(k));
+          sum += term;
+          sizes += std::abs(term);
+        }
+        EXPECT_NEAR(sum, static_cast<double>(out[i]), 2 * m * sizes * 0x1p-24) << name << " x " << x[i];
+      }
+    }
 }
 
 // Complex outputs that bypass the caches; how they are stored depends on the shape of the operation only.
@@ -372,11 +401,11 @@ TEST(VectorKernels, LongArraysComeOutTheSame) {
   constexpr std::size_t floats = std::size_t{24} << 18;
   const rooms in(floats);
   std::set<std::array<std::size_t, 2>> shapes;
-  for (operation op : operations()) {
+  for (operation op : operations(products::separate)) {
     if (op.out_width != 2 || !shapes.insert({op.x_width, op.y_width}).second) continue;
     op.in_place = false;
     for (const place at : {place::back, place::odd})
-      check(in, op, floats / (op.x_width + op.y_width + op.out_width) + 1003, at);
+      check(in, products::separate, op, floats / (op.x_width + op.y_width + op.out_width) + 1003, at);
   }
 }
 
@@ -387,12 +416,12 @@ TEST(VectorKernels, LookupIndicesBeyondTheExactFloats) {
   ASSERT_TRUE(entries);
   for (const int k : {last - 1, last})
     entries.get()[4 * static_cast<std::size_t>(k)] = static_cast<float>(k - last + 3);
-  for (const build &b : builds()) {
+  for (const auto &b : builds()) {
     const float keys[] = {16777215, 16777216, 16777218, 2147483520.0F, 2147483648.0F, -1};
     const float expected[] = {0, 2, 3, 3, 0, 0};
     const float in[12] = {1, 0, 1, 0, 1, 0, 1, 0, 1, 0, 1, 0};
     float out[12];
-    b.table->lookup({entries.get(), last + 1, 0, 1}, keys, in, out, 6);
+    b.exact->lookup({entries.get(), last + 1, 0, 1}, keys, in, out, 6);
     for (int i = 0; i < 6; ++i) EXPECT_EQ(expected[i], out[2 * i]) << b.name << " key " << keys[i];
   }
 }
@@ -423,23 +452,21 @@ TEST(VectorKernels, SumsKeepTheirOrder) {
         }
         const float *const x = in.x.put(values, at);
         float *const sum = in.y.put(std::array{0.0F}, at), *const highest = in.out.put(std::array{0.0F}, at);
-        for (const build &b : builds()) {
+        for (const auto &b : builds()) {
           SCOPED_TRACE(testing::Message() << b.name << " n " << n << " place " << static_cast<int>(at));
-          EXPECT_TRUE(same(define_sum(values), b.table->sum_power(x, n)));
-          b.table->sum_power_and_peak(x, n, sum, highest);
+          EXPECT_TRUE(same(define_sum(values), b.exact->sum_power(x, n)));
+          b.exact->sum_power_and_peak(x, n, sum, highest);
           EXPECT_TRUE(same(peak, *highest));
-          const bool in_lanes = b.table == &qsrfhs::kernels::avx_kernels;
+          const bool in_lanes = b.exact != &qsrfhs::kernels::baseline_kernels;
           EXPECT_TRUE(same(in_lanes ? define_sum(values) : sequential, *sum));
         }
       }
 }
 
 TEST(VectorKernels, PolynomialsReachAsFarAsTheirBuildGoes) {
-  const auto &baseline = qsrfhs::kernels::baseline_kernels;
-  const auto &avx = qsrfhs::kernels::avx_kernels;
   alignas(32) static float out[64];
   struct reach {
-    std::size_t offset, n, m, baseline, avx;
+    std::size_t offset, n, m, baseline, others;
   };
   constexpr reach reaches[] = {{0, 40, 16, 40, 40}, {0, 40, 17, 8, 40}, {1, 40, 32, 8, 40}, {0, 40, 33, 8, 8},
                                {1, 40, 33, 8, 8},   {2, 40, 33, 8, 8},  {1, 7, 33, 7, 7},   {7, 40, 33, 8, 8},
@@ -447,8 +474,10 @@ TEST(VectorKernels, PolynomialsReachAsFarAsTheirBuildGoes) {
                                {0, 48, 33, 0, 0}};
   for (const reach &r : reaches) {
     SCOPED_TRACE(testing::Message() << "offset " << r.offset << " n " << r.n << " m " << r.m);
-    EXPECT_EQ(r.baseline, baseline.polynomial_reach(out + r.offset, r.n, r.m));
-    EXPECT_EQ(r.avx, avx.polynomial_reach(out + r.offset, r.n, r.m));
+    for (const auto &b : builds())
+      EXPECT_EQ(b.exact == &qsrfhs::kernels::baseline_kernels ? r.baseline : r.others,
+                b.exact->polynomial_reach(out + r.offset, r.n, r.m))
+          << b.name;
   }
 }
 

@@ -64,7 +64,7 @@ struct long_call {
       keys.elements()[i] = static_cast<float>(i % 1000) * 0.01F - 1;
       in.elements()[i] = {static_cast<float>(i % 77), static_cast<float>(i % 31) - 15};
     }
-    qsrfhs::kernels::active().lookup({&table.elements()[0].re, 4, 0.5F, 2}, keys.elements().data(),
+    qsrfhs::kernels::exact().lookup({&table.elements()[0].re, 4, 0.5F, 2}, keys.elements().data(),
                                      &in.elements()[0].re, expected.data(), n);
   }
   bool run() {

@@ -56,7 +56,7 @@ std::span<const sample> samples_of(const lumra_waveform &record) noexcept {
 /// Sums over all whole segments the power of their transforms, and returns the number of segments.
 std::uint64_t sum_segments(std::span<const sample> input, std::size_t step, const qsrfhs::Filter *window,
                            qsrfhs::fft_transform &transform, std::span<sample> work, float *power) {
-  const auto &kernels = qsrfhs::kernels::active();
+  const auto &kernels = qsrfhs::kernels::exact();
   const std::size_t n = work.size();
   const std::uint64_t segments = (input.size() - n) / step + 1;
   const float *w = window && window->length() != 0 ? window->coefficients().data() : nullptr;
@@ -108,7 +108,7 @@ std::int32_t windowed_fft(LumraAlgoSession &session, std::int32_t window_type, s
 
   const std::uint64_t segments = sum_segments(input, step, window.get(), *transform, work.elements(), power.data());
   if (segments > 1)
-    qsrfhs::kernels::active().scale(power.data(), static_cast<float>(1.0 / static_cast<double>(segments)), n);
+    qsrfhs::kernels::exact().scale(power.data(), static_cast<float>(1.0 / static_cast<double>(segments)), n);
 
   const std::span<float> result = host::elements(out.y);
   std::copy_n(power.data(), std::min(n, result.size()), result.begin());

@@ -89,6 +89,6 @@ int32_t qsLumraAlgo_CalculatePhaseError2D(lumra_cf32_matrix a, lumra_cf32_matrix
 int32_t qsLumraAlgo_scale_cf(lumra_cf32 *data, uint64_t n, float factor) {
   if (n == 0) return 0;
   if (!data || n > std::numeric_limits<std::size_t>::max() / sizeof *data) return LUMRA_REFUSED;
-  qsrfhs::kernels::active().scale(reinterpret_cast<float *>(data), factor, 2 * n);
+  qsrfhs::kernels::exact().scale(reinterpret_cast<float *>(data), factor, 2 * n);
   return 0;
 }

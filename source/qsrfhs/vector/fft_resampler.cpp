@@ -113,7 +113,7 @@ void for_each_run(std::int64_t n, std::int64_t m, std::int64_t centre, Put put) 
 /// The channel's bins, weighed, rotated and with their halves swapped: 0 Hz first, as the backward transform wants it.
 void fill_bins(const resampler_plan &plan, const resampler_channel &channel, double phase, const sample *spectrum,
                sample *bins) noexcept {
-  const kernels::kernel_table &kernel = kernels::active();
+  const kernels::kernel_table &kernel = kernels::exact();
   const auto cosine = static_cast<float>(std::cos(phase)), sine = static_cast<float>(std::sin(phase));
   const std::int64_t m = plan.m, half = m / 2;
 

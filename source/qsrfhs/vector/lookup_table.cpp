@@ -61,7 +61,7 @@ void drop_batch(lookup_batch &batch) noexcept {
 
 void run_task(void *address, void * /*task*/) {
   const auto &record = *static_cast<const lookup_record *>(address);
-  kernels::active().lookup(record.batch->table, record.keys, record.in, record.out, record.count);
+  kernels::exact().lookup(record.batch->table, record.keys, record.in, record.out, record.count);
   drop_batch(*record.batch);
 }
 
@@ -75,7 +75,7 @@ std::int32_t run_shared(const kernels::lookup_table &table, const float *keys, c
   const std::uint32_t tasks = task_count(n);
   lookup_batch *batch = tasks == 1 ? nullptr : take_batch(tasks);
   if (!batch) {
-    kernels::active().lookup(table, keys, in, out, n);
+    kernels::exact().lookup(table, keys, in, out, n);
     return 0;
   }
   batch->table = table;

@@ -17,12 +17,12 @@ namespace {
 /// Writes as many of the n results as the output has room for.
 void evaluate(const float *x, std::size_t n, std::span<lumra_cf32> c, std::span<lumra_cf32> out) noexcept {
   if (static_cast<const void *>(x) == out.data()) return;  // real values that are in the way of complex ones
-  kernels::active().complex_polynomial(x, floats(c), c.size(), floats(out), std::min(n, out.size()));
+  kernels::exact().complex_polynomial(x, floats(c), c.size(), floats(out), std::min(n, out.size()));
 }
 
 void evaluate(const float *x, std::size_t n, std::span<float> c, std::span<float> out) noexcept {
-  const std::size_t reach = kernels::active().polynomial_reach(out.data(), n, c.size());
-  kernels::active().polynomial(x, c.data(), c.size(), out.data(), std::min(reach, out.size()));
+  const std::size_t reach = kernels::exact().polynomial_reach(out.data(), n, c.size());
+  kernels::exact().polynomial(x, c.data(), c.size(), out.data(), std::min(reach, out.size()));
 }
 
 /// False when there was nothing to evaluate and the output was emptied. Throws what a host's resize service throws.

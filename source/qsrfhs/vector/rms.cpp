@@ -20,7 +20,7 @@ float root_mean(float sum, std::size_t n) noexcept {
 int32_t qsUtilHS_RMS_IQ(lumra_cf32_array x, float *rms) {
   if (!rms) return 0;
   const auto samples = host::elements(x);
-  *rms = root_mean(kernels::active().sum_power(floats(samples), samples.size()), samples.size());
+  *rms = root_mean(kernels::exact().sum_power(floats(samples), samples.size()), samples.size());
   return 0;
 }
 
@@ -28,7 +28,7 @@ int32_t qsUtilHS_RMS_IQ_with_peak_calc(lumra_cf32_array x, float *rms, float *pe
   if (!host::has_block(x) || !rms || !peak) return LUMRA_REFUSED;
   const auto samples = host::elements(x);
   float sum = 0, highest = 0;
-  kernels::active().sum_power_and_peak(floats(samples), samples.size(), &sum, &highest);
+  kernels::exact().sum_power_and_peak(floats(samples), samples.size(), &sum, &highest);
   *rms = root_mean(sum, samples.size());
   *peak = std::sqrt(highest);
   return 0;

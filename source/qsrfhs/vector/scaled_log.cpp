@@ -23,14 +23,14 @@ std::int32_t write_logarithms(Block **x, lumra_f32_array *out, float a, float b,
 
 int32_t qsRFHS_log2_scaled_SGL(lumra_f32_array x, float a, float b) {
   const auto values = host::elements(x);
-  kernels::active().log2_scaled(values.data(), a, b, values.data(), values.size());
+  kernels::exact().log2_scaled(values.data(), a, b, values.data(), values.size());
   return 0;
 }
 
 int32_t qsUtilHS_aLog2Plusb_SGL(lumra_f32_array x, lumra_f32_array *out, float a, float b) {
-  return write_logarithms(x, out, a, b, kernels::active().log2_scaled_or_infinity);
+  return write_logarithms(x, out, a, b, kernels::exact().log2_scaled_or_infinity);
 }
 
 int32_t qsUtilHS_aLog2Plusb_IQ(lumra_cf32_array x, lumra_f32_array *out, float a, float b) {
-  return write_logarithms(x, out, a, b, kernels::active().log2_scaled_power);
+  return write_logarithms(x, out, a, b, kernels::exact().log2_scaled_power);
 }

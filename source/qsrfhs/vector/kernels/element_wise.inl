@@ -1,6 +1,7 @@
-// How an element-wise kernel goes over its arrays. A kernel is a step: a function object that makes `block` elements of
-// the output from as many of its one or two inputs. It reads an element before it writes there, so that the output may
-// be an input, and writes through Put. The widths are in floats an element; an input of width 0 is not read.
+// How an element-wise kernel goes over its arrays. A kernel is a step: a function object that makes some groups of
+// wide::lanes elements of the output from as many of its one or two inputs, `groups` of them side by side where there
+// are so many. It reads an element before it writes there, so that the output may be an input, and writes through Put.
+// The widths are in values an element; an input of width 0 is not read.
 // SPDX-License-Identifier: MIT
 
 /// Bytes in all arrays of a call from which the output is stored past the caches: its lines need not be read then
@@ -8,40 +9,52 @@
 static constexpr std::size_t streaming_bytes = std::size_t{24} << 20;
 
 struct into_caches {
-  static inline void put(float *p, f8 a) { store(p, a); }
+  template <class Real, class Lanes>
+  static inline void put(Real *p, Lanes a) {
+    store(p, a);
+  }
 };
 
 struct past_caches {
-  static inline void put(float *p, f8 a) { stream(p, a); }
+  static inline void put(float *p, wide a) { stream(p, a); }
 };
 
 template <class Put>
-static inline void store_complex(float *p, f8 re, f8 im) {
-  f8 a, b;
+static inline void store_complex(float *p, wide re, wide im) {
+  wide a, b;
   join(re, im, a, b);
   Put::put(p, a);
-  Put::put(p + 8, b);
+  Put::put(p + wide::lanes, b);
 }
 
-static inline void copy_floats(const float *from, float *to, std::size_t n) {
+template <class Real>
+static inline void copy_values(const Real *from, Real *to, std::size_t n) {
   for (std::size_t i = 0; i < n; ++i) to[i] = from[i];
 }
 
-template <class Put, class Step>
-static inline void go_over(const Step &step, const float *x, const float *y, float *out, std::size_t n) {
-  constexpr std::size_t block = Step::block;
-  std::size_t k = 0;
+/// Whole blocks of `groups` groups, from element k on. Where it ended.
+template <class Put, std::size_t groups, class Step, class Real>
+static inline std::size_t go_over_blocks(const Step &step, const Real *x, const Real *y, Real *out, std::size_t k,
+                                         std::size_t n) {
+  constexpr std::size_t block = groups * wide::lanes;
   for (; k + block <= n; k += block)
-    step.template run<Put>(x + k * Step::x_width, y + k * Step::y_width, out + k * Step::out_width);
+    step.template run<Put, groups>(x + k * Step::x_width, y + k * Step::y_width, out + k * Step::out_width);
+  return k;
+}
+
+template <class Put, class Step, class Real>
+static inline void go_over(const Step &step, const Real *x, const Real *y, Real *out, std::size_t n) {
+  std::size_t k = go_over_blocks<Put, Step::groups>(step, x, y, out, 0, n);
+  if constexpr (Step::groups > 1) k = go_over_blocks<Put, 1>(step, x, y, out, k, n);
   if (k == n) return;
-  // The rest is padded to a block, with ones: they raise no floating-point exception.
+  // The rest is padded to a group, with ones: they raise no floating-point exception.
   const std::size_t rest = n - k;
-  float xs[2 * block], ys[2 * block], outs[2 * block];
-  for (std::size_t i = 0; i < 2 * block; ++i) xs[i] = ys[i] = 1;
-  copy_floats(x + k * Step::x_width, xs, rest * Step::x_width);
-  copy_floats(y + k * Step::y_width, ys, rest * Step::y_width);
-  step.template run<into_caches>(xs, ys, outs);
-  copy_floats(outs, out + k * Step::out_width, rest * Step::out_width);
+  Real xs[2 * wide::lanes], ys[2 * wide::lanes], outs[2 * wide::lanes];
+  for (std::size_t i = 0; i < 2 * wide::lanes; ++i) xs[i] = ys[i] = 1;
+  copy_values(x + k * Step::x_width, xs, rest * Step::x_width);
+  copy_values(y + k * Step::y_width, ys, rest * Step::y_width);
+  step.template run<into_caches, 1>(xs, ys, outs);
+  copy_values(outs, out + k * Step::out_width, rest * Step::out_width);
 }
 
 /// Outputs past the caches pay where they are complex and lie on the boundary that such stores need. Gathering whole
@@ -49,7 +62,7 @@ static inline void go_over(const Step &step, const float *x, const float *y, flo
 template <class Step>
 static inline bool passes_caches(const float *x, const float *y, const float *out, std::size_t n) {
   constexpr std::size_t bytes = sizeof(float) * (Step::x_width + Step::y_width + Step::out_width);
-  return Step::out_width == 2 && n >= streaming_bytes / bytes && reinterpret_cast<std::size_t>(out) % sizeof(f8) == 0 &&
+  return Step::out_width == 2 && n >= streaming_bytes / bytes && reinterpret_cast<std::size_t>(out) % 32 == 0 &&
          out != x && out != y;
 }
 

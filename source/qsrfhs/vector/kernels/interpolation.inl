@@ -3,8 +3,9 @@
 /// A register of taps at `at`: in front of it stand their coefficients, the highest power first.
 template <class Lanes, class Real>
 static inline Lanes cubic(const Real *c, Lanes at) {
-  constexpr std::size_t lanes = 32 / sizeof(Real);
-  return ((load(c) * at + load(c + lanes)) * at + load(c + 2 * lanes)) * at + load(c + 3 * lanes);
+  Lanes sum = Lanes::load(c);
+  for (std::size_t power = 1; power < 4; ++power) sum = multiply_add(sum, at, Lanes::load(c + Lanes::lanes * power));
+  return sum;
 }
 
 static inline void sum_pairs(d4 a, double *sums) {
@@ -17,13 +18,13 @@ static inline void sum_pairs(d4 a, double *sums) {
 template <class Lanes, class Real>
 static inline void interpolate_by(const sample_place<Real> *places, std::size_t outputs, const cubic_taps<Real> &taps,
                                   std::size_t width, const Real *x, Real *out) {
-  constexpr std::size_t lanes = 32 / sizeof(Real);
   for (std::size_t k = 0; k < outputs; ++k) {
-    const Lanes at = load_repeated(&places[k].offset);
+    const Lanes at = Lanes::broadcast(places[k].offset);
     const Real *c = taps.coefficients + 4 * taps.length * places[k].row;
     const Real *in = x + width * places[k].first;
-    Lanes sum = cubic<Lanes>(c, at) * load(in);
-    for (std::size_t j = lanes; j < taps.length; j += lanes) sum = sum + cubic<Lanes>(c + 4 * j, at) * load(in + j);
+    Lanes sum = cubic<Lanes>(c, at) * Lanes::load(in);
+    for (std::size_t j = Lanes::lanes; j < taps.length; j += Lanes::lanes)
+      sum = multiply_add(cubic<Lanes>(c + 4 * j, at), Lanes::load(in + j), sum);
     Real sums[2];
     sum_pairs(sum, sums);
     if (width == 2) {

@@ -1,11 +1,14 @@
-// Element loops, each built twice from one body: for AVX and for the baseline. Both builds give the same bits (a NaN
-// may differ in sign and payload) but for polynomial_reach and the sum of sum_power_and_peak. Pointers and counts only;
-// complex data are pairs of floats, I then Q. An output may be an input, element for element.
+// Element loops, each built from one body for several kinds of processors, and for the richer ones twice: exact, with
+// every operation rounded by itself, and with fused products. All exact builds give the same bits (a NaN may differ in
+// sign and payload) but for polynomial_reach and the sum of sum_power_and_peak, which the baseline build has otherwise
+// than all others; all fused builds give the same bits as each other. Pointers and counts only; complex data are pairs
+// of floats, I then Q. An output may be an input, element for element.
 // SPDX-License-Identifier: MIT
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
+#include <span>
 
 namespace qsrfhs::kernels {
 
@@ -105,7 +108,7 @@ struct kernel_table {
   void (*magnitude)(const float *x, float *out, std::size_t n);
   void (*magnitude_squared)(const float *x, float *out, std::size_t n);
 
-  /// Samples, from the first, that a real polynomial of m coefficients evaluates of n; differs between the builds.
+  /// Samples, from the first, that a real polynomial of m coefficients evaluates of n; the baseline build differs.
   std::size_t (*polynomial_reach)(const float *out, std::size_t n, std::size_t m);
   /// out[k] = c[0] + c[1] x[k] + ... + c[m - 1] x[k]^(m - 1), n real; m at least 1, c apart from out.
   void (*polynomial)(const float *x, const float *c, std::size_t m, float *out, std::size_t n);
@@ -175,10 +178,23 @@ struct kernel_table {
   void (*recursion)(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count);
 };
 
-extern const kernel_table avx_kernels;
 extern const kernel_table baseline_kernels;
+extern const kernel_table avx_kernels;
+extern const kernel_table avx2_kernels, avx2_fused_kernels;
+extern const kernel_table avx512_kernels, avx512_fused_kernels;
 
-/// The table for this processor, chosen once.
-const kernel_table &active() noexcept;
+/// The kernels for a kind of processors; `fused` is `exact` where there are no fused products.
+struct build {
+  const char *name;
+  const kernel_table *exact, *fused;
+};
+
+/// The builds that this processor can run, from the baseline to the widest.
+std::span<const build> builds() noexcept;
+
+/// The tables for this processor, from one build, chosen once. Exact ones for all that an older function returns, or
+/// shares with a new one.
+const kernel_table &exact() noexcept;
+const kernel_table &fused() noexcept;
 
 }  // namespace qsrfhs::kernels

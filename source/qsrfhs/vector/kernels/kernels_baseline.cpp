@@ -5,14 +5,19 @@
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
-namespace qsrfhs::kernels {
-namespace baseline {
+namespace qsrfhs::kernels::baseline {
 namespace {
 #include "lanes_baseline.inl"
 //
+#include "one_width.inl"
+//
+#include "separate_products.inl"
+//
 #include "bodies.inl"
 }  // namespace
-}  // namespace baseline
+}  // namespace qsrfhs::kernels::baseline
+
+namespace qsrfhs::kernels {
 
 constexpr kernel_table baseline_kernels = baseline::table;
 

@@ -1,7 +1,19 @@
 // f8, eight floats, in one AVX register. Only what AVX itself has: no AVX2, no FMA. SPDX-License-Identifier: MIT
 
 struct f8 {
+  static constexpr std::size_t lanes = 8;
   __m256 v;
+  static inline f8 load(const float *p) { return {_mm256_loadu_ps(p)}; }
+  static inline f8 broadcast(float a) { return {_mm256_set1_ps(a)}; }
+  /// Eight times the float with these bits.
+  static inline f8 broadcast_bits(int bits) { return {_mm256_castsi256_ps(_mm256_set1_epi32(bits))}; }
+  /// a b a b a b a b.
+  static inline f8 broadcast_pair(float a, float b) { return {_mm256_setr_ps(a, b, a, b, a, b, a, b)}; }
+  /// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.
+  static inline f8 load_twice(const float *p) {
+    const __m256 both = _mm256_broadcast_ps(reinterpret_cast<const __m128 *>(p));
+    return {_mm256_permutevar_ps(both, _mm256_setr_epi32(0, 0, 1, 1, 2, 2, 3, 3))};
+  }
 };
 
 // Where the builds differ on purpose; what follows from it is told where it is used.
@@ -12,28 +24,14 @@ static constexpr bool peak_sums_in_lanes = true;
 /// Sums that a filter keeps in registers; results do not depend on it.
 static constexpr std::size_t filter_sums = 8;
 
-static inline f8 load(const float *p) {
-  return {_mm256_loadu_ps(p)};
-}
 static inline void store(float *p, f8 a) {
   _mm256_storeu_ps(p, a.v);
-}
-static inline f8 broadcast(float a) {
-  return {_mm256_set1_ps(a)};
-}
-/// Eight times the float with these bits.
-static inline f8 broadcast_bits(int bits) {
-  return {_mm256_castsi256_ps(_mm256_set1_epi32(bits))};
 }
 /// Stores past the caches; p lies on a boundary of 32 bytes.
 static inline void stream(float *p, f8 a) {
   _mm256_stream_ps(p, a.v);
 }
 
-/// a b a b a b a b.
-static inline f8 broadcast_pair(float a, float b) {
-  return {_mm256_setr_ps(a, b, a, b, a, b, a, b)};
-}
 /// 1 0 3 2 5 4 7 6.
 static inline f8 swap_pairs(f8 a) {
   return {_mm256_permute_ps(a.v, 0xb1)};
@@ -108,12 +106,6 @@ static inline f8 order_lanes(f8 a) {
   return {_mm256_castpd_ps(_mm256_permute2f128_pd(low, high, 0x20))};
 }
 
-/// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.
-static inline f8 load_twice(const float *p) {
-  const __m256 both = _mm256_broadcast_ps(reinterpret_cast<const __m128 *>(p));
-  return {_mm256_permutevar_ps(both, _mm256_setr_epi32(0, 0, 1, 1, 2, 2, 3, 3))};
-}
-
 /// Lanes 0 1 4 5, each twice, and lanes 2 3 6 7.
 static inline f8 twice_low(f8 a) {
   return {_mm256_unpacklo_ps(a.v, a.v)};
@@ -184,10 +176,12 @@ static inline f8 reverse_pairs(f8 a) {
 static inline f8 conjugate(f8 a) {
   return {_mm256_xor_ps(a.v, _mm256_setr_ps(0.F, -0.F, 0.F, -0.F, 0.F, -0.F, 0.F, -0.F))};
 }
-static inline f8 multiply_pairs(f8 a, f8 b) {
-  const __m256 by_re = _mm256_mul_ps(a.v, _mm256_moveldup_ps(b.v));
-  const __m256 by_im = _mm256_mul_ps(_mm256_permute_ps(a.v, 0xb1), _mm256_movehdup_ps(b.v));
-  return {_mm256_addsub_ps(by_re, by_im)};
+/// 0 0 2 2 4 4 6 6, and 1 1 3 3 5 5 7 7.
+static inline f8 even_twice(f8 a) {
+  return {_mm256_moveldup_ps(a.v)};
+}
+static inline f8 odd_twice(f8 a) {
+  return {_mm256_movehdup_ps(a.v)};
 }
 
 /// Each float times `factor`, rounded once more than the product in double is.
@@ -208,23 +202,17 @@ static inline void sum_pairs(f8 a, float *sums) {
 static inline f8 subtract_and_add(f8 a, f8 b) {
   return {_mm256_addsub_ps(a.v, b.v)};
 }
-static inline f8 load_repeated(const float *p) {
-  return {_mm256_broadcast_ss(p)};
-}
 
 /// Four doubles.
 struct d4 {
+  static constexpr std::size_t lanes = 4;
   __m256d v;
+  static inline d4 load(const double *p) { return {_mm256_loadu_pd(p)}; }
+  static inline d4 broadcast(double a) { return {_mm256_set1_pd(a)}; }
 };
 
-static inline d4 load(const double *p) {
-  return {_mm256_loadu_pd(p)};
-}
 static inline void store(double *p, d4 a) {
   _mm256_storeu_pd(p, a.v);
-}
-static inline d4 load_repeated(const double *p) {
-  return {_mm256_broadcast_sd(p)};
 }
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm256_add_pd(a.v, b.v)};
@@ -238,10 +226,11 @@ static inline d4 swap_pairs(d4 a) {
 static inline d4 subtract_and_add(d4 a, d4 b) {
   return {_mm256_addsub_pd(a.v, b.v)};
 }
-/// Two complex values.
-static inline d4 multiply_pairs(d4 a, d4 b) {
-  const __m256d by_re = _mm256_mul_pd(a.v, _mm256_movedup_pd(b.v));
-  return {_mm256_addsub_pd(by_re, _mm256_mul_pd(_mm256_permute_pd(a.v, 0x5), _mm256_permute_pd(b.v, 0xf)))};
+static inline d4 even_twice(d4 a) {
+  return {_mm256_movedup_pd(a.v)};
+}
+static inline d4 odd_twice(d4 a) {
+  return {_mm256_permute_pd(a.v, 0xf)};
 }
 
 /// True when all are smaller than `least`; false with a NaN.

@@ -1,7 +1,25 @@
 // f8, eight floats, in two SSE2 registers. SPDX-License-Identifier: MIT
 
 struct f8 {
+  static constexpr std::size_t lanes = 8;
   __m128 low, high;
+  static inline f8 load(const float *p) { return {_mm_loadu_ps(p), _mm_loadu_ps(p + 4)}; }
+  static inline f8 broadcast(float a) { return {_mm_set1_ps(a), _mm_set1_ps(a)}; }
+  /// Eight times the float with these bits.
+  static inline f8 broadcast_bits(int bits) {
+    const __m128 four = _mm_castsi128_ps(_mm_set1_epi32(bits));
+    return {four, four};
+  }
+  /// a b a b a b a b.
+  static inline f8 broadcast_pair(float a, float b) {
+    const __m128 pairs = _mm_setr_ps(a, b, a, b);
+    return {pairs, pairs};
+  }
+  /// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.
+  static inline f8 load_twice(const float *p) {
+    const __m128 a = _mm_loadu_ps(p);
+    return {_mm_unpacklo_ps(a, a), _mm_unpackhi_ps(a, a)};
+  }
 };
 
 // Where the builds differ on purpose; what follows from it is told where it is used.
@@ -12,20 +30,9 @@ static constexpr bool peak_sums_in_lanes = false;
 /// Sums that a filter keeps in registers; results do not depend on it.
 static constexpr std::size_t filter_sums = 4;
 
-static inline f8 load(const float *p) {
-  return {_mm_loadu_ps(p), _mm_loadu_ps(p + 4)};
-}
 static inline void store(float *p, f8 a) {
   _mm_storeu_ps(p, a.low);
   _mm_storeu_ps(p + 4, a.high);
-}
-static inline f8 broadcast(float a) {
-  return {_mm_set1_ps(a), _mm_set1_ps(a)};
-}
-/// Eight times the float with these bits.
-static inline f8 broadcast_bits(int bits) {
-  const __m128 four = _mm_castsi128_ps(_mm_set1_epi32(bits));
-  return {four, four};
 }
 /// Stores past the caches; p lies on a boundary of 32 bytes.
 static inline void stream(float *p, f8 a) {
@@ -33,11 +40,6 @@ static inline void stream(float *p, f8 a) {
   _mm_stream_ps(p + 4, a.high);
 }
 
-/// a b a b a b a b.
-static inline f8 broadcast_pair(float a, float b) {
-  const __m128 pairs = _mm_setr_ps(a, b, a, b);
-  return {pairs, pairs};
-}
 /// 1 0 3 2 5 4 7 6.
 static inline f8 swap_pairs(f8 a) {
   return {_mm_shuffle_ps(a.low, a.low, 0xb1), _mm_shuffle_ps(a.high, a.high, 0xb1)};
@@ -108,12 +110,6 @@ static inline f8 order_lanes(f8 a) {
   return a;
 }
 
-/// Four floats, each twice: p0 p0 p1 p1 p2 p2 p3 p3.
-static inline f8 load_twice(const float *p) {
-  const __m128 a = _mm_loadu_ps(p);
-  return {_mm_unpacklo_ps(a, a), _mm_unpackhi_ps(a, a)};
-}
-
 /// Lanes 0 1 4 5, each twice, and lanes 2 3 6 7.
 static inline f8 twice_low(f8 a) {
   return {_mm_unpacklo_ps(a.low, a.low), _mm_unpacklo_ps(a.high, a.high)};
@@ -130,7 +126,7 @@ static inline void join_in_lanes(f8 re, f8 im, f8 &a, f8 &b) {
 
 /// Eight complex values, to eight real and eight imaginary parts in their order.
 static inline void load_complex(const float *p, f8 &re, f8 &im) {
-  split_in_lanes(load(p), load(p + 8), re, im);
+  split_in_lanes(f8::load(p), f8::load(p + 8), re, im);
 }
 
 /// Takes the order of load_complex back.
@@ -183,13 +179,12 @@ static inline f8 conjugate(f8 a) {
   const __m128 signs = _mm_setr_ps(0.F, -0.F, 0.F, -0.F);
   return {_mm_xor_ps(a.low, signs), _mm_xor_ps(a.high, signs)};
 }
-static inline __m128 multiply_two(__m128 a, __m128 b) {
-  const __m128 by_re = _mm_mul_ps(a, _mm_shuffle_ps(b, b, 0xa0));
-  const __m128 by_im = _mm_mul_ps(_mm_shuffle_ps(a, a, 0xb1), _mm_shuffle_ps(b, b, 0xf5));
-  return _mm_add_ps(by_re, _mm_xor_ps(by_im, _mm_setr_ps(-0.F, 0.F, -0.F, 0.F)));
+/// 0 0 2 2 4 4 6 6, and 1 1 3 3 5 5 7 7.
+static inline f8 even_twice(f8 a) {
+  return {_mm_shuffle_ps(a.low, a.low, 0xa0), _mm_shuffle_ps(a.high, a.high, 0xa0)};
 }
-static inline f8 multiply_pairs(f8 a, f8 b) {
-  return {multiply_two(a.low, b.low), multiply_two(a.high, b.high)};
+static inline f8 odd_twice(f8 a) {
+  return {_mm_shuffle_ps(a.low, a.low, 0xf5), _mm_shuffle_ps(a.high, a.high, 0xf5)};
 }
 
 static inline __m128 multiply_four_in_double(__m128 a, __m128d factors) {
@@ -213,24 +208,18 @@ static inline f8 subtract_and_add(f8 a, f8 b) {
   const __m128 signs = _mm_setr_ps(-0.F, 0.F, -0.F, 0.F);
   return {_mm_add_ps(a.low, _mm_xor_ps(b.low, signs)), _mm_add_ps(a.high, _mm_xor_ps(b.high, signs))};
 }
-static inline f8 load_repeated(const float *p) {
-  return broadcast(*p);
-}
 
 /// Four doubles.
 struct d4 {
+  static constexpr std::size_t lanes = 4;
   __m128d low, high;
+  static inline d4 load(const double *p) { return {_mm_loadu_pd(p), _mm_loadu_pd(p + 2)}; }
+  static inline d4 broadcast(double a) { return {_mm_set1_pd(a), _mm_set1_pd(a)}; }
 };
 
-static inline d4 load(const double *p) {
-  return {_mm_loadu_pd(p), _mm_loadu_pd(p + 2)};
-}
 static inline void store(double *p, d4 a) {
   _mm_storeu_pd(p, a.low);
   _mm_storeu_pd(p + 2, a.high);
-}
-static inline d4 load_repeated(const double *p) {
-  return {_mm_set1_pd(*p), _mm_set1_pd(*p)};
 }
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm_add_pd(a.low, b.low), _mm_add_pd(a.high, b.high)};
@@ -245,13 +234,11 @@ static inline d4 subtract_and_add(d4 a, d4 b) {
   const __m128d signs = _mm_setr_pd(-0.0, 0.0);
   return {_mm_add_pd(a.low, _mm_xor_pd(b.low, signs)), _mm_add_pd(a.high, _mm_xor_pd(b.high, signs))};
 }
-static inline __m128d multiply_one(__m128d a, __m128d b) {
-  const __m128d by_im = _mm_mul_pd(_mm_shuffle_pd(a, a, 1), _mm_unpackhi_pd(b, b));
-  return _mm_add_pd(_mm_mul_pd(a, _mm_unpacklo_pd(b, b)), _mm_xor_pd(by_im, _mm_setr_pd(-0.0, 0.0)));
+static inline d4 even_twice(d4 a) {
+  return {_mm_unpacklo_pd(a.low, a.low), _mm_unpacklo_pd(a.high, a.high)};
 }
-/// Two complex values.
-static inline d4 multiply_pairs(d4 a, d4 b) {
-  return {multiply_one(a.low, b.low), multiply_one(a.high, b.high)};
+static inline d4 odd_twice(d4 a) {
+  return {_mm_unpackhi_pd(a.low, a.low), _mm_unpackhi_pd(a.high, a.high)};
 }
 
 /// True when all are smaller than `least`; false with a NaN.

@@ -1,7 +1,7 @@
-// Horner's scheme, each multiplication and addition rounded by itself. SPDX-License-Identifier: MIT
+// Horner's scheme. SPDX-License-Identifier: MIT
 
 /// How many samples of a real polynomial are evaluated. With few enough coefficients all n; otherwise only those that
-/// the blocks of 16 leave over, in the AVX build also those in front of the first boundary of 32 bytes in the output.
+/// the blocks of 16 leave over, in all builds but the baseline also those in front of the first boundary of 32 bytes in the output.
 static std::size_t polynomial_reach(const float *out, std::size_t n, std::size_t m) {
   if (m <= polynomial_coefficients) return n;
   std::size_t lead = 0;
@@ -13,44 +13,44 @@ static std::size_t polynomial_reach(const float *out, std::size_t n, std::size_t
   return lead + (n - lead) % 16;
 }
 
-// Several groups of eight run side by side: one alone would wait for each of its operations.
+// Several groups run side by side: one alone would wait for each of its operations.
 
 struct polynomial_step {
-  static constexpr std::size_t groups = 8, block = 8 * groups, x_width = 1, y_width = 0, out_width = 1;
+  static constexpr std::size_t groups = 8, x_width = 1, y_width = 0, out_width = 1;
   const float *c;
   std::size_t m;
-  template <class Put>
+  template <class Put, std::size_t count>
   inline void run(const float *x, const float *, float *out) const {
-    f8 acc[groups];
-    for (f8 &a : acc) a = broadcast(c[m - 1]);
+    wide acc[count];
+    for (wide &a : acc) a = wide::broadcast(c[m - 1]);
     for (std::size_t k = m - 1; k-- > 0;) {
-      const f8 ck = broadcast(c[k]);
-      for (std::size_t j = 0; j < groups; ++j) acc[j] = acc[j] * load(x + 8 * j) + ck;
+      const wide ck = wide::broadcast(c[k]);
+      for (std::size_t j = 0; j < count; ++j) acc[j] = multiply_add(acc[j], wide::load(x + wide::lanes * j), ck);
     }
-    for (std::size_t j = 0; j < groups; ++j) Put::put(out + 8 * j, acc[j]);
+    for (std::size_t j = 0; j < count; ++j) Put::put(out + wide::lanes * j, acc[j]);
   }
 };
 
 struct complex_polynomial_step {
-  static constexpr std::size_t groups = 4, block = 8 * groups, x_width = 1, y_width = 0, out_width = 2;
+  static constexpr std::size_t groups = 4, x_width = 1, y_width = 0, out_width = 2;
   const float *c;
   std::size_t m;
-  template <class Put>
+  template <class Put, std::size_t count>
   inline void run(const float *x, const float *, float *out) const {
-    f8 re[groups], im[groups];
-    for (std::size_t j = 0; j < groups; ++j) {
-      re[j] = broadcast(c[2 * m - 2]);
-      im[j] = broadcast(c[2 * m - 1]);
+    wide re[count], im[count];
+    for (std::size_t j = 0; j < count; ++j) {
+      re[j] = wide::broadcast(c[2 * m - 2]);
+      im[j] = wide::broadcast(c[2 * m - 1]);
     }
     for (std::size_t k = m - 1; k-- > 0;) {
-      const f8 ck_re = broadcast(c[2 * k]), ck_im = broadcast(c[2 * k + 1]);
-      for (std::size_t j = 0; j < groups; ++j) {
-        const f8 v = load(x + 8 * j);
-        re[j] = re[j] * v + ck_re;
-        im[j] = im[j] * v + ck_im;
+      const wide ck_re = wide::broadcast(c[2 * k]), ck_im = wide::broadcast(c[2 * k + 1]);
+      for (std::size_t j = 0; j < count; ++j) {
+        const wide v = wide::load(x + wide::lanes * j);
+        re[j] = multiply_add(re[j], v, ck_re);
+        im[j] = multiply_add(im[j], v, ck_im);
       }
     }
-    for (std::size_t j = 0; j < groups; ++j) store_complex<Put>(out + 16 * j, re[j], im[j]);
+    for (std::size_t j = 0; j < count; ++j) store_complex<Put>(out + 2 * wide::lanes * j, re[j], im[j]);
   }
 };
 

@@ -3,15 +3,15 @@
 /// The first `count` lanes.
 static inline f8 lanes_below(int count) {
   static constexpr float places[8] = {1, 2, 3, 4, 5, 6, 7, 8};
-  return broadcast(static_cast<float>(count)) >= load(places);
+  return f8::broadcast(static_cast<float>(count)) >= f8::load(places);
 }
 
 /// Sums of taps times samples, eight taps at a time. Of the last samples only `count` are used.
 struct real_sum {
   static constexpr std::ptrdiff_t width = 1;
-  f8 sum = broadcast(0);
-  void add(f8 taps, const float *x) { sum = sum + taps * load(x); }
-  void add_some(f8 taps, const float *x, int count) { sum = sum + (lanes_below(count) & (taps * load(x))); }
+  f8 sum = f8::broadcast(0);
+  void add(f8 taps, const float *x) { sum = sum + taps * f8::load(x); }
+  void add_some(f8 taps, const float *x, int count) { sum = sum + (lanes_below(count) & (taps * f8::load(x))); }
   void put(float *out) const {
     float sums[2];
     sum_pairs(sum, sums);
@@ -20,14 +20,14 @@ struct real_sum {
 };
 struct complex_sum {
   static constexpr std::ptrdiff_t width = 2;
-  f8 low = broadcast(0), high = low;
+  f8 low = f8::broadcast(0), high = low;
   void add(f8 taps, const float *x) {
-    low = low + twice_low(taps) * load(x);
-    high = high + twice_high(taps) * load(x + 8);
+    low = low + twice_low(taps) * f8::load(x);
+    high = high + twice_high(taps) * f8::load(x + 8);
   }
   void add_some(f8 taps, const float *x, int count) {
-    low = low + (lanes_below(2 * count) & (twice_low(taps) * load(x)));
-    high = high + (lanes_below(2 * count - 8) & (twice_high(taps) * load(x + 8)));
+    low = low + (lanes_below(2 * count) & (twice_low(taps) * f8::load(x)));
+    high = high + (lanes_below(2 * count - 8) & (twice_high(taps) * f8::load(x + 8)));
   }
   void put(float *out) const { sum_pairs(low + high, out); }
 };
@@ -38,9 +38,9 @@ struct taps_of_row {
   f8 fraction;
   taps_of_row(const tap_rows<float> &rows, const tap_place<float> &place)
       : row(rows.taps + static_cast<std::ptrdiff_t>(place.row) * 2 * rows.length),
-        fraction(broadcast(place.fraction)) {}
+        fraction(f8::broadcast(place.fraction)) {}
   f8 next() {
-    const f8 taps = load(row) + fraction * load(row + 8);
+    const f8 taps = f8::load(row) + fraction * f8::load(row + 8);
     row += 16;
     return taps;
   }
@@ -53,13 +53,13 @@ struct taps_at_offsets {
   taps_at_offsets(const tap_offsets &taps, const tap_place<float> &place)
       : h(taps.prototype),
         offset(taps.offsets),
-        last(broadcast(taps.last_pair)),
-        whole(broadcast(static_cast<float>(place.row))),
-        fraction(broadcast(place.fraction)) {}
+        last(f8::broadcast(taps.last_pair)),
+        whole(f8::broadcast(static_cast<float>(place.row))),
+        fraction(f8::broadcast(place.fraction)) {}
   f8 next() {
-    const f8 one = broadcast(1), between = load(offset + 8) + fraction;
+    const f8 one = f8::broadcast(1), between = f8::load(offset + 8) + fraction;
     const f8 carry = (between >= one) & one;
-    const f8 sought = load(offset) + whole + carry;  // whole numbers below 2^24
+    const f8 sought = f8::load(offset) + whole + carry;  // whole numbers below 2^24
     const f8 found = smaller_of(sought, last);
     int index[8];
     store(reinterpret_cast<float *>(index), to_integers(found));

@@ -1,10 +1,8 @@
 // Recursive filters, eight samples at a time. SPDX-License-Identifier: MIT
 
-static constexpr double zeros[4] = {};
-
 /// Adds the samples' shares of four outputs.
 static inline d4 add_samples(d4 sum, const double *x, const double *shares) {
-  for (std::size_t i = 0; i < 4; ++i) sum = sum + load_repeated(x + i) * load(shares + 4 * i);
+  for (std::size_t i = 0; i < 4; ++i) sum = multiply_add(d4::broadcast(x[i]), d4::load(shares + 4 * i), sum);
   return sum;
 }
 
@@ -14,16 +12,16 @@ static inline void recurse_over_block(const block_recursion &plan, Order order, 
   // What outputs below this leave is worth nothing, and their products may be subnormal, which takes a hundred times
   // longer.
   static constexpr double least = 1e-290;
-  const d4 limit = load_repeated(&least);
+  const d4 limit = d4::broadcast(least);
   bool silent = true;
-  for (std::size_t j = 0; j < order(); j += 4) silent = silent && all_below(load(data - j - 4), limit);
+  for (std::size_t j = 0; j < order(); j += 4) silent = silent && all_below(d4::load(data - j - 4), limit);
 
-  d4 first = add_samples(load(zeros), data, plan.own);
-  d4 second = add_samples(add_samples(load(zeros), data, plan.later), data + 4, plan.own);
+  d4 first = add_samples(d4::broadcast(0), data, plan.own);
+  d4 second = add_samples(add_samples(d4::broadcast(0), data, plan.later), data + 4, plan.own);
   for (std::size_t j = order(); !silent && j-- > 0;) {
-    const d4 past = load_repeated(data - 1 - static_cast<std::ptrdiff_t>(j));
-    first = first + past * load(plan.responses + 8 * j);
-    second = second + past * load(plan.responses + 8 * j + 4);
+    const d4 past = d4::broadcast(*(data - 1 - static_cast<std::ptrdiff_t>(j)));
+    first = multiply_add(past, d4::load(plan.responses + 8 * j), first);
+    second = multiply_add(past, d4::load(plan.responses + 8 * j + 4), second);
   }
   store(data, first);
   store(data + 4, second);

@@ -2,17 +2,13 @@
 
 /// 32 running sums, one for each float of a block of 16 samples.
 struct square_sums {
-  f8 s0, s1, s2, s3;
-  inline void add(f8 q0, f8 q1, f8 q2, f8 q3) {
-    s0 = s0 + q0;
-    s1 = s1 + q1;
-    s2 = s2 + q2;
-    s3 = s3 + q3;
-  }
+  static constexpr std::size_t registers = 32 / wide::lanes;
+  wide sums[registers];
   /// Folded to eight, then added lane by lane.
   inline float total() const {
-    float lanes[8];
-    store(lanes, s3 + s2 + (s1 + s0));
+    float all[32], lanes[8];
+    for (std::size_t r = 0; r < registers; ++r) store(all + wide::lanes * r, sums[r]);
+    store(lanes, f8::load(all + 24) + f8::load(all + 16) + (f8::load(all + 8) + f8::load(all)));
     float sum = 0;
     for (const float lane : lanes) sum += lane;
     return sum;
@@ -20,49 +16,51 @@ struct square_sums {
 };
 
 static inline square_sums no_sums() {
-  const f8 zero = broadcast(0.0F);
-  return {zero, zero, zero, zero};
+  square_sums none;
+  for (wide &sum : none.sums) sum = wide::broadcast(0.0F);
+  return none;
 }
 
-static inline f8 square(f8 a) {
+static inline wide square(wide a) {
   return a * a;
 }
 
 static float sum_power(const float *x, std::size_t n) {
-  square_sums sums = no_sums();
+  square_sums all = no_sums();
   std::size_t k = 0;
   for (; k + 16 <= n; k += 16, x += 32)
-    sums.add(square(load(x)), square(load(x + 8)), square(load(x + 16)), square(load(x + 24)));
-  float sum = sums.total();
+    for (std::size_t r = 0; r < square_sums::registers; ++r)
+      all.sums[r] = all.sums[r] + square(wide::load(x + wide::lanes * r));
+  float sum = all.total();
   for (; k < n; ++k, x += 2) sum += x[0] * x[0] + x[1] * x[1];
   return sum;
 }
 
-/// The sum runs sample by sample in the baseline build and as in sum_power in the AVX build; the peak is the same.
+/// The sum runs sample by sample in the baseline build and as in sum_power in the others; the peak is the same.
 static void sum_power_and_peak(const float *x, std::size_t n, float *sum_out, float *peak_out) {
-  square_sums sums = no_sums();  // NOLINT(clang-analyzer-deadcode.DeadStores): used in one of the builds
+  square_sums all = no_sums();  // NOLINT(clang-analyzer-deadcode.DeadStores): not used in the baseline build
   float sum = 0;
-  f8 peaks = broadcast(-__FLT_MAX__);
+  wide peaks = wide::broadcast(-__FLT_MAX__);
   std::size_t k = 0;
   for (; k + 16 <= n; k += 16, x += 32) {
-    const f8 q0 = square(load(x)), q1 = square(load(x + 8)), q2 = square(load(x + 16)), q3 = square(load(x + 24));
-    f8 re, im;
-    split_in_lanes(q0, q1, re, im);
-    const f8 p0 = re + im;
-    split_in_lanes(q2, q3, re, im);
-    const f8 p1 = re + im;
-    peaks = greater_of(p1, greater_of(p0, peaks));  // the order leaves NaNs out
-    if constexpr (peak_sums_in_lanes) {
-      sums.add(q0, q1, q2, q3);
-    } else {
-      float powers[16];
-      store(powers, p0);
-      store(powers + 8, p1);
-      for (const float power : powers) sum += power;
+    for (std::size_t r = 0; r < square_sums::registers; r += 2) {
+      const wide q0 = square(wide::load(x + wide::lanes * r)), q1 = square(wide::load(x + wide::lanes * (r + 1)));
+      wide re, im;
+      split_in_lanes(q0, q1, re, im);
+      const wide powers = re + im;
+      peaks = greater_of(powers, peaks);  // the order leaves NaNs out
+      if constexpr (peak_sums_in_lanes) {
+        all.sums[r] = all.sums[r] + q0;
+        all.sums[r + 1] = all.sums[r + 1] + q1;
+      } else {
+        float lanes[wide::lanes];
+        store(lanes, powers);
+        for (const float power : lanes) sum += power;
+      }
     }
   }
-  if constexpr (peak_sums_in_lanes) sum = sums.total();
-  float lanes[8];
+  if constexpr (peak_sums_in_lanes) sum = all.total();
+  float lanes[wide::lanes];
   store(lanes, peaks);
   float peak = -__FLT_MAX__;
   for (const float lane : lanes)
