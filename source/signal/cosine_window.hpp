@@ -3,12 +3,16 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <complex>
 #include <cstdint>
 #include <numbers>
 #include <span>
 #include <utility>
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/weighting.hpp"
 
 namespace dsp {
 
@@ -68,13 +72,14 @@ inline void expand(const cosine_sum &window, double divisor, std::span<double> t
 
 /// Sines and cosines of j * step for j below `block`, each made from two others by at most log2(block) rotations.
 struct rotations {
-  static constexpr std::int64_t block = 512;
+  static constexpr std::int64_t block = 512, group = 8;  // kernels go by groups
   alignas(64) double cosine[block], sine[block];
 
+  /// At least `count` of them, in whole groups.
   rotations(double step, std::int64_t count) noexcept {
     cosine[0] = 1.0;
     sine[0] = 0.0;
-    for (std::int64_t half = 1; half < count; half *= 2) {
+    for (std::int64_t half = 1; half < std::max(count, group); half *= 2) {
       const double c = std::cos(step * static_cast<double>(half)), s = std::sin(step * static_cast<double>(half));
       for (std::int64_t j = 0; j < half; ++j) {
         cosine[half + j] = cosine[j] * c - sine[j] * s;
@@ -82,55 +87,45 @@ struct rotations {
       }
     }
   }
+  [[nodiscard]] qsrfhs::kernels::turned_angles turned_by(double angle) const noexcept {
+    return {cosine, sine, std::cos(angle), std::sin(angle)};
+  }
 };
 
-/// Multiplies samples by the window whose polynomial is given; n is the window's period and the number of samples. As
+inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, float *out,
+                          std::int64_t n) noexcept {
+  qsrfhs::kernels::exact().window_values(angles, polynomial.data(), polynomial.size(), out,
+                                         static_cast<std::size_t>(n));
+}
+inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, double *out,
+                          std::int64_t n) noexcept {
+  qsrfhs::kernels::exact().window_values_double(angles, polynomial.data(), polynomial.size(), out,
+                                                static_cast<std::size_t>(n));
+}
+
+/// Multiplies n samples by the window of period n that expand() made the coefficients of. Two terms or more. As
 /// w[i] = w[n - i], half of the window is computed.
-template <int terms, class T, class Real = decltype(std::real(T{}))>
-void multiply_by_polynomial(const double *coefficients, T *data, std::int64_t n) noexcept {
-  double p[terms];
-  std::copy_n(coefficients, terms, p);
-  const auto at = [&p](double u) {
-    double w = p[terms - 1];
-    for (int k = terms - 2; k >= 0; --k) w = w * u + p[k];
-    return w;
-  };
+template <class T, class Real = decltype(std::real(T{}))>
+void multiply_by(const cosine_sum &window, const double *coefficients, T *data, std::int64_t n) noexcept {
+  const std::span<const double> polynomial(coefficients, static_cast<std::size_t>(window.terms));
+  double peak = polynomial.back();  // at a squared sine of 1
+  for (std::size_t k = polynomial.size() - 1; k-- > 0;) peak = peak + polynomial[k];
+  data[0] *= static_cast<Real>(polynomial[0]);
+  if (n % 2 == 0) data[n / 2] *= static_cast<Real>(peak);
+
   const double step = std::numbers::pi / static_cast<double>(n);
   const rotations table(step, std::min(n, rotations::block));
   const std::int64_t pairs = (n - 1) / 2;
-  data[0] *= static_cast<Real>(at(0.0));
-  if (n % 2 == 0) data[n / 2] *= static_cast<Real>(at(1.0));
   for (std::int64_t first = 1; first <= pairs; first += rotations::block) {
-    // Every block starts from an angle of its own, so that errors do not add up.
-    const double angle = step * static_cast<double>(first);
-    const double c = std::cos(angle), s = std::sin(angle);
     const std::int64_t count = std::min(pairs - first + 1, rotations::block);
-    Real w[rotations::block];
-    for (std::int64_t j = 0; j < count; ++j) {
-      const double sine = s * table.cosine[j] + c * table.sine[j];
-      w[j] = static_cast<Real>(at(sine * sine));
-    }
-    T *const rising = data + first;
-    T *const falling = data + n - first;
-    for (std::int64_t j = 0; j < count; ++j) rising[j] *= w[j];
-    for (std::int64_t j = 0; j < count; ++j) falling[-j] *= w[j];
-  }
-}
-
-/// Multiplies n samples by the window of period n that expand() made the coefficients of. Two terms or more.
-template <class T>
-void multiply_by(const cosine_sum &window, const double *coefficients, T *data, std::int64_t n) noexcept {
-  switch (window.terms) {
-    case 2:
-      return multiply_by_polynomial<2>(coefficients, data, n);
-    case 3:
-      return multiply_by_polynomial<3>(coefficients, data, n);
-    case 4:
-      return multiply_by_polynomial<4>(coefficients, data, n);
-    case 5:
-      return multiply_by_polynomial<5>(coefficients, data, n);
-    default:
-      return multiply_by_polynomial<7>(coefficients, data, n);
+    const std::int64_t whole = (count + rotations::group - 1) / rotations::group * rotations::group;
+    std::array<Real, rotations::block> w, mirrored;
+    // Every block starts from an angle of its own, so that errors do not add up.
+    window_values(table.turned_by(step * static_cast<double>(first)), polynomial, w.data(), whole);
+    std::reverse_copy(w.begin(), w.begin() + count, mirrored.begin());
+    T *const rising = data + first, *const falling = data + n - first - count + 1;
+    weigh(rising, w.data(), rising, static_cast<std::size_t>(count));
+    weigh(falling, mirrored.data(), falling, static_cast<std::size_t>(count));
   }
 }
 

@@ -2,6 +2,7 @@
 #include "signal/segment_power.hpp"
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/weighting.hpp"
 
 namespace dsp {
 namespace {
@@ -13,18 +14,6 @@ const float *floats(const cf32 *x) noexcept {
 }
 float *floats(cf32 *x) noexcept {
   return reinterpret_cast<float *>(x);
-}
-
-template <class Sample, class Real>
-void apply_window(const Sample *x, const Real *w, Sample *out, std::size_t n) noexcept {
-  if constexpr (std::is_same_v<Sample, cf32>) {
-    qsrfhs::kernels::exact().apply_window(floats(x), w, floats(out), n);
-  } else if constexpr (std::is_same_v<Sample, float>) {
-    qsrfhs::kernels::exact().weigh(x, w, out, n / 2);  // pairs
-    if (n % 2 != 0) out[n - 1] = x[n - 1] * w[n - 1];
-  } else {
-    for (std::size_t k = 0; k < n; ++k) out[k] = x[k] * w[k];
-  }
 }
 
 template <class Real>
@@ -52,7 +41,7 @@ segment_power<Sample>::segment_power(std::span<const real> window)
 
 template <class Sample>
 void segment_power<Sample>::begin(const Sample *x) noexcept {
-  apply_window(x, window_.data(), work_.data(), window_.size());
+  weigh(x, window_.data(), work_.data(), window_.size());
 }
 
 template <class Sample>

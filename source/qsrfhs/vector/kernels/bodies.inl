@@ -15,6 +15,7 @@
 #include "rms.inl"
 #include "spectrum.inl"
 #include "transform.inl"
+#include "window.inl"
 
 static constexpr kernel_table table = {
     .copy = &copy,
@@ -56,4 +57,7 @@ static constexpr kernel_table table = {
     .interpolate = &interpolate,
     .interpolate_double = &interpolate_double,
     .recursion = &recursion,
+    .weigh_double = &weigh_double,
+    .window_values = &window_values,
+    .window_values_double = &window_values_double,
 };

@@ -70,6 +70,12 @@ struct block_recursion {
   const double *later;      // 4 x 4: what each of the first four samples adds to the last four outputs
 };
 
+/// Angles of a table, all turned by one.
+struct turned_angles {
+  const double *cosines, *sines;  // of the table
+  double cosine, sine;            // of the turn
+};
+
 struct kernel_table {
   /// out[k] = x[k], n complex.
   void (*copy)(const float *x, float *out, std::size_t n);
@@ -176,6 +182,15 @@ struct kernel_table {
   /// many outputs as the order, rounded up to a multiple of 4. Samples are finite: where one is not, the outputs of its
   /// block in front of it become NaN, too.
   void (*recursion)(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count);
+
+  /// out[k] = x[k] * w[k], n real.
+  void (*weigh_double)(const double *x, const double *w, double *out, std::size_t n);
+  /// out[k] = a polynomial of `terms` coefficients, that of power 0 first, at the square of the sine of angle k, computed
+  /// in double precision. n is a multiple of 8, `terms` 2, 3, 4, 5 or 7. Nothing is fused in any build.
+  void (*window_values)(const turned_angles &angles, const double *polynomial, std::size_t terms, float *out,
+                        std::size_t n);
+  void (*window_values_double)(const turned_angles &angles, const double *polynomial, std::size_t terms, double *out,
+                               std::size_t n);
 };
 
 extern const kernel_table baseline_kernels;

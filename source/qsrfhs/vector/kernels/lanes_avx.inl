@@ -233,6 +233,10 @@ static inline d4 odd_twice(d4 a) {
   return {_mm256_permute_pd(a.v, 0xf)};
 }
 
+static inline void store_narrowed(float *p, d4 a) {
+  _mm_storeu_ps(p, _mm256_cvtpd_ps(a.v));
+}
+
 /// True when all are smaller than `least`; false with a NaN.
 static inline bool all_below(d4 a, d4 least) {
   const __m256d size = _mm256_andnot_pd(_mm256_set1_pd(-0.0), a.v);

@@ -170,6 +170,9 @@ using wide_double = d8;
 static inline void store(double *p, d8 a) {
   _mm512_storeu_pd(p, a.v);
 }
+static inline void store_narrowed(float *p, d8 a) {
+  _mm256_storeu_ps(p, _mm512_cvtpd_ps(a.v));
+}
 static inline d8 operator+(d8 a, d8 b) {
   return {_mm512_add_pd(a.v, b.v)};
 }

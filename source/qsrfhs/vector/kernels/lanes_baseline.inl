@@ -241,6 +241,10 @@ static inline d4 odd_twice(d4 a) {
   return {_mm_unpackhi_pd(a.low, a.low), _mm_unpackhi_pd(a.high, a.high)};
 }
 
+static inline void store_narrowed(float *p, d4 a) {
+  _mm_storeu_ps(p, _mm_movelh_ps(_mm_cvtpd_ps(a.low), _mm_cvtpd_ps(a.high)));
+}
+
 /// True when all are smaller than `least`; false with a NaN.
 static inline bool all_below(d4 a, d4 least) {
   const __m128d sign = _mm_set1_pd(-0.0);
