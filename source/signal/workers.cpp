@@ -1,19 +1,61 @@
 // SPDX-License-Identifier: MIT
 #include "signal/workers.hpp"
 
+#include <immintrin.h>
+
 #include <algorithm>
 #include <atomic>
+#include <condition_variable>
 #include <exception>
-#include <latch>
-#include <vector>
+#include <mutex>
+#include <system_error>
 
 #include "platform/fork.hpp"
 #include "platform/immortal.hpp"
 #include "platform/processor.hpp"
-#include "qsrfhs/util/thread_pool.hpp"
+#include "platform/thread.hpp"
 
 namespace dsp {
 namespace {
+
+/// Parts that are handed out one by one, on the stack of the thread that wants them done.
+class handed_out {
+ public:
+  handed_out(std::size_t parts, part_of_work part) noexcept : parts_(parts), first_failed_(parts), part_(part) {}
+
+  void run() noexcept {
+    for (std::size_t k = next_++; k < parts_; k = next_++) {
+      try {
+        part_(k);
+      } catch (...) {
+        keep_failure(k);
+      }
+    }
+  }
+  void throw_first() const {
+    if (failure_) std::rethrow_exception(failure_);
+  }
+
+  // For the workers, under their mutex.
+  handed_out *following = nullptr;
+  std::size_t wanted = 0;              // workers that may still come
+  std::atomic<std::size_t> inside{0};  // workers that have come and not gone; read without the mutex, too
+
+ private:
+  void keep_failure(std::size_t k) noexcept {
+    const std::lock_guard lock(failure_mutex_);
+    if (k >= first_failed_) return;
+    first_failed_ = k;
+    failure_ = std::current_exception();
+  }
+
+  const std::size_t parts_;
+  std::atomic<std::size_t> next_{0};
+  std::mutex failure_mutex_;
+  std::size_t first_failed_;  // under failure_mutex_ while others are inside, as the next
+  std::exception_ptr failure_;
+  part_of_work part_;
+};
 
 class workers {
  public:
@@ -21,48 +63,91 @@ class workers {
     static platform::immortal<workers> shared;
     return shared.get();
   }
-  workers() : pool_(platform::processor_count()) {}
 
-  ctpl::thread_pool &pool() noexcept { return pool_; }
+  void share(handed_out &parts, std::size_t others) noexcept {
+    others = std::min(others, most_);
+    if (others == 0) return parts.run();
+    {
+      const std::lock_guard lock(mutex_);
+      start_missing(others);
+      parts.wanted = others;
+      *end() = &parts;
+    }
+    for (std::size_t k = 0; k < others; ++k) more_.notify_one();
+    parts.run();
+    withdraw(parts);
+  }
 
-  void before_fork() noexcept { pool_.before_fork(); }
-  void after_fork_in_parent() noexcept { pool_.after_fork_in_parent(); }
-  /// Tasks refer to the stacks of threads that are not there.
+  void before_fork() noexcept { mutex_.lock(); }
+  void after_fork_in_parent() noexcept { mutex_.unlock(); }
+  /// What is offered lies on the stacks of threads that are not there, as the workers are not.
   void after_fork_in_child() noexcept {
-    pool_.after_fork_in_child();
-    pool_.forget_tasks();
+    started_ = 0;
+    offers_ = nullptr;
+    platform::make_anew(more_);
+    platform::make_anew(left_);
+    mutex_.unlock();
   }
 
  private:
-  ctpl::thread_pool pool_;  // no thread before the first task
+  /// The place of the next offer, behind all others.
+  handed_out **end() noexcept {
+    handed_out **place = &offers_;
+    while (*place) place = &(*place)->following;
+    return place;
+  }
+
+  void start_missing(std::size_t wanted) noexcept {
+    try {
+      for (; started_ < wanted; ++started_) platform::thread(&begin, this).detach();
+    } catch (const std::system_error &) {
+      // Those that there are share the work; the next call tries again.
+    }
+  }
+
+  /// No worker comes any more; waits for those that have come.
+  void withdraw(handed_out &parts) noexcept {
+    {
+      const std::lock_guard lock(mutex_);
+      remove(parts);
+    }
+    // They are about to end: each was at its last part when no other was left.
+    constexpr int rounds = 200;
+    for (int round = 0; round < rounds && parts.inside.load(std::memory_order_relaxed) != 0; ++round) _mm_pause();
+    std::unique_lock lock(mutex_);
+    left_.wait(lock, [&] { return parts.inside.load(std::memory_order_relaxed) == 0; });
+  }
+
+  void remove(handed_out &parts) noexcept {
+    handed_out **place = &offers_;
+    while (*place && *place != &parts) place = &(*place)->following;
+    if (*place) *place = parts.following;
+  }
+
+  [[noreturn]] void serve() noexcept {
+    std::unique_lock lock(mutex_);
+    for (;;) {
+      more_.wait(lock, [this] { return offers_ != nullptr; });
+      handed_out &taken = *offers_;
+      if (--taken.wanted == 0) offers_ = taken.following;
+      taken.inside.fetch_add(1, std::memory_order_relaxed);
+      lock.unlock();
+      taken.run();
+      lock.lock();
+      if (taken.inside.fetch_sub(1, std::memory_order_relaxed) == 1) left_.notify_all();
+    }
+  }
+  static void *begin(void *own) { static_cast<workers *>(own)->serve(); }
+
+  const std::size_t most_ = static_cast<std::size_t>(platform::processor_count()) - 1;
+  std::mutex mutex_;
+  // All under mutex_.
+  std::condition_variable more_, left_;
+  handed_out *offers_ = nullptr;  // the oldest first
+  std::size_t started_ = 0;
 };
 
 const platform::fork_participant<workers> takes_part(platform::fork_rank::shared_workers);
-
-/// Parts that are handed out one by one.
-class handed_out {
- public:
-  handed_out(std::size_t count, const std::function<void(std::size_t)> &part) : part_(part), failures_(count) {}
-
-  void run() noexcept {
-    for (std::size_t k = next_++; k < failures_.size(); k = next_++) {
-      try {
-        part_(k);
-      } catch (...) {
-        failures_[k] = std::current_exception();
-      }
-    }
-  }
-  void throw_first() const {
-    for (const std::exception_ptr &failure : failures_)
-      if (failure) std::rethrow_exception(failure);
-  }
-
- private:
-  const std::function<void(std::size_t)> &part_;
-  std::atomic<std::size_t> next_ = 0;
-  std::vector<std::exception_ptr> failures_;
-};
 
 }  // namespace
 
@@ -70,22 +155,10 @@ std::size_t thread_count(std::size_t wanted) noexcept {
   return wanted != 0 ? wanted : static_cast<std::size_t>(platform::processor_count());
 }
 
-void run_parts(std::size_t parts, const std::function<void(std::size_t)> &part) {
+void run_parts(std::size_t parts, part_of_work part) {
+  if (parts == 0) return;
   handed_out all(parts, part);
-  std::ptrdiff_t queued = 0;
-  const auto most = std::max<std::ptrdiff_t>(static_cast<std::ptrdiff_t>(parts) - 1, 0);
-  std::latch running(most);
-  try {
-    for (; queued < most; ++queued)
-      workers::instance().pool().post([&](std::int32_t) {
-        all.run();
-        running.count_down();
-      });
-  } catch (const std::exception &) {
-    running.count_down(most - queued);  // those that there are share the work
-  }
-  all.run();
-  running.wait();
+  workers::instance().share(all, parts - 1);
   all.throw_first();
 }
 
