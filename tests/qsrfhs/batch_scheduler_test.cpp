@@ -90,6 +90,35 @@ TEST_F(BatchSchedulerConcurrency, RunsEveryRecordOnce) {
   EXPECT_TRUE(codes.empty());
 }
 
+std::latch *first_has_begun = nullptr;
+void meet(void *record, void *unused) {
+  switch (static_cast<task *>(record)->slot) {
+    case 0:  // by the only thread, which leaves the next to the caller
+      first_has_begun->count_down();
+      gate->wait();
+      break;
+    case 1:
+      gate->count_down();
+      break;
+    default:
+      first_has_begun->wait();
+  }
+  run(record, unused);
+}
+
+TEST_F(BatchSchedulerConcurrency, TheCallerRunsItsRecordAndHelps) {
+  batch_scheduler scheduler(mutex_, 1, &record_code);
+  std::latch opened(1), begun(1);
+  gate = &opened;
+  first_has_begun = &begun;
+  const auto tasks = make_tasks(3, 3);
+  EXPECT_EQ(0, scheduler.RunBatch(&meet, tasks.get(), 2, sizeof(task), batch_scheduler::shared_mode, &tasks[2]));
+  EXPECT_TRUE(each_ran_once(tasks.get(), 3));
+  EXPECT_NE(std::this_thread::get_id(), tasks[0].ran_on);
+  EXPECT_EQ(std::this_thread::get_id(), tasks[1].ran_on);
+  EXPECT_EQ(std::this_thread::get_id(), tasks[2].ran_on);
+}
+
 TEST_F(BatchSchedulerConcurrency, PinnedRecordsRunOnTheirThread) {
   constexpr std::uint32_t slots = 3, count = 200;  // more for a thread than its ring holds
   batch_scheduler scheduler(mutex_, slots, &record_code);
@@ -221,7 +250,9 @@ TEST_F(BatchSchedulerConcurrency, ThreadsThatCannotBeStarted) {
   const auto tasks = make_tasks(2), after = make_tasks(5);
   {
     const no_room_for_stacks here;
-    EXPECT_EQ(shared_timeout, submit(scheduler, &run, tasks.get(), 2));
+    EXPECT_EQ(shared_timeout,
+              scheduler.RunBatch(&run, tasks.get(), 1, sizeof(task), batch_scheduler::shared_mode, &tasks[1]));
+    EXPECT_EQ(0, tasks[0].runs);  // not even by the caller
     EXPECT_EQ(pinned_timeout, submit(scheduler, &run, tasks.get(), 2, batch_scheduler::pinned_mode));
   }
   EXPECT_EQ((std::vector{shared_thread_failed, shared_thread_failed, shared_thread_failed, shared_timeout,

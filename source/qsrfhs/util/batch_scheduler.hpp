@@ -40,7 +40,9 @@ class batch_scheduler {
   /// Returns 0 once all records are done. After a time-out the tasks are not cancelled: those that run go on, those
   /// that wait will still be run. Two callers must not use pinned mode at once, nor one beside a shared batch: both may
   /// hold the same batch.
-  std::int32_t RunBatch(worker work, void *records, std::uint32_t count, std::size_t record_size, std::int32_t mode);
+  /// In shared mode the caller runs a further record meanwhile, `own`, where it has one, and helps with the others.
+  std::int32_t RunBatch(worker work, void *records, std::uint32_t count, std::size_t record_size, std::int32_t mode,
+                        void *own = nullptr);
 
   /// Lets all threads leave and joins them. One that is busy for longer than a second is left alone. Records in
   /// shared mode run in their caller from then on, those in pinned mode do not run.
@@ -99,11 +101,12 @@ class batch_scheduler {
 
   class membership;
 
-  std::int32_t run_shared(worker work, void *records, std::uint32_t count, std::size_t record_size);
+  std::int32_t run_shared(worker work, void *records, std::uint32_t count, std::size_t record_size, void *own);
   std::int32_t run_pinned(worker work, void *records, std::uint32_t count, std::size_t record_size);
   bool start_team(team_kind kind);
   void fill(batch &filled, worker work, void *records, std::uint32_t count, std::size_t record_size) noexcept;
-  bool await(std::unique_lock<std::mutex> &lock, batch &awaited) const;
+  static bool await(std::unique_lock<std::mutex> &lock, batch &awaited, std::chrono::steady_clock::time_point until);
+  static void take_part(std::unique_lock<std::mutex> &lock, batch &submitted, void *own);
   batch *take_task(std::uint32_t &index, bool &more) noexcept;
   void set_work_event() noexcept;
   void serve_shared(slot &own);

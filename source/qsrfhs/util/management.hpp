@@ -21,8 +21,8 @@ class Management {
 
   /// Runs task records on the library's own threads; see batch_scheduler.
   std::int32_t RunBatch(batch_scheduler::worker work, void *records, std::uint32_t count, std::size_t record_size,
-                        std::int32_t mode) {
-    return scheduler_.RunBatch(work, records, count, record_size, mode);
+                        std::int32_t mode, void *own) {
+    return scheduler_.RunBatch(work, records, count, record_size, mode, own);
   }
 
   /// Only instance() makes one.

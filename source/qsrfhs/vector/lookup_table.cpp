@@ -1,4 +1,4 @@
-// Gains from a table, applied to samples; long inputs are shared among the library's own threads.
+// Gains from a table, applied to samples; long inputs are shared between the caller and the library's own threads.
 // SPDX-License-Identifier: MIT
 #include <lumra/status.h>
 #include <lumra/vector_utilities.h>
@@ -84,8 +84,9 @@ std::int32_t run_shared(const kernels::lookup_table &table, const float *keys, c
     const std::size_t first = i * share;
     batch->records[i] = {batch, keys + first, in + 2 * first, out + 2 * first, i + 1 == tasks ? n - first : share};
   }
-  const std::int32_t status = Management::instance().RunBatch(&run_task, batch->records, tasks, sizeof(lookup_record),
-                                                              batch_scheduler::shared_mode);
+  const std::uint32_t others = tasks - 1;
+  const std::int32_t status = Management::instance().RunBatch(&run_task, batch->records, others, sizeof(lookup_record),
+                                                              batch_scheduler::shared_mode, batch->records + others);
   drop_batch(*batch);
   return status;
 }
