@@ -4,8 +4,9 @@
  *
  * An accumulator is cut, merged and read at any time; its results have the same bits however the stream was cut into
  * calls and into objects that were merged: sums are taken in double precision over blocks of 1024 samples, whose
- * borders stand at multiples of 1024 in the stream, and the blocks' sums are added exactly. Threads: give each an
- * object and a part of the stream of its own, and merge.
+ * borders stand at multiples of 1024 in the stream, and the blocks' sums are added exactly. Nor do they depend on the
+ * number of threads: an object shares calls with 65536 samples or more among as many as its options say; or give each
+ * of your own an object and a part of the stream, and merge.
  *
  * Power statistics (CCDF): the share of samples whose power is more than some decibels above the mean. An accumulator
  * counts powers in 512 bins an octave, at most 0.0085 dB wide: its shares lie between the exact ones at thresholds
@@ -26,17 +27,20 @@ extern "C" {
 #endif
 
 /* The levels of one stretch of a stream. It takes 4 KiB of memory for every octave of power that occurs, and two
- * blocks of samples; address space for 8 MiB is reserved. */
+ * blocks of samples, and for every further thread as much again for the octaves; address space for 8 MiB a thread is
+ * reserved. */
 typedef struct lumra_level lumra_level;
 
 typedef struct lumra_level_options {
-  uint32_t size;  /* of this record in bytes */
-  int32_t type;   /* of the samples, enum lumra_type_code */
-  uint64_t start; /* position in the stream of the first sample that is added, to 2^62 */
+  uint32_t size;     /* of this record in bytes */
+  int32_t type;      /* of the samples, enum lumra_type_code */
+  uint64_t start;    /* position in the stream of the first sample that is added, to 2^62 */
+  uint32_t threads;  /* 1: the caller's alone; more: at most so many; 0: as many as pay; to 1024 */
+  uint32_t reserved; /* 0 */
 } lumra_level_options;
 
 #define LUMRA_LEVEL_OPTIONS \
-  { sizeof(lumra_level_options), LUMRA_TYPE_CF32, 0 }
+  { sizeof(lumra_level_options), LUMRA_TYPE_CF32, 0, 1, 0 }
 
 typedef struct lumra_level_result {
   uint32_t size;       /* of this record in bytes: set it before the call */
@@ -59,7 +63,7 @@ typedef struct lumra_level_result {
  * level    the object's address is written
  *
  * Returns 0, or in the order of the checks: LUMRA_NULL_ARGUMENT level; LUMRA_BAD_SIZE_FIELD options;
- * LUMRA_UNKNOWN_CHOICE type; LUMRA_OUT_OF_RANGE start. Any thread. */
+ * LUMRA_UNKNOWN_CHOICE type; LUMRA_OUT_OF_RANGE start, threads, reserved. Any thread. */
 LUMRA_EXPORT lumra_status lumra_level_create(const lumra_level_options *options, lumra_level **level);
 
 /* Adds the stream's next samples. Allocates nothing.
@@ -123,7 +127,7 @@ LUMRA_EXPORT lumra_status lumra_level_state_size(const lumra_level *level, uint6
  * LUMRA_NULL_ARGUMENT bytes. */
 LUMRA_EXPORT lumra_status lumra_level_save(const lumra_level *level, void *bytes, uint64_t room);
 
-/* Makes the accumulator that was saved.
+/* Makes the accumulator that was saved, for the caller's thread alone.
  *
  * bytes  `size` bytes that lumra_level_save wrote
  * level  the object's address is written

@@ -12,15 +12,17 @@
 
 namespace lumra {
 
-/// The levels of a stream of T from a position on; see level.h. One thread at a time.
+/// The levels of a stream of T from a position on; see level.h. One thread at a time; one that is loaded adds by the
+/// caller's alone.
 template <sample T>
 class level_meter {
  public:
-  explicit level_meter(std::uint64_t start = 0)
-      : level_(detail::make<owned>([start](lumra_level **out) {
+  explicit level_meter(std::uint64_t start = 0, std::uint32_t threads = 1)
+      : level_(detail::make<owned>([=](lumra_level **out) {
           lumra_level_options how = LUMRA_LEVEL_OPTIONS;
           how.type = detail::type_code<T>;
           how.start = start;
+          how.threads = threads;
           return lumra_level_create(&how, out);
         })) {}
 

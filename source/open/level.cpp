@@ -13,6 +13,7 @@
 #include "open/door.hpp"
 #include "open/element.hpp"
 #include "open/handle.hpp"
+#include "open/option_checks.hpp"
 #include "open/result.hpp"
 #include "open/state.hpp"
 
@@ -34,9 +35,9 @@ struct sample_of<meter<Sample>> {
   using type = Sample;
 };
 
-std::unique_ptr<any_meter> make(std::int32_t type, std::uint64_t start) {
-  return with_type(type, [start](auto element) {
-    return std::make_unique<any_meter>(std::in_place_type<meter<typename decltype(element)::value>>, start);
+std::unique_ptr<any_meter> make(std::int32_t type, std::uint64_t start, std::uint32_t threads) {
+  return with_type(type, [=](auto element) {
+    return std::make_unique<any_meter>(std::in_place_type<meter<typename decltype(element)::value>>, start, threads);
   });
 }
 
@@ -133,7 +134,7 @@ std::unique_ptr<any_meter> read(state_reader from) {
   const auto start = from.take<std::uint64_t>(), samples = from.take<std::uint64_t>();
   require(is_type(type) && reserved == 0 && start <= most_samples && samples <= most_samples - start, LUMRA_BAD_STATE,
           "the saved bytes describe no levels");
-  auto level = make(type, start);
+  auto level = make(type, start, 1);
   std::visit(
       [&](auto &m) {
         typename std::decay_t<decltype(m)>::image image{};
@@ -184,7 +185,9 @@ lumra_status lumra_level_create(const lumra_level_options *options, lumra_level 
     require_type(checked.type);
     require(checked.start <= most_samples, LUMRA_OUT_OF_RANGE, "options->start is ", checked.start,
             "; a position is at most 2^62");
-    levels::give(level, make(checked.type, checked.start));
+    require_threads(checked.threads, "options->threads");
+    require(checked.reserved == 0, LUMRA_OUT_OF_RANGE, "options->reserved is ", checked.reserved, "; it is 0");
+    levels::give(level, make(checked.type, checked.start, checked.threads));
   });
 }
 

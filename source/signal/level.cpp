@@ -2,12 +2,24 @@
 #include "signal/level.hpp"
 
 #include <algorithm>
+#include <atomic>
 #include <cmath>
 #include <limits>
 #include <numeric>
 
+#include "signal/workers.hpp"
+
 namespace dsp {
 namespace {
+
+/// Samples that are worth a second thread, which takes as long to come and to be merged as some ten thousand; and how
+/// many a thread takes at a time.
+constexpr std::size_t worth_threads = std::size_t{1} << 16, turn = std::size_t{1} << 14;
+
+/// Of the threads that are wanted, those that have a processor.
+std::size_t useful_threads(std::size_t wanted) noexcept {
+  return std::min(thread_count(wanted), thread_count(0));
+}
 
 double power_above(double power, double db) noexcept {
   return power * std::pow(10.0, db / 10);
@@ -24,7 +36,44 @@ void power_peak::take(double other, std::uint64_t at) noexcept {
 }
 
 template <class Sample>
-level_meter<Sample>::level_meter(std::uint64_t start) : start_(start), head_(level_block), tail_(level_block) {}
+run_figures level_totals::add(std::span<const Sample> x, std::uint64_t position) noexcept {
+  std::array<double, level_block> room;
+  const run_figures figures = measure_run(x.data(), x.size(), room.data());
+  const std::span<const double> each(room.data(), x.size());
+  if (std::isnan(figures.power)) {
+    powers.add(each, 0, figures.power);
+    for (std::size_t k = 0; k < each.size(); ++k) peak.take(each[k], position + k);
+    return figures;
+  }
+  powers.add(each, figures.smallest, figures.largest);
+  if (figures.largest > peak.power) {
+    const auto first = std::find(each.begin(), each.end(), figures.largest);
+    peak.take(figures.largest, position + static_cast<std::uint64_t>(first - each.begin()));
+  }
+  return figures;
+}
+
+void level_totals::add_sums(const run_figures &block) noexcept {
+  sums[0].add(block.power);
+  sums[1].add(block.dc_re);
+  sums[2].add(block.dc_im);
+}
+
+void level_totals::add(const level_totals &other) noexcept {
+  peak.take(other.peak.power, other.peak.position);
+  for (std::size_t k = 0; k < sums.size(); ++k) sums[k].add(other.sums[k]);
+  powers.add(other.powers);
+}
+
+void level_totals::clear() noexcept {
+  peak = {};
+  sums = {};
+  powers.clear();
+}
+
+template <class Sample>
+level_meter<Sample>::level_meter(std::uint64_t start, std::size_t threads)
+    : start_(start), others_(useful_threads(threads) - 1), head_(level_block), tail_(level_block) {}
 
 template <class Sample>
 std::size_t level_meter<Sample>::head_count() const noexcept {
@@ -38,71 +87,87 @@ std::size_t level_meter<Sample>::tail_count() const noexcept {
 }
 
 template <class Sample>
-void level_meter<Sample>::add_run(block_sums &sums, const run_figures &figures) noexcept {
-  sums[0].add(figures.power);
-  sums[1].add(figures.dc_re);
-  sums[2].add(figures.dc_im);
-}
-
-template <class Sample>
 void level_meter<Sample>::keep(std::span<const Sample> x, const run_figures &figures) noexcept {
   const std::size_t kept = tail_count();
   if (x.size() == level_block) {
-    add_run(sums_, figures);
+    totals_.add_sums(figures);
   } else if (start_ % level_block != 0 && samples_ < level_block - start_ % level_block) {
     std::copy(x.begin(), x.end(), head_.begin() + static_cast<std::ptrdiff_t>(samples_));
   } else {
     std::copy(x.begin(), x.end(), tail_.begin() + static_cast<std::ptrdiff_t>(kept));
     std::array<double, level_block> powers;
-    if (kept + x.size() == level_block) add_run(sums_, measure_run(tail_.data(), level_block, powers.data()));
+    if (kept + x.size() == level_block) totals_.add_sums(measure_run(tail_.data(), level_block, powers.data()));
   }
   samples_ += x.size();
 }
 
 template <class Sample>
 void level_meter<Sample>::add(std::span<const Sample> x) noexcept {
-  std::array<double, level_block> room;
+  if (!others_.empty() && x.size() >= worth_threads) {
+    const auto to_border = static_cast<std::size_t>(-(start_ + samples_) % level_block);
+    add_alone(x.first(to_border));
+    x = x.subspan(to_border);
+    const std::size_t whole = x.size() - x.size() % level_block;
+    add_shared(x.first(whole));
+    x = x.subspan(whole);
+  }
+  add_alone(x);
+}
+
+template <class Sample>
+void level_meter<Sample>::add_alone(std::span<const Sample> x) noexcept {
   while (!x.empty()) {
     const std::uint64_t position = start_ + samples_;
-    const std::size_t count = std::min<std::size_t>(x.size(), level_block - position % level_block);
-    const run_figures figures = measure_run(x.data(), count, room.data());
-    const std::span<const double> powers(room.data(), count);
-    if (std::isnan(figures.power)) {
-      powers_.add(powers, 0, figures.power);
-      for (std::size_t k = 0; k < count; ++k) peak_.take(powers[k], position + k);
-    } else {
-      powers_.add(powers, figures.smallest, figures.largest);
-      if (figures.largest > peak_.power) {
-        const auto first = std::find(powers.begin(), powers.end(), figures.largest);
-        peak_.take(figures.largest, position + static_cast<std::uint64_t>(first - powers.begin()));
-      }
-    }
-    keep(x.first(count), figures);
-    x = x.subspan(count);
+    const auto run = x.first(std::min<std::size_t>(x.size(), level_block - position % level_block));
+    keep(run, totals_.add(run, position));
+    x = x.subspan(run.size());
   }
 }
 
 template <class Sample>
+void level_meter<Sample>::add_shared(std::span<const Sample> blocks) noexcept {
+  const std::uint64_t position = start_ + samples_;
+  std::atomic<std::size_t> next{0};
+  run_parts(others_.size() + 1, [&](std::size_t part) {
+    level_totals &own = part == 0 ? totals_ : others_[part - 1];
+    for (std::size_t first = next.fetch_add(turn); first < blocks.size(); first = next.fetch_add(turn)) {
+      const std::size_t end = std::min(first + turn, blocks.size());
+      for (std::size_t k = first; k < end; k += level_block)
+        own.add_sums(own.add(blocks.subspan(k, level_block), position + k));
+    }
+  });
+  for (level_totals &other : others_) {
+    if (other.peak.power == -1) continue;  // came too late
+    totals_.add(other);
+    other.clear();
+  }
+  samples_ += blocks.size();
+}
+
+template <class Sample>
 void level_meter<Sample>::merge(const level_meter &next) noexcept {
-  // The border's block comes from what both kept; all else of `next` is in its sums.
+  // The border's block comes from what both kept; all else of `next` is in its totals.
   const std::uint64_t samples = samples_ + next.samples_;
   const std::span<const Sample> head = next.head(), tail = next.tail();
   if (!head.empty()) keep(head, {});
   samples_ = samples - tail.size();
   if (!tail.empty()) keep(tail, {});
-  for (std::size_t k = 0; k < sums_.size(); ++k) sums_[k].add(next.sums_[k]);
-  if (next.samples_ != 0) peak_.take(next.peak_.power, next.peak_.position);
-  powers_.add(next.powers_);
+  totals_.add(next.totals_);
 }
 
 template <class Sample>
 typename level_meter<Sample>::means level_meter<Sample>::mean() const noexcept {
-  block_sums sums = sums_;
+  auto [power, re, im] = totals_.sums;
   std::array<double, level_block> powers;
-  for (const auto kept : {head(), tail()})
-    if (!kept.empty()) add_run(sums, measure_run(kept.data(), kept.size(), powers.data()));
+  for (const auto kept : {head(), tail()}) {
+    if (kept.empty()) continue;
+    const run_figures figures = measure_run(kept.data(), kept.size(), powers.data());
+    power.add(figures.power);
+    re.add(figures.dc_re);
+    im.add(figures.dc_im);
+  }
   const auto count = static_cast<double>(samples_);
-  return {sums[0].value() / count, {sums[1].value() / count, sums[2].value() / count}};
+  return {power.value() / count, {re.value() / count, im.value() / count}};
 }
 
 template <class Sample>
@@ -110,23 +175,24 @@ void level_meter<Sample>::read_shares(std::span<const double> above_db, double *
   const double power = mean().power;
   for (std::size_t k = 0; k < above_db.size(); ++k) {
     const double threshold = power_above(power, above_db[k]);
-    share[k] = std::isnan(threshold) ? threshold : powers_.count_above(threshold) / static_cast<double>(samples_);
+    share[k] =
+        std::isnan(threshold) ? threshold : totals_.powers.count_above(threshold) / static_cast<double>(samples_);
   }
 }
 
 template <class Sample>
 typename level_meter<Sample>::image level_meter<Sample>::save() const noexcept {
-  return {peak_, {sums_[0].save(), sums_[1].save(), sums_[2].save()}};
+  return {totals_.peak, {totals_.sums[0].save(), totals_.sums[1].save(), totals_.sums[2].save()}};
 }
 
 template <class Sample>
 bool level_meter<Sample>::load(std::uint64_t samples, const image &saved) noexcept {
   samples_ = samples;
-  peak_ = saved.peak;
-  for (std::size_t k = 0; k < sums_.size(); ++k)
-    if (!sums_[k].load(saved.sums[k])) return false;
-  if (samples == 0) return peak_.power == -1 && peak_.position == 0;
-  return !(peak_.power < 0) && peak_.position >= start_ && peak_.position - start_ < samples;
+  const power_peak &peak = totals_.peak = saved.peak;
+  for (std::size_t k = 0; k < totals_.sums.size(); ++k)
+    if (!totals_.sums[k].load(saved.sums[k])) return false;
+  if (samples == 0) return peak.power == -1 && peak.position == 0;
+  return !(peak.power < 0) && peak.position >= start_ && peak.position - start_ < samples;
 }
 
 template <class Sample>

@@ -21,14 +21,31 @@ struct power_peak {
   void take(double other, std::uint64_t at) noexcept;
 };
 
+/// What is known of samples wherever they stand in a stream.
+class level_totals {
+ public:
+  /// Adds samples of one block from a position on, all but their sums, which are returned.
+  template <class Sample>
+  run_figures add(std::span<const Sample> x, std::uint64_t position) noexcept;
+  /// Adds the sums of a complete block.
+  void add_sums(const run_figures &block) noexcept;
+  void add(const level_totals &other) noexcept;
+  void clear() noexcept;
+
+  power_peak peak;
+  std::array<exact_sum, 3> sums;  // of complete blocks: power, I, Q
+  power_histogram powers;
+};
+
 /// Levels of samples of one type from a position on. The stream is summed block by block, whose borders are at
-/// multiples of level_block from its position 0, and the blocks' sums exactly: nothing depends on cuts and merges.
-/// Samples of incomplete blocks at both ends are kept.
+/// multiples of level_block from its position 0, and the blocks' sums exactly: nothing depends on cuts, merges and
+/// threads. Samples of incomplete blocks at both ends are kept.
 template <class Sample>
 class level_meter {
  public:
-  /// Throws std::bad_alloc, as nothing else here does but copies of the kept samples.
-  explicit level_meter(std::uint64_t start);
+  /// Uses so many threads at most; 0 for as many as pay. Throws std::bad_alloc, as nothing else here does but copies of
+  /// the kept samples.
+  level_meter(std::uint64_t start, std::size_t threads);
 
   void add(std::span<const Sample> x) noexcept;
   /// `next` begins where this one ends.
@@ -36,8 +53,8 @@ class level_meter {
 
   [[nodiscard]] std::uint64_t start() const noexcept { return start_; }
   [[nodiscard]] std::uint64_t samples() const noexcept { return samples_; }
-  [[nodiscard]] const power_peak &peak() const noexcept { return peak_; }
-  [[nodiscard]] const power_histogram &powers() const noexcept { return powers_; }
+  [[nodiscard]] const power_peak &peak() const noexcept { return totals_.peak; }
+  [[nodiscard]] const power_histogram &powers() const noexcept { return totals_.powers; }
 
   struct means {
     double power;
@@ -63,22 +80,21 @@ class level_meter {
   [[nodiscard]] bool load(std::uint64_t samples, const image &saved) noexcept;
   std::span<Sample> head() noexcept { return {head_.data(), head_count()}; }
   std::span<Sample> tail() noexcept { return {tail_.data(), tail_count()}; }
-  power_histogram &powers() noexcept { return powers_; }
+  power_histogram &powers() noexcept { return totals_.powers; }
 
  private:
-  using block_sums = std::array<exact_sum, 3>;
-
   [[nodiscard]] std::size_t head_count() const noexcept;
   [[nodiscard]] std::size_t tail_count() const noexcept;
+  void add_alone(std::span<const Sample> x) noexcept;
+  /// Adds complete blocks.
+  void add_shared(std::span<const Sample> blocks) noexcept;
   /// Adds samples of one block to the sums where they are all of it, which then have the figures, or to the kept ones.
   void keep(std::span<const Sample> x, const run_figures &figures) noexcept;
-  static void add_run(block_sums &sums, const run_figures &figures) noexcept;
 
   std::uint64_t start_, samples_ = 0;
-  power_peak peak_;
-  block_sums sums_;  // of complete blocks: power, I, Q
-  power_histogram powers_;
-  std::vector<Sample> head_, tail_;  // room for a block: samples in front of the first border, and behind the last
+  level_totals totals_;
+  std::vector<level_totals> others_;  // of the threads beside the caller's, empty between calls
+  std::vector<Sample> head_, tail_;   // room for a block: samples in front of the first border, and behind the last
 };
 
 /// The same of a record, exactly. Throws std::bad_alloc.

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include "signal/power_histogram.hpp"
 
+#include <algorithm>
 #include <bit>
 #include <cmath>
 
@@ -42,6 +43,11 @@ void power_histogram::add(const power_histogram &other) noexcept {
     const auto mine = refill(octave);
     for (std::size_t k = 0; k < bins_in_octave; ++k) mine[k] += counts[k];
   });
+}
+
+void power_histogram::clear() noexcept {
+  visit_octaves([this](std::size_t octave, auto) { std::ranges::fill(refill(octave), 0); });
+  used_.fill(false);
 }
 
 double power_histogram::count_above(double power) const noexcept {

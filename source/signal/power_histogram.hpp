@@ -22,6 +22,7 @@ class power_histogram {
   /// Powers that are not negative, all between smallest and largest; or NaN, which counts in a bin of its own.
   void add(std::span<const double> power, double smallest, double largest) noexcept;
   void add(const power_histogram &other) noexcept;
+  void clear() noexcept;
 
   /// How many lie above a power, as if those of a bin were spread evenly in it.
   [[nodiscard]] double count_above(double power) const noexcept;

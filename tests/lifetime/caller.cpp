@@ -21,6 +21,19 @@ bool is_near(float a, float b) {
   return std::abs(a - b) <= 1e-3F * (1 + std::abs(b));
 }
 
+/// The power of a long constant, by the library's own threads.
+bool has_power(const lumra_cf32 *x, double power) {
+  lumra_level_options options = LUMRA_LEVEL_OPTIONS;
+  options.threads = 2;
+  lumra_level *level = nullptr;
+  lumra_level_result result{};
+  result.size = sizeof result;
+  const bool good = lumra_level_create(&options, &level) == 0 && lumra_level_add(level, x, long_samples) == 0 &&
+                    lumra_level_read(level, &result) == 0 && result.power == power && result.peak_index == 0;
+  lumra_level_free(level);
+  return good;
+}
+
 }  // namespace
 
 shared_objects::shared_objects() {
@@ -224,7 +237,7 @@ bool caller::lookup_and_errors() {
   return qsrfhs_getErrorCnt(&before) == 0 && qsUtilHS_FreeArray_CSG(nullptr) == -33620097 &&
          qsrfhs_getErrorCnt(&after) == 0 && after > before &&
          qsUtilHS_LookupTable(keys_, long_in_, &long_out_, table_, 0, 1) == 0 && (*long_out_)->elements[0].im == 6 &&
-         (*long_out_)->elements[long_samples - 1].re == 3;
+         (*long_out_)->elements[long_samples - 1].re == 3 && has_power((*long_in_)->elements, 5);
 }
 
 }  // namespace lifetime

@@ -18,8 +18,8 @@ def noise(n, dtype):
     return x.astype(dtype)
 
 
-def level_of(kind, x=(), start=0):
-    level = lumra.create("level", type=lumra.constants[f"LUMRA_TYPE_{kind}"], start=start)
+def level_of(kind, x=(), start=0, threads=1):
+    level = lumra.create("level", type=lumra.constants[f"LUMRA_TYPE_{kind}"], start=start, threads=threads)
     lumra.call("level_add", level, x if len(x) else None, len(x))
     return level
 
@@ -116,6 +116,16 @@ class Level(lumra.Test):
                 for _ in range(8):
                     self.assertEqual(expected, all_of(tree(kind, x, start)), (kind, start, len(x)))
 
+    def test_same_bits_for_any_number_of_threads(self):
+        for kind, dtype in TYPES.items():
+            x = noise(300_001, dtype)
+            x[70_000] = x[250_000] = 100  # the peak, twice
+            for nan in (False, True):
+                x[200_000 if nan else 0] *= np.nan if nan else 1
+                alone, *shared = (level_of(kind, x, 700, threads) for threads in (1, 2, 0))
+                for level in shared:
+                    self.assertEqual(all_of(alone), all_of(level), (kind, nan))
+
     def test_order_does_not_matter_where_sums_cancel(self):
         x = np.repeat([1e150, 1.0, -1e150, 1e-3, 1e100, -1e100], 1024)
         level = level_of("F64", x)
@@ -145,6 +155,8 @@ class Level(lumra.Test):
             ("BAD_SIZE_FIELD", "options->size is 4", "level_create", lumra.record("level", size=4), out),
             ("UNKNOWN_CHOICE", "options->type is 8", "level_create", lumra.record("level", type=8), out),
             ("OUT_OF_RANGE", "options->start is", "level_create", lumra.record("level", start=2**62 + 1), out),
+            ("OUT_OF_RANGE", "options->threads is 1025", "level_create", lumra.record("level", threads=1025), out),
+            ("OUT_OF_RANGE", "options->reserved is 1", "level_create", lumra.record("level", reserved=1), out),
             ("WRONG_OBJECT", "level was freed", "level_add", x, x, 8),
             ("OUT_OF_RANGE", "count of x", "level_add", level, x, 2**62),
             ("NULL_ARGUMENT", "x is null", "level_add", level, None, 8),
