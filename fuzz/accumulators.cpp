@@ -202,7 +202,8 @@ void create(bench &b) {
     }
     case level: {
       lumra_level *made = nullptr;
-      const record<lumra_level_options> how(in, {sizeof(lumra_level_options), type, position(b)}, LUMRA_LEVEL_OPTIONS);
+      const record<lumra_level_options> how(in, {sizeof(lumra_level_options), type, position(b), in.choice(3), 0},
+                                            LUMRA_LEVEL_OPTIONS);
       const auto code = lumra_level_create(how.address, nowhere ? nullptr : &made);
       return finish(level, made, how.meant.type, code);
     }
@@ -301,7 +302,8 @@ void compare(bench &b) {
     if (how.meant.type != type) return;
     return with.check(lumra_evm_errors(how.address, x, y, n, error, magnitude, phase));
   }
-  const record<lumra_evm_options> how(in, {sizeof(lumra_evm_options), in.choice(17), near(in, 1)}, LUMRA_EVM_OPTIONS);
+  const record<lumra_evm_options> how(in, {sizeof(lumra_evm_options), in.choice(17), near(in, 1), in.choice(3), 0},
+                                      LUMRA_EVM_OPTIONS);
   lumra_evm_result result{};
   result.size = sizeof result;
   with.check(type == LUMRA_TYPE_CF32

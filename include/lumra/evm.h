@@ -59,10 +59,12 @@ typedef struct lumra_evm_options {
   uint32_t size;         /* of this record in bytes */
   uint32_t align;        /* sum of enum lumra_align */
   double sample_rate_hz; /* above 0; in which the frequency is told */
+  uint32_t threads;      /* 1: the caller's alone; more: at most so many; 0: as many as pay; to 1024 */
+  uint32_t reserved;     /* 0 */
 } lumra_evm_options;
 
 #define LUMRA_EVM_OPTIONS \
-  { sizeof(lumra_evm_options), LUMRA_ALIGN_NONE, 1.0 }
+  { sizeof(lumra_evm_options), LUMRA_ALIGN_NONE, 1.0, 1, 0 }
 
 typedef struct lumra_evm_result {
   uint32_t size;        /* of this record in bytes: set it before the call */
@@ -95,10 +97,12 @@ typedef struct lumra_evm_result {
  *            are not compared, and lie apart from each other and from the inputs
  *
  * n is at least 1, and at least 64 where delay or frequency is asked for. NaN and infinity spoil the results, or are
- * refused as unrelated.
+ * refused as unrelated. The results have the same bits for any number of threads, which share what is compared once the
+ * search is over: records of more than 16384 samples without delay and frequency, of more than 262144 with them, where
+ * each thread takes 20 MB.
  *
  * Return 0, or in the order of the checks: LUMRA_BAD_SIZE_FIELD options; LUMRA_UNKNOWN_CHOICE align; LUMRA_OUT_OF_RANGE
- * sample_rate_hz, n; LUMRA_NULL_ARGUMENT reference, measured; LUMRA_NULL_ARGUMENT, LUMRA_BAD_SIZE_FIELD result;
+ * sample_rate_hz, threads, reserved, n; LUMRA_NULL_ARGUMENT reference, measured; LUMRA_NULL_ARGUMENT, LUMRA_BAD_SIZE_FIELD result;
  * LUMRA_OVERLAP; LUMRA_TOO_FEW_SAMPLES; LUMRA_OUT_OF_RANGE a reference of zeros; LUMRA_NO_CONVERGENCE where gain, delay
  * or frequency is asked for and the recordings seem unrelated (the best alignment leaves errors of ten times the
  * reference, or no less than unrelated noise of this length would), or where what is asked for cannot be told from each

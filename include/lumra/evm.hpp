@@ -36,8 +36,8 @@ struct error_traces {
 /// Compares measured samples with a reference as long; see evm.h.
 template <sample T>
 lumra_evm_result measure_evm(std::span<const T> reference, std::type_identity_t<std::span<const T>> measured,
-                             align wanted = align::none, double sample_rate_hz = 1,
-                             const error_traces<T> &traces = {}) requires(!std::is_same_v<T, real_type<T>>) {
+                             align wanted = align::none, double sample_rate_hz = 1, const error_traces<T> &traces = {},
+                             std::uint32_t threads = 1) requires(!std::is_same_v<T, real_type<T>>) {
   constexpr auto run = detail::form<T>(0, 0, &lumra_evm_measure_cf32, &lumra_evm_measure_cf64);
   detail::require_length(measured.size(), reference.size());
   for (const std::size_t length : {traces.error.size(), traces.magnitude.size(), traces.phase.size()})
@@ -45,6 +45,7 @@ lumra_evm_result measure_evm(std::span<const T> reference, std::type_identity_t<
   lumra_evm_options how = LUMRA_EVM_OPTIONS;
   how.align = static_cast<std::uint32_t>(wanted);
   how.sample_rate_hz = sample_rate_hz;
+  how.threads = threads;
   lumra_evm_result result{};
   result.size = sizeof result;
   check_open(run(detail::raw(reference.data()), detail::raw(measured.data()), reference.size(), &how, &result,

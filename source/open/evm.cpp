@@ -18,6 +18,8 @@ lumra_evm_options checked_options(const lumra_evm_options *given) {
   const auto options = read_options(given, lumra_evm_options LUMRA_EVM_OPTIONS);
   (void)checked_alignment(options.align);
   require_rate(options.sample_rate_hz, "options->sample_rate_hz");
+  require_threads(options.threads, "options->threads");
+  require(options.reserved == 0, LUMRA_OUT_OF_RANGE, "options->reserved is ", options.reserved, "; it is 0");
   return options;
 }
 
@@ -35,7 +37,8 @@ lumra_status measure(const char *function, const Complex *reference, const Compl
     const std::uint64_t least = wanted.searched() ? least_for_search : 1;
     require(n >= least, LUMRA_TOO_FEW_SAMPLES, "n is ", n, "; this alignment takes ", least, " samples or more");
     dsp::error_figures figures;
-    require_measured(dsp::measure_errors<Real>(from, to, wanted, {samples(error), magnitude, phase}, figures));
+    require_measured(
+        dsp::measure_errors<Real>(from, to, wanted, options.threads, {samples(error), magnitude, phase}, figures));
     give_result(result, result_of(figures, options.sample_rate_hz));
   });
 }

@@ -3,11 +3,14 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <cmath>
 #include <limits>
+#include <vector>
 
 #include "qsrfhs/math/mkl_runtime.hpp"
 #include "signal/rotation.hpp"
+#include "signal/workers.hpp"
 
 namespace dsp {
 namespace {
@@ -32,6 +35,28 @@ void walk_carried(delayed_reference<Sample> &reference, const stretch &part, con
   });
 }
 
+/// sum(part) of the pieces of a stretch. The sums stand in the order of the pieces, which lie at fixed places: added like
+/// that, they have the same bits for any number of threads.
+template <class Sum>
+auto sum_pieces(const stretch &all, std::size_t piece, std::size_t threads, Sum sum) {
+  std::vector<decltype(sum(all))> sums((all.count() + piece - 1) / piece);
+  std::atomic<std::size_t> next{0};
+  run_parts(std::min(threads, sums.size()), [&](std::size_t) {
+    const qsrfhs::mkl_runtime::use in_use;
+    for (std::size_t k = next++; k < sums.size(); k = next++) {
+      const std::size_t first = all.first + k * piece;
+      sums[k] = sum(stretch{first, std::min(first + piece, all.last)});
+    }
+  });
+  return sums;
+}
+
+/// Samples of a piece of what is compared: a delayed reference is there as a whole.
+std::size_t piece_of(const stretch &compared, const alignment &wanted) noexcept {
+  constexpr std::size_t usual = 16384;
+  return wanted.searched() ? std::max<std::size_t>(compared.count(), 1) : usual;
+}
+
 template <class Real>
 void fill_ends(const error_traces<Real> &traces, std::size_t n, const stretch &compared) noexcept {
   constexpr Real nan = std::numeric_limits<Real>::quiet_NaN();
@@ -47,12 +72,18 @@ void fill_ends(const error_traces<Real> &traces, std::size_t n, const stretch &c
 
 template <class Real>
 void measure_model(delayed_reference<std::complex<Real>> &delayed, std::span<const std::complex<Real>> measured,
-                   const stretch &compared, const error_traces<Real> &traces, error_figures &figures) {
+                   const stretch &compared, std::size_t piece, std::size_t threads, const error_traces<Real> &traces,
+                   error_figures &figures) {
   const double scale = 1 / figures.reference_rms;
-  error_sums sums;
-  walk_carried(delayed, compared, figures.model, [&](std::size_t first, std::span<const wide> carried) {
-    sums.add(carried, measured.data() + first, figures.model, first, scale, traces.from(first));
+  const auto pieces = sum_pieces(compared, piece, threads, [&](const stretch &part) {
+    error_sums own;
+    walk_carried(delayed, part, figures.model, [&](std::size_t first, std::span<const wide> carried) {
+      own.add(carried, measured.data() + first, figures.model, first, scale, traces.from(first));
+    });
+    return own;
   });
+  error_sums sums;
+  for (const error_sums &own : pieces) sums.add(own);
   const auto count = static_cast<double>(compared.count());
   figures.peak = sums.peak;
   figures.rms = std::sqrt(sums.error / count);
@@ -64,7 +95,8 @@ void measure_model(delayed_reference<std::complex<Real>> &delayed, std::span<con
 /// Records that delayed_reference takes as a whole, and those that need no search.
 template <class Real>
 error_outcome measure_whole(std::span<const std::complex<Real>> reference, std::span<const std::complex<Real>> measured,
-                            const alignment &wanted, const error_traces<Real> &traces, error_figures &figures) {
+                            const alignment &wanted, std::size_t threads, const error_traces<Real> &traces,
+                            error_figures &figures) {
   delayed_reference<std::complex<Real>> delayed(reference);
   if (wanted.searched()) {
     const alignment_outcome outcome = find_delay_and_frequency(reference, measured, wanted, delayed, figures.model);
@@ -73,24 +105,23 @@ error_outcome measure_whole(std::span<const std::complex<Real>> reference, std::
   }
   const stretch compared = wanted.delay ? delayed.known(figures.model.delay) : stretch{0, reference.size()};
   figures.compared = {compared.first, compared.last};
-  stream_moments all;
-  walk_carried(delayed, compared, figures.model, [&](std::size_t first, std::span<const wide> carried) {
-    all.add(carried, {}, measured.data() + first, static_cast<double>(first));
+  const std::size_t piece = piece_of(compared, wanted);
+  const auto pieces = sum_pieces(compared, piece, threads, [&](const stretch &part) {
+    stream_moments own;
+    walk_carried(delayed, part, figures.model, [&](std::size_t first, std::span<const wide> carried) {
+      own.add(carried, {}, measured.data() + first, static_cast<double>(first));
+    });
+    return own;
   });
+  stream_moments all;
+  for (const stream_moments &own : pieces) all.add(own);
   const auto count = static_cast<double>(compared.count());
   figures.reference_rms = std::sqrt(all.reference / count);
   model_change change;
   const error_outcome outcome =
       fit_model(all, count, {wanted.gain, false, false, wanted.dc}, wanted.searched(), figures.model, change);
-  if (outcome == error_outcome::measured) measure_model(delayed, measured, compared, traces, figures);
+  if (outcome == error_outcome::measured) measure_model(delayed, measured, compared, piece, threads, traces, figures);
   return outcome;
-}
-
-/// Calls visit(block) over all blocks of a record.
-template <class Visit>
-void walk_blocks(const positions &record, Visit visit) {
-  for (std::uint64_t k = record.first / error_block::length; k * error_block::length < record.last; ++k)
-    visit(error_block(k, record));
 }
 
 /// A part of n samples that is as long as it may be, with this one in its middle.
@@ -108,13 +139,14 @@ class long_record {
  public:
   using samples = std::span<const std::complex<Real>>;
 
-  long_record(samples reference, samples measured, const alignment &wanted) noexcept
-      : reference_(reference), measured_(measured), wanted_(wanted) {}
+  long_record(samples reference, samples measured, const alignment &wanted, std::size_t threads) noexcept
+      : reference_(reference), measured_(measured), wanted_(wanted), threads_(threads) {}
 
   error_outcome align(stream_model &model) const {
     positions part = loudest();
     error_figures begun;
-    const error_outcome found = measure_whole<Real>(of(reference_, part), of(measured_, part), wanted_, {}, begun);
+    const error_outcome found =
+        measure_whole<Real>(of(reference_, part), of(measured_, part), wanted_, threads_, {}, begun);
     if (found != error_outcome::measured) return found;
     model.delay = begun.model.delay;
     model.frequency = begun.model.frequency;
@@ -167,32 +199,40 @@ class long_record {
 
   [[nodiscard]] error_totals sum(const positions &part, const stream_model &model, bool with_slopes,
                                  const error_traces<Real> &traces = {}) const {
-    error_totals totals;
-    block_comparison<Real> comparison(model, with_slopes);
-    walk_blocks(part, [&](const error_block &block) {
-      totals.add(comparison.compare(of(reference_, block.around), of(measured_, block.around), block.around.first,
-                                    block.part(), traces.from(block.around.first)));
+    const std::uint64_t begin = part.first / error_block::length;
+    const std::uint64_t blocks = (part.last + error_block::length - 1) / error_block::length - begin;
+    std::vector<error_totals> totals(std::min<std::uint64_t>(threads_, blocks));
+    std::atomic<std::uint64_t> next{0};
+    run_parts(totals.size(), [&](std::size_t thread) {
+      block_comparison<Real> comparison(model, with_slopes);
+      for (std::uint64_t k = next++; k < blocks; k = next++) {
+        const error_block block(begin + k, part);
+        totals[thread].add(comparison.compare(of(reference_, block.around), of(measured_, block.around),
+                                              block.around.first, block.part(), traces.from(block.around.first)));
+      }
     });
-    return totals;
+    for (std::size_t thread = 1; thread < totals.size(); ++thread) totals.front().add(totals[thread]);
+    return totals.front();
   }
 
   samples reference_, measured_;
   const alignment &wanted_;
+  std::size_t threads_;
 };
 
 }  // namespace
 
 template <class Real>
 error_outcome measure_errors(std::span<const std::complex<Real>> reference,
-                             std::span<const std::complex<Real>> measured, const alignment &wanted,
+                             std::span<const std::complex<Real>> measured, const alignment &wanted, std::size_t threads,
                              const error_traces<Real> &traces, error_figures &figures) {
   using sample = std::complex<Real>;
   if (std::all_of(reference.begin(), reference.end(), [](const sample &v) { return v == Real(0); }))
     return error_outcome::silent_reference;
   const qsrfhs::mkl_runtime::use in_use;
   if (!wanted.searched() || reference.size() <= delayed_reference<sample>::longest)
-    return measure_whole(reference, measured, wanted, traces, figures);
-  const long_record<Real> record(reference, measured, wanted);
+    return measure_whole(reference, measured, wanted, thread_count(threads), traces, figures);
+  const long_record<Real> record(reference, measured, wanted, thread_count(threads));
   stream_model model;
   const error_outcome outcome = record.align(model);
   return outcome == error_outcome::measured ? record.measure(model, traces, figures) : outcome;
@@ -211,7 +251,7 @@ void trace_errors(std::span<const std::complex<Real>> reference, std::span<const
 
 #define INSTANCES(REAL)                                                                                               \
   template error_outcome measure_errors(std::span<const std::complex<REAL>>, std::span<const std::complex<REAL>>,     \
-                                        const alignment &, const error_traces<REAL> &, error_figures &);              \
+                                        const alignment &, std::size_t, const error_traces<REAL> &, error_figures &); \
   template void trace_errors(std::span<const std::complex<REAL>>, std::span<const std::complex<REAL>>, std::uint64_t, \
                              const stream_model &, const error_traces<REAL> &);
 INSTANCES(float)

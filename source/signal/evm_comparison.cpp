@@ -67,6 +67,13 @@ void error_sums::add(std::span<const wide> carried, const std::complex<Real> *me
     for (std::size_t k = 0; k < count; ++k) traces.phase[k] = static_cast<Real>(angles[k]);
 }
 
+void error_sums::add(const error_sums &next) noexcept {
+  error += next.error;
+  magnitude += next.magnitude;
+  phase += next.phase;
+  peak.take(next.peak.power, next.peak.position);
+}
+
 template <class Real>
 block_sums block_comparison<Real>::compare(std::span<const sample> reference, std::span<const sample> measured,
                                            std::uint64_t position, const stretch &part,

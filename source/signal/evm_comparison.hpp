@@ -35,6 +35,9 @@ struct error_sums {
   void add(std::span<const std::complex<double>> carried, const std::complex<Real> *measured, const stream_model &model,
            std::uint64_t position, double scale, const error_traces<Real> &traces) noexcept;
 
+  /// Adds those of samples behind these.
+  void add(const error_sums &next) noexcept;
+
   static constexpr std::size_t longest_run = 512;
 };
 

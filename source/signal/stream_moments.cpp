@@ -110,6 +110,13 @@ void stream_moments::add(std::span<const wide> carried, std::span<const wide> sl
   *this = std::bit_cast<stream_moments>(all);
 }
 
+void stream_moments::add(const stream_moments &other) noexcept {
+  auto sums = std::bit_cast<numbers>(*this);
+  const auto added = std::bit_cast<numbers>(other);
+  for (std::size_t k = 0; k < sums.size(); ++k) sums[k] += added[k];
+  *this = std::bit_cast<stream_moments>(sums);
+}
+
 stream_moments stream_moments::later(double earlier) const noexcept {
   stream_moments moved = *this;
   moved.timed_twice += earlier * (2 * timed + earlier * reference);

@@ -29,6 +29,7 @@ struct stream_moments {
   template <class Sample>
   void add(std::span<const std::complex<double>> carried, std::span<const std::complex<double>> slopes,
            const Sample *measured_samples, double t) noexcept;
+  void add(const stream_moments &other) noexcept;
   /// Of the same samples where times are counted from `earlier` before.
   [[nodiscard]] stream_moments later(double earlier) const noexcept;
 };

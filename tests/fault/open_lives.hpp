@@ -262,8 +262,8 @@ inline const named_life open_lives[] = {
                                     1049);
       },
       [](open_life &l) {
-        const lumra_evm_options options{sizeof options, LUMRA_ALIGN_GAIN | LUMRA_ALIGN_DELAY | LUMRA_ALIGN_FREQUENCY,
-                                        1};
+        const lumra_evm_options options{sizeof options, LUMRA_ALIGN_GAIN | LUMRA_ALIGN_DELAY | LUMRA_ALIGN_FREQUENCY, 1,
+                                        2, 0};
         lumra_evm_result result{};
         result.size = sizeof result;
         const lumra_status code =

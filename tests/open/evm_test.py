@@ -43,11 +43,11 @@ def carried(x, gain, frequency, dc, snr_db):
     return gain * (x * np.exp(2j * np.pi * frequency * np.arange(n)) + level * noise(n)) + dc
 
 
-def measure(reference, measured, align=0, kind="cf64", rate=1.0, traces=(None, None, None)):
+def measure(reference, measured, align=0, kind="cf64", rate=1.0, traces=(None, None, None), threads=1):
     result = lumra.record("evm_result")
     result.size = ctypes.sizeof(result)
     reference, measured = (lumra.odd(np.asarray(x, TYPES[kind][0])) for x in (reference, measured))
-    options = lumra.record("evm", align=align, sample_rate_hz=rate)
+    options = lumra.record("evm", align=align, sample_rate_hz=rate, threads=threads)
     lumra.call(f"evm_measure_{kind}", reference, measured, len(reference), options, result, *traces)
     return result
 
@@ -200,6 +200,14 @@ class Evm(lumra.Test):
                     np.testing.assert_array_equal(np.isnan(expected), np.isnan(mine))
                     self.close(np.nan_to_num(expected), np.nan_to_num(mine) / (1 if k == 2 else whole.reference_rms), TYPES[kind][2])
 
+    def test_same_bits_for_any_number_of_threads(self):
+        for align, n in ((GAIN | DC, 70_001), (GAIN | DELAY, 600_000)):
+            x, y, results = white(n, 0), carried(white(n, 0.3 if align & DELAY else 0), 0.5 + 0.1j, 0, 0.01, 30), []
+            for threads in (1, 2, 0):
+                traces = np.empty(n, complex), np.empty(n), np.empty(n)
+                results.append((bytes(measure(x, y, align, traces=traces, threads=threads)), *(t.tobytes() for t in traces)))
+            self.assertTrue(results[0] == results[1] == results[2], align)
+
     def test_same_bits_for_any_tree(self):
         reference, measured = noise(500_000), noise(500_000)
         reference[5] = measured[400_000] = 100
@@ -283,6 +291,8 @@ class Evm(lumra.Test):
             ("UNKNOWN_CHOICE", "options->align is 16", r, y, n, options(16), result, None, None, None),
             ("OUT_OF_RANGE", "sample_rate_hz is nan", r, y, n, options(0, sample_rate_hz=np.nan), result, None, None, None),
             ("OUT_OF_RANGE", "sample_rate_hz is 0", r, y, n, options(0, sample_rate_hz=0), result, None, None, None),
+            ("OUT_OF_RANGE", "options->threads is 1025", r, y, n, options(0, threads=1025), result, None, None, None),
+            ("OUT_OF_RANGE", "options->reserved is 1", r, y, n, options(0, reserved=1), result, None, None, None),
             ("OUT_OF_RANGE", "count of reference", r, y, 2**62, None, result, None, None, None),
             ("NULL_ARGUMENT", "measured is null", r, None, n, None, result, None, None, None),
             ("NULL_ARGUMENT", "result is null", r, y, n, None, None, None, None, None),
