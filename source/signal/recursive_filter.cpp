@@ -3,8 +3,7 @@
 
 #include <algorithm>
 #include <cmath>
-#include <numeric>
-#include <type_traits>
+#include <complex>
 #include <utility>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
@@ -62,43 +61,33 @@ void fill_plan(const recursion_coefficients &stage, double *memory) {
   }
 }
 
-template <class Sample>
-inline constexpr std::size_t streams_of = std::is_floating_point_v<Sample> ? 1 : 2;
+using planes = std::array<double *, 2>;
 
-template <class Sample>
-void split(const Sample *in, std::size_t n, const std::array<double *, 2> &planes) noexcept {
-  if constexpr (streams_of<Sample> == 1) {
-    std::copy_n(in, n, planes[0]);
-  } else {
-    double *const re = planes[0], *const im = planes[1];
-    for (std::size_t k = 0; k < n; ++k) {
-      re[k] = in[k].real();
-      im[k] = in[k].imag();
-    }
-  }
+// Samples to their real and imaginary parts in double precision, and back.
+
+void split(const float *in, std::size_t n, const planes &to) noexcept {
+  qsrfhs::kernels::exact().widen(in, to[0], n);
 }
-
-template <class Sample>
-void join(const std::array<double *, 2> &planes, std::size_t n, Sample *out) noexcept {
-  if constexpr (streams_of<Sample> == 1) {
-    for (std::size_t k = 0; k < n; ++k) out[k] = static_cast<Sample>(planes[0][k]);
-  } else {
-    using real = typename Sample::value_type;
-    const double *const re = planes[0], *const im = planes[1];
-    for (std::size_t k = 0; k < n; ++k) out[k] = {static_cast<real>(re[k]), static_cast<real>(im[k])};
-  }
+void split(const double *in, std::size_t n, const planes &to) noexcept {
+  std::copy_n(in, n, to[0]);
 }
-
-/// 0 times a value that is not finite is not 0. Sums that do not wait for each other, without an early end, so that the
-/// loop is vectorised.
-bool is_finite(const double *x, std::size_t n) noexcept {
-  constexpr std::size_t width = 8;
-  std::array<double, width> sums{};
-  const std::size_t whole = n / width * width;
-  for (std::size_t k = 0; k < whole; k += width)
-    for (std::size_t i = 0; i < width; ++i) sums[i] += 0 * x[k + i];
-  for (std::size_t k = whole; k < n; ++k) sums[0] += 0 * x[k];
-  return std::accumulate(sums.begin(), sums.end(), 0.0) == 0;
+void split(const std::complex<float> *in, std::size_t n, const planes &to) noexcept {
+  qsrfhs::kernels::exact().split(reinterpret_cast<const float *>(in), to[0], to[1], n);
+}
+void split(const std::complex<double> *in, std::size_t n, const planes &to) noexcept {
+  qsrfhs::kernels::exact().split_double(reinterpret_cast<const double *>(in), to[0], to[1], n);
+}
+void join(const planes &from, std::size_t n, float *out) noexcept {
+  qsrfhs::kernels::exact().narrow(from[0], out, n);
+}
+void join(const planes &from, std::size_t n, double *out) noexcept {
+  std::copy_n(from[0], n, out);
+}
+void join(const planes &from, std::size_t n, std::complex<float> *out) noexcept {
+  qsrfhs::kernels::exact().join_planes(from[0], from[1], reinterpret_cast<float *>(out), n);
+}
+void join(const planes &from, std::size_t n, std::complex<double> *out) noexcept {
+  qsrfhs::kernels::exact().join_planes_double(from[0], from[1], reinterpret_cast<double *>(out), n);
 }
 
 /// The newest of a history and of what came behind it.
@@ -238,7 +227,8 @@ void recursive_filter::run_stage(const stage_view &stage, const planes &in, cons
     std::fill_n(y + whole + left, left > 0 ? block - left : 0, 0.0);
     std::copy_n(stage.outputs(s), width, y - width);
   }
-  const bool finite = is_finite(out[0], whole + left) && (streams_ == 1 || is_finite(out[1], whole + left));
+  const bool finite =
+      kernels.is_finite(out[0], whole + left) && (streams_ == 1 || kernels.is_finite(out[1], whole + left));
   const block_recursion plan = plan_at(c, stage.plan);
   const std::size_t blocks = (whole + left + block - 1) / block;
   if (finite) {

@@ -8,6 +8,7 @@
 #include "interpolation.inl"
 #include "log2.inl"
 #include "lookup.inl"
+#include "planes.inl"
 #include "polynomial.inl"
 #include "polyphase.inl"
 #include "recursion.inl"
@@ -57,6 +58,13 @@ static constexpr kernel_table table = {
     .interpolate = &interpolate,
     .interpolate_double = &interpolate_double,
     .recursion = &recursion,
+    .widen = &widen,
+    .narrow = &narrow,
+    .split = &split,
+    .split_double = &split_double,
+    .join_planes = &join_planes,
+    .join_planes_double = &join_planes_double,
+    .is_finite = &is_finite,
     .weigh_double = &weigh_double,
     .window_values = &window_values,
     .window_values_double = &window_values_double,

@@ -183,6 +183,16 @@ struct kernel_table {
   /// block in front of it become NaN, too.
   void (*recursion)(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count);
 
+  // Between samples and planes of doubles, which are apart from them; n real for the first two, n complex.
+  void (*widen)(const float *x, double *out, std::size_t n);
+  void (*narrow)(const double *x, float *out, std::size_t n);
+  void (*split)(const float *x, double *re, double *im, std::size_t n);
+  void (*split_double)(const double *x, double *re, double *im, std::size_t n);
+  void (*join_planes)(const double *re, const double *im, float *out, std::size_t n);
+  void (*join_planes_double)(const double *re, const double *im, double *out, std::size_t n);
+  /// Whether none of n real is an infinity or a NaN.
+  bool (*is_finite)(const double *x, std::size_t n);
+
   /// out[k] = x[k] * w[k], n real.
   void (*weigh_double)(const double *x, const double *w, double *out, std::size_t n);
   /// out[k] = a polynomial of `terms` coefficients, that of power 0 first, at the square of the sine of angle k, computed

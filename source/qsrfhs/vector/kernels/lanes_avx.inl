@@ -207,6 +207,8 @@ static inline f8 subtract_and_add(f8 a, f8 b) {
 struct d4 {
   static constexpr std::size_t lanes = 4;
   __m256d v;
+  /// Floats, widened.
+  static inline d4 load(const float *p) { return {_mm256_cvtps_pd(_mm_loadu_ps(p))}; }
   static inline d4 load(const double *p) { return {_mm256_loadu_pd(p)}; }
   static inline d4 broadcast(double a) { return {_mm256_set1_pd(a)}; }
 };
@@ -233,7 +235,20 @@ static inline d4 odd_twice(d4 a) {
   return {_mm256_permute_pd(a.v, 0xf)};
 }
 
-static inline void store_narrowed(float *p, d4 a) {
+/// Four complex values to real and imaginary parts in their order.
+static inline void split_pairs(d4 a, d4 b, d4 &re, d4 &im) {
+  const __m256d low = _mm256_permute2f128_pd(a.v, b.v, 0x20), high = _mm256_permute2f128_pd(a.v, b.v, 0x31);
+  re = {_mm256_unpacklo_pd(low, high)};
+  im = {_mm256_unpackhi_pd(low, high)};
+}
+/// Takes split_pairs back.
+static inline void join_pairs(d4 re, d4 im, d4 &a, d4 &b) {
+  const __m256d low = _mm256_unpacklo_pd(re.v, im.v), high = _mm256_unpackhi_pd(re.v, im.v);
+  a = {_mm256_permute2f128_pd(low, high, 0x20)};
+  b = {_mm256_permute2f128_pd(low, high, 0x31)};
+}
+/// Rounded to floats.
+static inline void store(float *p, d4 a) {
   _mm_storeu_ps(p, _mm256_cvtpd_ps(a.v));
 }
 

@@ -161,6 +161,8 @@ static inline f16 multiply_in_double(f16 a, double factor) {
 struct d8 {
   static constexpr std::size_t lanes = 8;
   __m512d v;
+  /// Floats, widened.
+  static inline d8 load(const float *p) { return {_mm512_cvtps_pd(_mm256_loadu_ps(p))}; }
   static inline d8 load(const double *p) { return {_mm512_loadu_pd(p)}; }
   static inline d8 broadcast(double a) { return {_mm512_set1_pd(a)}; }
 };
@@ -170,7 +172,18 @@ using wide_double = d8;
 static inline void store(double *p, d8 a) {
   _mm512_storeu_pd(p, a.v);
 }
-static inline void store_narrowed(float *p, d8 a) {
+/// Eight complex values to real and imaginary parts in their order.
+static inline void split_pairs(d8 a, d8 b, d8 &re, d8 &im) {
+  re = {_mm512_permutex2var_pd(a.v, _mm512_setr_epi64(0, 2, 4, 6, 8, 10, 12, 14), b.v)};
+  im = {_mm512_permutex2var_pd(a.v, _mm512_setr_epi64(1, 3, 5, 7, 9, 11, 13, 15), b.v)};
+}
+/// Takes split_pairs back.
+static inline void join_pairs(d8 re, d8 im, d8 &a, d8 &b) {
+  a = {_mm512_permutex2var_pd(re.v, _mm512_setr_epi64(0, 8, 1, 9, 2, 10, 3, 11), im.v)};
+  b = {_mm512_permutex2var_pd(re.v, _mm512_setr_epi64(4, 12, 5, 13, 6, 14, 7, 15), im.v)};
+}
+/// Rounded to floats.
+static inline void store(float *p, d8 a) {
   _mm256_storeu_ps(p, _mm512_cvtpd_ps(a.v));
 }
 static inline d8 operator+(d8 a, d8 b) {

@@ -213,6 +213,11 @@ static inline f8 subtract_and_add(f8 a, f8 b) {
 struct d4 {
   static constexpr std::size_t lanes = 4;
   __m128d low, high;
+  /// Floats, widened.
+  static inline d4 load(const float *p) {
+    const __m128 four = _mm_loadu_ps(p);
+    return {_mm_cvtps_pd(four), _mm_cvtps_pd(_mm_movehl_ps(four, four))};
+  }
   static inline d4 load(const double *p) { return {_mm_loadu_pd(p), _mm_loadu_pd(p + 2)}; }
   static inline d4 broadcast(double a) { return {_mm_set1_pd(a), _mm_set1_pd(a)}; }
 };
@@ -241,7 +246,18 @@ static inline d4 odd_twice(d4 a) {
   return {_mm_unpackhi_pd(a.low, a.low), _mm_unpackhi_pd(a.high, a.high)};
 }
 
-static inline void store_narrowed(float *p, d4 a) {
+/// Four complex values to real and imaginary parts in their order.
+static inline void split_pairs(d4 a, d4 b, d4 &re, d4 &im) {
+  re = {_mm_unpacklo_pd(a.low, a.high), _mm_unpacklo_pd(b.low, b.high)};
+  im = {_mm_unpackhi_pd(a.low, a.high), _mm_unpackhi_pd(b.low, b.high)};
+}
+/// Takes split_pairs back.
+static inline void join_pairs(d4 re, d4 im, d4 &a, d4 &b) {
+  a = {_mm_unpacklo_pd(re.low, im.low), _mm_unpackhi_pd(re.low, im.low)};
+  b = {_mm_unpacklo_pd(re.high, im.high), _mm_unpackhi_pd(re.high, im.high)};
+}
+/// Rounded to floats.
+static inline void store(float *p, d4 a) {
   _mm_storeu_ps(p, _mm_movelh_ps(_mm_cvtpd_ps(a.low), _mm_cvtpd_ps(a.high)));
 }
 

@@ -1,9 +1,5 @@
 // Values of windows that are polynomials of a squared sine. SPDX-License-Identifier: MIT
 
-static inline void store_narrowed(double *p, wide_double a) {
-  store(p, a);
-}
-
 template <std::size_t terms, class Real>
 static inline void window_values_of(const turned_angles &angles, const double *polynomial, Real *out, std::size_t n) {
   const wide_double s = wide_double::broadcast(angles.sine), c = wide_double::broadcast(angles.cosine);
@@ -12,7 +8,7 @@ static inline void window_values_of(const turned_angles &angles, const double *p
     const wide_double u = sine * sine;
     wide_double w = wide_double::broadcast(polynomial[terms - 1]);
     for (std::size_t j = terms - 1; j-- > 0;) w = w * u + wide_double::broadcast(polynomial[j]);
-    store_narrowed(out + k, w);
+    store(out + k, w);
   }
 }
 

@@ -1,4 +1,4 @@
-// Windows and weights in double precision: all builds give the bits of the definition, none fuses.
+// Windows, weights and planes in double precision: all builds give the bits of the definition, none fuses.
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
@@ -38,6 +38,38 @@ TEST(WindowKernels, FollowTheirDefinition) {
       }
     }
   }
+}
+
+template <class Real, class Split, class Join>
+void expect_planes(Split kernel_table::*split, Join kernel_table::*join) {
+  const auto x = tests::noise_of<Real>(80, 3);
+  for (const build &b : builds()) {
+    for (std::size_t n = 0; n < 40; ++n) {
+      const tests::guarded re(8 * n, tests::edge::back), im(8 * n, tests::edge::back);
+      const tests::guarded back(2 * n * sizeof(Real), tests::edge::back);
+      (b.exact->*split)(x.data() + 80 - 2 * n, re.as<double>(), im.as<double>(), n);
+      (b.exact->*join)(re.as<double>(), im.as<double>(), back.as<Real>(), n);
+      for (std::size_t k = 0; k < 2 * n; ++k) {
+        EXPECT_EQ(double{x[80 - 2 * n + k]}, (k % 2 == 0 ? re : im).as<double>()[k / 2]) << b.name;
+        EXPECT_EQ(x[80 - 2 * n + k], back.as<Real>()[k]) << b.name;
+      }
+    }
+  }
+}
+
+TEST(PlaneKernels, SplitAndJoin) {
+  expect_planes<float>(&kernel_table::split, &kernel_table::join_planes);
+  expect_planes<double>(&kernel_table::split_double, &kernel_table::join_planes_double);
+}
+
+TEST(PlaneKernels, FindWhatIsNotFinite) {
+  for (const build &b : builds())
+    for (std::size_t n = 1; n < 70; ++n) {
+      std::vector<double> x(n, 1e308);
+      EXPECT_TRUE(b.exact->is_finite(x.data(), n)) << b.name;
+      x[n * 7 / 11] = n % 2 ? -INFINITY : NAN;
+      EXPECT_FALSE(b.exact->is_finite(x.data(), n)) << b.name << ' ' << n;
+    }
 }
 
 }  // namespace
