@@ -170,11 +170,8 @@ TEST(PolyphaseKernels, RecursionsByBlocks) {
       first.insert(first.end(), second.begin(), second.end());
       return first;
     };
-    const auto exact_outputs = outputs(baseline_kernels), fused_outputs = outputs(*builds().back().fused);
-    for (const build &b : builds()) {
-      EXPECT_EQ(exact_outputs, outputs(*b.exact)) << b.name;
-      EXPECT_EQ(b.fused != b.exact ? fused_outputs : exact_outputs, outputs(*b.fused)) << b.name;
-    }
+    const auto got = outputs(baseline_kernels);
+    for (const build &b : builds()) EXPECT_EQ(got, outputs(*b.exact)) << b.name;
     auto expected = tests::noise_of<double>(width + 8 * blocks, 5);
     for (std::size_t at = width; at < expected.size(); at += 8) {
       long double sums[8] = {};
@@ -190,9 +187,8 @@ TEST(PolyphaseKernels, RecursionsByBlocks) {
       }
       for (std::size_t l = 0; l < 8; ++l) expected[at + l] = static_cast<double>(sums[l]);
     }
-    for (const auto *got : {&exact_outputs, &fused_outputs})
-      for (std::size_t k = 0; k < expected.size(); ++k)
-        EXPECT_NEAR(expected[k], (*got)[k], 1e-13 * std::max(1.0, std::abs(expected[k]))) << order << ' ' << k;
+    for (std::size_t k = 0; k < expected.size(); ++k)
+      EXPECT_NEAR(expected[k], got[k], 1e-13 * std::max(1.0, std::abs(expected[k]))) << order << ' ' << k;
   }
 }
 

@@ -24,13 +24,13 @@ struct complex_taps {
   Lanes by_re, by_im;
   template <class Real>
   void begin(const Real *tap, const Real *x) {
-    const Lanes samples = Lanes::load(x);
+    const Lanes samples = in_register(Lanes::load(x));
     by_re = Lanes::broadcast(tap[0]) * samples;
     by_im = Lanes::broadcast(tap[1]) * samples;
   }
   template <class Real>
   void add(const Real *tap, const Real *x) {
-    const Lanes samples = Lanes::load(x);
+    const Lanes samples = in_register(Lanes::load(x));
     by_re = multiply_add(Lanes::broadcast(tap[0]), samples, by_re);
     by_im = multiply_add(Lanes::broadcast(tap[1]), samples, by_im);
   }

@@ -126,6 +126,11 @@ static inline void load_columns(const float *rows, const int *index, f16 *column
   columns[3] = {_mm512_castpd_ps(_mm512_unpackhi_pd(c, d))};
 }
 
+/// Lanes 8 to 15 plus lanes 0 to 7.
+static inline f8 add_halves(f16 a) {
+  return {_mm256_add_ps(_mm512_extractf32x8_ps(a.v, 1), _mm512_castps512_ps256(a.v))};
+}
+
 static inline f16 reverse(f16 a) {
   const __m512i places = _mm512_setr_epi32(15, 14, 13, 12, 11, 10, 9, 8, 7, 6, 5, 4, 3, 2, 1, 0);
   return {_mm512_permutexvar_ps(places, a.v)};
@@ -145,6 +150,12 @@ static inline f16 even_twice(f16 a) {
 }
 static inline f16 odd_twice(f16 a) {
   return {_mm512_movehdup_ps(a.v)};
+}
+/// The same, but in a register: loads that cross lines of the caches cost more than a register, and GCC would load once
+/// for each use.
+static inline f16 in_register(f16 a) {
+  asm("" : "+v"(a.v));
+  return a;
 }
 static inline f16 subtract_and_add(f16 a, f16 b) {
   return {_mm512_add_ps(a.v, _mm512_xor_ps(b.v, f16::broadcast_pair(-0.F, 0.F).v))};
@@ -200,6 +211,10 @@ static inline d8 even_twice(d8 a) {
 }
 static inline d8 odd_twice(d8 a) {
   return {_mm512_permute_pd(a.v, 0xff)};
+}
+static inline d8 in_register(d8 a) {
+  asm("" : "+v"(a.v));
+  return a;
 }
 static inline d8 subtract_and_add(d8 a, d8 b) {
   const __m512d signs = _mm512_setr_pd(-0.0, 0.0, -0.0, 0.0, -0.0, 0.0, -0.0, 0.0);

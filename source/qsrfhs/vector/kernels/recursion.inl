@@ -2,7 +2,7 @@
 
 /// Adds the samples' shares of four outputs.
 static inline d4 add_samples(d4 sum, const double *x, const double *shares) {
-  for (std::size_t i = 0; i < 4; ++i) sum = multiply_add(d4::broadcast(x[i]), d4::load(shares + 4 * i), sum);
+  for (std::size_t i = 0; i < 4; ++i) sum = sum + d4::broadcast(x[i]) * d4::load(shares + 4 * i);
   return sum;
 }
 
@@ -20,8 +20,8 @@ static inline void recurse_over_block(const block_recursion &plan, Order order, 
   d4 second = add_samples(add_samples(d4::broadcast(0), data, plan.later), data + 4, plan.own);
   for (std::size_t j = order(); !silent && j-- > 0;) {
     const d4 past = d4::broadcast(*(data - 1 - static_cast<std::ptrdiff_t>(j)));
-    first = multiply_add(past, d4::load(plan.responses + 8 * j), first);
-    second = multiply_add(past, d4::load(plan.responses + 8 * j + 4), second);
+    first = first + past * d4::load(plan.responses + 8 * j);
+    second = second + past * d4::load(plan.responses + 8 * j + 4);
   }
   store(data, first);
   store(data + 4, second);
