@@ -26,7 +26,7 @@ enum class convolution_method : std::int32_t {
 template <class Sample, class Tap>
 void apply_taps(const Sample *x, const Tap *taps, std::size_t count, Sample *out, std::size_t n) noexcept {
   using real = real_of<Sample>;
-  const auto &kernels = qsrfhs::kernels::exact();
+  const auto &kernels = qsrfhs::kernels::fused();
   const auto *samples = reinterpret_cast<const real *>(x);
   const auto *values = reinterpret_cast<const real *>(taps);
   auto *sums = reinterpret_cast<real *>(out);
@@ -45,10 +45,10 @@ inline constexpr std::size_t readable = 32;
 
 /// a[k] *= b[k].
 inline void multiply_bins(std::complex<float> *a, const std::complex<float> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
+  qsrfhs::kernels::fused().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
 }
 inline void multiply_bins(std::complex<double> *a, const std::complex<double> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::exact().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
+  qsrfhs::kernels::fused().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
 }
 
 // Costs in multiply-adds of real taps and samples in single precision, which are done eight at a time. The constants

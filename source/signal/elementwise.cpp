@@ -16,6 +16,7 @@ namespace dsp {
 namespace {
 
 using qsrfhs::kernels::exact;
+using qsrfhs::kernels::fused;
 using cf32 = std::complex<float>;
 
 /// The parts of complex numbers, and real numbers themselves.
@@ -185,9 +186,9 @@ void polynomial_of_block(const T *x, std::span<const C> c, C *out, std::size_t n
 template <class T, class C>
 void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept {
   if constexpr (std::is_same_v<C, float>) {
-    exact().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
+    fused().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else if constexpr (std::is_same_v<T, float>) {
-    exact().complex_polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
+    fused().complex_polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else {
     for (std::size_t i = 0; i < out.size(); i += polynomial_block)
       polynomial_of_block(x.data() + i, c, out.data() + i, std::min(polynomial_block, out.size() - i));
@@ -229,7 +230,7 @@ void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, 
     }
     if constexpr (std::is_same_v<Real, float>)
       exact().lookup({parts(entries.elements()), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
-                      parts(x), parts(out), out.size());
+                     parts(x), parts(out), out.size());
     return;
   }
   const Real inverse_step = 1 / table.step;

@@ -66,12 +66,12 @@ std::array<double, coefficient_count> fit_cubic(Function f) noexcept {
 void interpolate(const qsrfhs::kernels::sample_place<float> *places, std::size_t outputs,
                  const qsrfhs::kernels::cubic_taps<float> &taps, std::size_t width, const float *x,
                  float *out) noexcept {
-  qsrfhs::kernels::exact().interpolate(places, outputs, taps, width, x, out);
+  qsrfhs::kernels::fused().interpolate(places, outputs, taps, width, x, out);
 }
 void interpolate(const qsrfhs::kernels::sample_place<double> *places, std::size_t outputs,
                  const qsrfhs::kernels::cubic_taps<double> &taps, std::size_t width, const double *x,
                  double *out) noexcept {
-  qsrfhs::kernels::exact().interpolate_double(places, outputs, taps, width, x, out);
+  qsrfhs::kernels::fused().interpolate_double(places, outputs, taps, width, x, out);
 }
 
 }  // namespace
