@@ -19,7 +19,7 @@ constinit thread_local std::uint64_t refusals = 0;
 
 namespace {
 
-constinit thread_local descriptor_watch *making = nullptr;
+[[gnu::tls_model("initial-exec")]] constinit thread_local descriptor_watch *making = nullptr;
 
 void unlink(block &linked) noexcept {
   if (!linked.next) return;

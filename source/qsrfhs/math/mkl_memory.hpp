@@ -21,7 +21,7 @@ struct alignas(16) block {
 };
 
 /// Of the thread; those that a watch has seen are taken back when it ends.
-extern constinit thread_local std::uint64_t refusals;
+[[gnu::tls_model("initial-exec")]] extern constinit thread_local std::uint64_t refusals;
 
 /// Held by one thread around calls to MKL; of nested ones the innermost sees a refusal.
 class watch {
