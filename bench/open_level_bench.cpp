@@ -42,9 +42,13 @@ template <class T>
 void add_type(const std::string &name, std::int32_t type) {
   lumra_level_options options = LUMRA_LEVEL_OPTIONS;
   options.type = type;
-  lumra_level *level = nullptr;
-  (void)lumra_level_create(&options, &level);  // lives as long as the program
-  add<T>("level/" + name, [level](const auto &x) { (void)lumra_level_add(level, x.data(), x.size()); });
+  for (const std::uint32_t threads : {1U, 2U}) {
+    options.threads = threads;
+    lumra_level *level = nullptr;
+    (void)lumra_level_create(&options, &level);  // lives as long as the program
+    add<T>((threads == 1 ? "level/" : "level on two threads/") + name,
+           [level](const auto &x) { (void)lumra_level_add(level, x.data(), x.size()); });
+  }
   // What reading the memory costs at least.
   add<T>("read/" + name, [](const auto &x) {
     const auto *words = reinterpret_cast<const std::uint64_t *>(x.data());
