@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <cstdlib>
 #include <lumra/lumra.hpp>
+#include <map>
 #include <memory>
 #include <span>
 #include <type_traits>
@@ -27,10 +28,15 @@ template <class T>
 inline constexpr std::int32_t type_of = is_complex<T> ? (is_double<T> ? LUMRA_TYPE_CF64 : LUMRA_TYPE_CF32)
                                                       : (is_double<T> ? LUMRA_TYPE_F64 : LUMRA_TYPE_F32);
 
-/// A tone whose phase jumps.
+/// A tone whose phase jumps; long ones repeat its beginning.
 template <class T>
 void fill(std::span<T> out) {
+  constexpr std::size_t period = 16384;
   for (std::size_t i = 0; i < out.size(); ++i) {
+    if (i >= period) {
+      out[i] = out[i - period];
+      continue;
+    }
     const double phase = 0.37 * static_cast<double>(i) + 1e-5 * static_cast<double>(i * i % 10007);
     if constexpr (is_complex<T>)
       out[i] = T(std::polar(1.0, phase));
@@ -50,6 +56,13 @@ lumra::host_array<T> host_record(std::size_t n) {
   lumra::host_array<T> out(n);
   fill(out.elements());
   return out;
+}
+
+/// Arrays of n elements, filled once: each repetition would spend its time on that.
+template <class Arrays>
+Arrays &kept(std::size_t n) {
+  static std::map<std::size_t, Arrays> made;
+  return made.try_emplace(n, n).first->second;
 }
 
 template <class T>

@@ -9,6 +9,8 @@
 #include <random>
 #include <vector>
 
+#include "bench.hpp"
+
 #ifdef LUMRA_PEER_VOLK
 #include <volk/volk.h>
 #endif
@@ -33,12 +35,13 @@ class matrix {
 };
 
 struct matrices {
-  explicit matrices(std::int32_t n) : a(n), b(n), e(n), difference(static_cast<std::size_t>(n)) {
+  explicit matrices(std::size_t count) : n(static_cast<std::int32_t>(count)), a(n), b(n), e(n), difference(count) {
     std::mt19937 random(1);
     std::normal_distribution<float> normal;
     for (auto *m : {&a, &b})
       for (std::int32_t i = 0; i < n; ++i) (*m->handle)->elements[i] = {normal(random), normal(random)};
   }
+  std::int32_t n;
   matrix<lumra_cf32_matrix_block> a, b;
   matrix<lumra_f32_matrix_block> e;
   std::vector<MKL_Complex8> difference;
@@ -50,7 +53,7 @@ struct matrices {
 template <class Work>
 void run(benchmark::State &state, Work work) {
   const auto n = static_cast<std::int32_t>(state.range(0));
-  matrices m(n);
+  matrices &m = bench::kept<matrices>(static_cast<std::size_t>(n));
   for (auto _ : state) {
     work(m, n);
     benchmark::ClobberMemory();

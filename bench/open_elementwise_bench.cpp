@@ -11,6 +11,11 @@
 #include <string>
 #include <vector>
 
+#include "bench.hpp"
+#ifdef LUMRA_PEER_EIGEN
+#include "peer_eigen.hpp"
+#endif
+
 namespace {
 
 /// The samples of one precision.
@@ -52,14 +57,17 @@ struct host_arrays {
 template <class Arrays, class Work>
 void add(const std::string &name, Work work) {
   for (const std::size_t n : {std::size_t{4096}, std::size_t{4} << 20})
-    benchmark::RegisterBenchmark((name + "/" + std::to_string(n)).c_str(), [=](benchmark::State &state) {
-      Arrays a(n);
-      for (auto _ : state) {
-        work(a, n);
-        benchmark::ClobberMemory();
-      }
-      state.SetItemsProcessed(static_cast<std::int64_t>(n) * state.iterations());
-    })->UseRealTime();
+    benchmark::RegisterBenchmark((name + "/" + std::to_string(n)).c_str(),
+                                 [=](benchmark::State &state) {
+                                   Arrays &a = bench::kept<Arrays>(n);
+                                   for (auto _ : state) {
+                                     work(a, n);
+                                     benchmark::ClobberMemory();
+                                   }
+                                   state.SetItemsProcessed(static_cast<std::int64_t>(n) * state.iterations());
+                                 })
+        ->MeasureProcessCPUTime()
+        ->UseRealTime();
 }
 
 /// One operation in single precision, in double, and through the older function.
@@ -94,6 +102,10 @@ int main(int argc, char **argv) {
       [](auto &a, auto n) { (void)lumra_polynomial_f32(a.keys.data(), a.coefficients.data(), 9, a.real.data(), n); },
       [](auto &a, auto n) { (void)lumra_polynomial_f64(a.keys.data(), a.coefficients.data(), 9, a.real.data(), n); },
       [](auto &a, auto) { lumra::polynomial(a.keys, a.coefficients, a.real); });
+#ifdef LUMRA_PEER_EIGEN
+  add<single_arrays>("polynomial/eigen",
+                     [](auto &a, auto n) { eigen_polynomial(a.keys.data(), a.coefficients.data(), a.real.data(), n); });
+#endif
   add_all(
       "lookup",
       [](auto &a, auto n) {

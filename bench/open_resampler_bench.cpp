@@ -109,6 +109,7 @@ void register_rows() {
     benchmark::RegisterBenchmark(name("lumra_cf32_two_rows").c_str(), complex_single)
         ->Args({row, 100, 2, 1})
         ->Args({row, 100, 2, 2})
+        ->MeasureProcessCPUTime()
         ->UseRealTime();
     benchmark::RegisterBenchmark(name("lumra_f32").c_str(), real_single)->Args({row, 100, 1, 1});
     benchmark::RegisterBenchmark(name("lumra_f64").c_str(), real_double)

@@ -23,13 +23,14 @@ struct work {
 void mkl_alone(benchmark::State &state, bool real, std::size_t points, direction d) {
   bench::mkl_transform transform(points, false, !real, d == direction::forward_in_place,
                                  1 / std::sqrt(static_cast<double>(points)));
-  work w(points);
+  work &w = bench::kept<work>(points);
   for (auto _ : state) {
     if (d == direction::forward) transform.forward(w.record.data(), w.spectrum.data());
     if (d == direction::forward_in_place) transform.forward(w.record.data());
     if (d == direction::backward) transform.backward(w.spectrum.data(), w.record.data());
     benchmark::ClobberMemory();
   }
+  bench::rate(state, points);
 }
 
 void lumra_open(benchmark::State &state, bool real, std::size_t points, direction d) {
@@ -40,7 +41,7 @@ void lumra_open(benchmark::State &state, bool real, std::size_t points, directio
   lumra_fft *made = nullptr;
   if (lumra_fft_create(&options, &made) != LUMRA_SUCCESS) return state.SkipWithError(lumra_last_error());
   const std::unique_ptr<lumra_fft, void (*)(lumra_fft *)> fft(made, lumra_fft_free);
-  work w(points);
+  work &w = bench::kept<work>(points);
   float *const to = d == direction::forward_in_place ? w.record.data() : w.spectrum.data();
   for (auto _ : state) {
     if (d == direction::backward)
@@ -49,6 +50,7 @@ void lumra_open(benchmark::State &state, bool real, std::size_t points, directio
       (void)lumra_fft_forward(fft.get(), w.record.data(), to, 1, nullptr);
     benchmark::ClobberMemory();
   }
+  bench::rate(state, points);
 }
 
 void add(const char *name, bool real, std::size_t points, direction d) {
@@ -65,7 +67,7 @@ void add(const char *name, bool real, std::size_t points, direction d) {
 
 int main(int argc, char **argv) {
   for (const bool real : {false, true})
-    for (const std::size_t points : {16, 1024, 65536, 1 << 20}) {
+    for (const std::size_t points : {16, 256, 1024, 4096, 16384, 65536, 262144, 1 << 20}) {
       add("forward", real, points, direction::forward);
       add("forward_in_place", real, points, direction::forward_in_place);
       add("backward", real, points, direction::backward);

@@ -67,11 +67,14 @@ BENCHMARK(liquid);
 #endif
 
 #ifdef LUMRA_PEER_SOXR
+/// Medium quality in single precision, its best in double.
+template <class T>
 void soxr(benchmark::State &state) {
-  const auto x = record<cf32>(block);
-  std::vector<cf32> y(block + 64);
-  const soxr_quality_spec_t quality = soxr_quality_spec(SOXR_MQ, 0);
-  const soxr_io_spec_t interleaved = soxr_io_spec(SOXR_FLOAT32_I, SOXR_FLOAT32_I);
+  const auto x = record<T>(block);
+  std::vector<T> y(block + 64);
+  const auto samples = is_double<T> ? SOXR_FLOAT64_I : SOXR_FLOAT32_I;
+  const soxr_quality_spec_t quality = soxr_quality_spec(is_double<T> ? SOXR_VHQ : SOXR_MQ, 0);
+  const soxr_io_spec_t interleaved = soxr_io_spec(samples, samples);
   const soxr_runtime_spec_t one_thread = soxr_runtime_spec(1);
   soxr_error_t error = nullptr;
   soxr_t peer = soxr_create(static_cast<double>(ratio), 1, 2, &error, &interleaved, &quality, &one_thread);
@@ -84,7 +87,8 @@ void soxr(benchmark::State &state) {
   soxr_delete(peer);
   rate(state, block);
 }
-BENCHMARK(soxr);
+BENCHMARK(soxr<cf32>);
+BENCHMARK(soxr<cf64>);
 #endif
 
 #ifdef LUMRA_PEER_SAMPLERATE

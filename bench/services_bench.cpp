@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "qsrfhs/vector/fft_resampler.hpp"
+#include "qsrfhs/vector/kernels/kernels.hpp"
 
 namespace {
 
@@ -197,6 +198,16 @@ BENCHMARK(filter_found_among)->Arg(10)->Arg(1000)->Arg(10000)->ComputeStatistics
 BENCHMARK(resampler_block_step)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best);
 BENCHMARK(mkl_transforms_alone)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best);
 
+const char *chosen_kernels() {
+  const auto *const chosen = &qsrfhs::kernels::active();
+  if (chosen == &qsrfhs::kernels::avx_kernels) return "AVX";
+  return chosen == &qsrfhs::kernels::baseline_kernels ? "baseline" : "others";
+}
+
 }  // namespace
 
-BENCHMARK_MAIN();
+int main(int argc, char **argv) {
+  benchmark::AddCustomContext("kernels", chosen_kernels());
+  benchmark::Initialize(&argc, argv);
+  benchmark::RunSpecifiedBenchmarks();
+}

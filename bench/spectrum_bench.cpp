@@ -78,6 +78,26 @@ void lumra_accumulator(benchmark::State &state) {
   report(state, count);
 }
 
+// What follows the samples: the state of a stretch saved, and one stretch joined to the one before.
+void lumra_accumulator_saved(benchmark::State &state) {
+  const auto n = static_cast<std::uint64_t>(state.range(0));
+  lumra::spectrum_average<sample> average({.points = n, .threads = 1});
+  average.add(input().elements());
+  for (auto _ : state) benchmark::DoNotOptimize(average.save());
+}
+void lumra_accumulator_merged(benchmark::State &state) {
+  const auto n = static_cast<std::uint64_t>(state.range(0));
+  lumra::spectrum_average<sample> next({.points = n, .threads = 1, .start = 3 * n + 1});
+  next.add(input().elements().first(3 * n + 1));
+  for (auto _ : state) {
+    state.PauseTiming();
+    lumra::spectrum_average<sample> average({.points = n, .threads = 1});
+    average.add(input().elements().first(3 * n + 1));
+    state.ResumeTiming();
+    average.merge(next);
+  }
+}
+
 // The limit: nothing but the transforms, in place.
 void mkl_transforms_alone(benchmark::State &state) {
   const auto n = static_cast<std::size_t>(state.range(0));
@@ -150,14 +170,24 @@ double best(const std::vector<double> &times) {
   return *std::min_element(times.begin(), times.end());
 }
 
-#define SIZES \
-  ->Arg(256)->Arg(1024)->Arg(4096)->Arg(65536)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best)
+#define SIZES                         \
+  ->Arg(256)                          \
+      ->Arg(1024)                     \
+      ->Arg(4096)                     \
+      ->Arg(16384)                    \
+      ->Arg(65536)                    \
+      ->Arg(262144)                   \
+      ->Unit(benchmark::kMicrosecond) \
+      ->ComputeStatistics("best", best)
 BENCHMARK(lumra_windowed_fft) SIZES;
 BENCHMARK(lumra_accumulator)
-    ->ArgsProduct({{256, 1024, 4096, 65536}, {1, 2}})
+    ->ArgsProduct({{256, 1024, 4096, 16384, 65536, 262144}, {1, 2}})
     ->Unit(benchmark::kMicrosecond)
+    ->MeasureProcessCPUTime()
     ->UseRealTime()
     ->ComputeStatistics("best", best);
+BENCHMARK(lumra_accumulator_saved)->Arg(1024)->Arg(4096);
+BENCHMARK(lumra_accumulator_merged)->Arg(1024)->Arg(4096);
 BENCHMARK(mkl_transforms_alone) SIZES;
 #if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
 BENCHMARK(fftw_with_volk) SIZES;

@@ -13,6 +13,9 @@
 #include <span>
 #include <string>
 #include <type_traits>
+#include <vector>
+
+#include "bench.hpp"
 
 #ifdef LUMRA_PEER_VOLK
 #include <volk/volk.h>
@@ -100,20 +103,24 @@ void scalar_lookup(const arrays &a, float start, float step, complex *out) {
   }
 }
 
-constexpr std::size_t sizes[] = {4096, 65536, std::size_t{4} << 20};
+constexpr std::size_t sizes[] = {1024, 4096, 16384, 65536, 524288, std::size_t{4} << 20};
 
 /// One benchmark for each size; work(arrays) does one pass over `width` bytes an element.
 template <class Work>
 void add(const std::string &name, std::size_t width, Work work) {
   for (const std::size_t n : sizes)
-    benchmark::RegisterBenchmark((name + "/" + std::to_string(n)).c_str(), [=](benchmark::State &state) {
-      arrays a(n);
-      for (auto _ : state) {
-        work(a);
-        benchmark::ClobberMemory();
-      }
-      state.SetBytesProcessed(static_cast<std::int64_t>(width * n) * state.iterations());
-    })->UseRealTime();
+    benchmark::RegisterBenchmark((name + "/" + std::to_string(n)).c_str(),
+                                 [=](benchmark::State &state) {
+                                   arrays &a = bench::kept<arrays>(n);
+                                   for (auto _ : state) {
+                                     work(a);
+                                     benchmark::ClobberMemory();
+                                   }
+                                   state.SetItemsProcessed(static_cast<std::int64_t>(n) * state.iterations());
+                                   state.SetBytesProcessed(static_cast<std::int64_t>(width * n) * state.iterations());
+                                 })
+        ->MeasureProcessCPUTime()
+        ->UseRealTime();
 }
 
 float *floats(host_array<complex> &a) {
@@ -151,6 +158,17 @@ void add_all() {
   add("rms/limit", 8, [](arrays &a) { benchmark::DoNotOptimize(stream_in(floats(a.x), 2 * a.count)); });
   add("polynomial/lumra", 8, [](arrays &a) { lumra::polynomial(a.keys, a.coefficients, a.real); });
   add("lookup/lumra", 20, [](arrays &a) { lumra::lookup(a.keys, a.x, a.z, a.table, 0, 1); });
+  // The same work as with 4M elements in one call, in calls that stay on one thread.
+  benchmark::RegisterBenchmark("lookup/lumra_in_pieces",
+                               [](benchmark::State &state) {
+                                 std::vector<arrays> pieces;
+                                 for (int i = 0; i < 64; ++i) pieces.emplace_back(65536);
+                                 for (auto _ : state)
+                                   for (arrays &a : pieces) lumra::lookup(a.keys, a.x, a.z, a.table, 0, 1);
+                                 bench::rate(state, 64 * 65536, 20);
+                               })
+      ->MeasureProcessCPUTime()
+      ->UseRealTime();
   add("lookup/scalar", 20, [](arrays &a) { scalar_lookup(a, 0, 1, a.z.elements().data()); });
 
 #ifdef LUMRA_PEER_VOLK
