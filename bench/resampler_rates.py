@@ -1,16 +1,18 @@
 # SPDX-License-Identifier: MIT
 """Resamplers beside each other: ripple and rejection by swept tones, and the processor's time.
 
-Prints the table of docs/rates.md and draws its picture into the file that is named, if any. LUMRA_LIBRARY names the
+Prints the rows of docs/rates.md, and draws its picture into the file that --picture names. LUMRA_LIBRARY names the
 library. The peers are libsoxr.so.0 and libliquid.so.1; samples are complex, in single precision unless named otherwise.
 """
 import ctypes
+import functools
 import pathlib
 import subprocess
 import sys
-import time
 
 import numpy as np
+
+from turns import Turns
 
 root = pathlib.Path(__file__).resolve().parents[1]
 sys.path.insert(0, str(root / "tests" / "open"))
@@ -128,39 +130,41 @@ def sweep(resampler, rates):
     return max(gains), min(gains), -20 * np.log10(max(wrong)), -20 * np.log10(max(wrong_apart))
 
 
-def speeds(resamplers, rates, n=1 << 18):
-    """Millions of input samples a second of the processor's time, turn by turn."""
-    least = np.full(len(resamplers), np.inf)
+def name_of(resampler, rates):
+    return " → ".join(f"{r / 1e6:.6g}" for r in rates) + f" MHz/{resampler.name}"
+
+
+def speeds(turns, resamplers, rates, n=1 << 18):
+    """Millions of input samples a second of the processor's time, of those that are chosen."""
     out = np.zeros(int(n * rates[1] / rates[0]) + 100000, np.complex128)
+    works = {}
     for resampler in resamplers:
         resampler.start(rates)
-    for _ in range(7):
-        for k, resampler in enumerate(resamplers):
-            x = np.ones(n, resampler.dtype)
-            start = time.process_time_ns()
-            resampler.run(x, out.view(resampler.dtype))
-            least[k] = min(least[k], time.process_time_ns() - start)
-    return n / least * 1e3
+        x, room = np.ones(n, resampler.dtype), out.view(resampler.dtype)
+        works[name_of(resampler, rates)] = functools.partial(resampler.run, x, room)
+    taken = turns.beside(n, works)
+    return {r: n / np.quantile([cpu for cpu, _ in taken[name]], 0.25) / 1e6 for r in resamplers
+            if (name := name_of(r, rates)) in taken}  # fmt: skip
 
 
-def table(resamplers):
+def table(turns, resamplers):
     for rates in RATES:
-        for resampler, speed in zip(resamplers, speeds(resamplers, rates)):
+        for resampler, speed in speeds(turns, resamplers, rates).items():
             most, fewest, rejection, apart = sweep(resampler, rates)
             ratio = " → ".join(f"{r / 1e6:.6g}" for r in rates)
             ripple = f"{most:+.4f} / {fewest:+.4f}"
             print(f"| {ratio} | {resampler.name} | {ripple} | {rejection:.0f} / {apart:.0f} | {speed:.0f} |")
 
 
-def picture(rates, path):
+def picture(turns, rates, path):
     """Speed against the rejection from half the lower rate on, a line a family."""
     families = {
         "lumra, single precision": [Lumra(r) for r in (60, 80, 100, 120)],
         "lumra, double precision": [Lumra(r, np.complex128) for r in (60, 80, 100, 120, 140, 150)],
-        "soxr: MQ, HQ, 24 bits, VHQ": [Soxr("", r) for r in (2, 4, 5, 6)],
+        "soxr: MQ, HQ, 24 bits, VHQ": [Soxr(f"soxr, recipe {r}", r) for r in (2, 4, 5, 6)],
     }
     everyone = [r for family in families.values() for r in family]
-    speed = dict(zip(everyone, speeds(everyone, rates)))
+    speed = speeds(turns, everyone, rates)
     data = "".join(
         f"$d{k} << EOD\n" + "".join(f"{sweep(r, rates)[2]} {speed[r]}\n" for r in family) + "EOD\n"
         for k, family in enumerate(families.values())
@@ -179,7 +183,8 @@ plot {plots}
 
 
 if __name__ == "__main__":
-    ours = [Lumra(60), Lumra(100), Lumra(120), Lumra(150, np.complex128)]
-    table([*ours, Soxr("soxr HQ", 4), Soxr("soxr VHQ", 6), Liquid(100)])
-    if len(sys.argv) > 1:
-        picture(RATES[1], sys.argv[1])
+    with Turns(__doc__, picture="receives the picture of docs/rates.md") as turns:
+        ours = [Lumra(60), Lumra(100), Lumra(120), Lumra(150, np.complex128)]
+        table(turns, [*ours, Soxr("soxr HQ", 4), Soxr("soxr VHQ", 6), Liquid(100)])
+        if turns.options.picture:
+            picture(turns, RATES[1], turns.options.picture)

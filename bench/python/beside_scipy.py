@@ -1,8 +1,8 @@
 # SPDX-License-Identifier: MIT
-"""The package beside SciPy and NumPy on the same arrays, turn by turn in one process: how many times as fast it is.
+"""The package beside SciPy and NumPy on the same arrays, turn by turn in one process (names: operation/who/size).
 
-scripts/bench runs it with the package on the path; rows may be chosen by words of their names. One thread each; times are
-the processor's, the least of many turns. What two threads or processes gain is by the clock, which other load disturbs.
+scripts/bench runs it with the package on the path. One thread each, but for the rows of threads and processes, of which
+the clock tells what they gain, where nobody else uses the machine.
 """
 import concurrent.futures
 import os
@@ -10,7 +10,6 @@ import pathlib
 import subprocess
 import sys
 import tempfile
-import time
 
 for _limit in "OPENBLAS_NUM_THREADS", "OMP_NUM_THREADS":
     os.environ[_limit] = "1"
@@ -20,15 +19,8 @@ import scipy.signal  # noqa: E402
 
 import lumra  # noqa: E402
 
-rows = {}
-
-
-def row(name):
-    def keep(work):
-        rows[name] = work
-        return work
-
-    return keep
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[1]))
+from turns import Turns  # noqa: E402
 
 
 def noise(size, dtype=np.complex64):
@@ -37,101 +29,88 @@ def noise(size, dtype=np.complex64):
     return (x + 1j * generator.standard_normal(size) if np.dtype(dtype).kind == "c" else x).astype(dtype)
 
 
-def least(works, seconds=1.0, clock=time.process_time):
-    """Seconds of each work: the least of many turns, in which one follows the other."""
-    best, end, turns = [np.inf] * len(works), time.perf_counter() + seconds, 0
-    while turns < 5 or time.perf_counter() < end:
-        for k, work in enumerate(works):
-            start = clock()
-            work()
-            best[k] = min(best[k], clock() - start)
-        turns += 1
-    return best
+def beside(turns, name, samples, ours, theirs, size=""):
+    turns.beside(samples, {f"{name}/lumra{size}": ours, f"{name}/scipy{size}": theirs})
 
 
-def repeated(work, times):
-    return lambda: [work() for _ in range(times)]
-
-
-def beside(name, goal, samples, ours, theirs):
-    """Short calls are repeated for the clock."""
-    times = max(1, 200_000 // samples)
-    a, b = least([repeated(ours, times), repeated(theirs, times)])
-    print(f"{name}: {b / a:.2f} of SciPy, {samples * times / a / 1e6:.0f} Msamples/s (goal {goal})", flush=True)
-
-
-@row("welch")
-def _spectra():
+def spectra(turns):
     x = noise(1 << 20)
     for nfft in 256, 1024, 4096, 65536:
-        beside(f"spectrum {nfft}", 10, len(x), lambda: lumra.spectrum(x, nfft=nfft, threads=1),
+        beside(turns, "spectrum", len(x), lambda: lumra.spectrum(x, nfft=nfft, threads=1),
                lambda: scipy.signal.welch(x, window="flattop", nperseg=nfft, detrend=False, return_onesided=False,
-                                          scaling="spectrum"))  # fmt: skip
+                                          scaling="spectrum"), f"/{nfft}")  # fmt: skip
 
 
-@row("resample")
-def _rates():
+def rates(turns):
     x = noise(1 << 18)
     for up, down in (3, 10), (96, 125), (147, 160), (3, 1):
         # As long as ours: 100 dB beyond half the lower rate, flat to 0.9 of it.
         taps, beta = scipy.signal.kaiserord(100, 0.1 / max(up, down))
         h = scipy.signal.firwin(taps | 1, 0.95 / max(up, down), window=("kaiser", beta)).astype(np.float32)
-        beside(f"resample {up}/{down}", 10, len(x), lambda: lumra.resample(x, down, up),
-               lambda: scipy.signal.resample_poly(x, up, down, window=h))  # fmt: skip
+        beside(turns, "resample", len(x), lambda: lumra.resample(x, down, up),
+               lambda: scipy.signal.resample_poly(x, up, down, window=h), f"/{up}x{down}")  # fmt: skip
 
 
-@row("lfilter")
-def _recursions():
+def recursions(turns):
     b, a = scipy.signal.butter(4, 0.4)
-    for dtype, goal in (np.float32, 1.5), (np.complex64, 4):
+    for dtype in np.float32, np.complex64:
         x, narrow = noise(65536, dtype), (b.astype(np.float32), a.astype(np.float32))
-        beside(f"lfilter {np.dtype(dtype)}", goal, len(x), lambda: lumra.lfilter(*narrow, x),
+        beside(turns, f"lfilter_{np.dtype(dtype)}", len(x), lambda: lumra.lfilter(*narrow, x),
                lambda: scipy.signal.lfilter(*narrow, x))  # fmt: skip
 
 
-@row("fft")
-def _transforms():
+def transforms(turns):
     for n in 256, 1000, 1024, 4096, 65536, 1009:
         x = noise(n)
-        beside(f"fft {n}", 1, n, lambda: lumra.fft(x), lambda: scipy.fft.fft(x))
+        beside(turns, "fft", n, lambda: lumra.fft(x), lambda: scipy.fft.fft(x), f"/{n}")
         real = x.real.copy()
-        beside(f"rfft {n}", 1, n, lambda: lumra.rfft(real), lambda: scipy.fft.rfft(real))
+        beside(turns, "rfft", n, lambda: lumra.rfft(real), lambda: scipy.fft.rfft(real), f"/{n}")
 
 
-@row("convolve")
-def _convolutions():
+def convolutions(turns):
     for n, m in (10_000, 50), (100_000, 1000), (1_000_000, 5000):
         x, h = noise(n), noise(m)
-        beside(f"convolve {n} x {m}", 3, n, lambda: lumra.convolve(x, h), lambda: scipy.signal.oaconvolve(x, h))
+        beside(turns, "convolve", n, lambda: lumra.convolve(x, h), lambda: scipy.signal.oaconvolve(x, h), f"/{n}x{m}")
 
 
-@row("calls")
-def _calls():
-    # What 16 samples take is nearly all call; beside it what a function of SciPy's takes to be called.
-    b, a = scipy.signal.butter(4, 0.4)
-    for name, work in {
-        "magnitude": lumra.magnitude, "power": lumra.power, "fft": lumra.fft, "lfilter": lambda x: lumra.lfilter(b, a, x),
-    }.items():
-        short, long = noise(16), noise(1000)
-        t16, t1000 = least([repeated(lambda: work(short), 10_000), repeated(lambda: work(long), 10_000)])
-        print(f"call of {name}: {t16 * 100:.2f} us with 16 samples (goal below 3), {t1000 * 100:.2f} us with 1000", flush=True)
+def calls(turns):
+    """What 1000 samples take in Python, and how much of it is not the C function, which is called beside by ctypes.
+
+    Both of that calls, one without samples, cost the same but for the function's work.
+    """
+    sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "tests" / "open"))
+    import open as c
+
+    x, real, out = noise(1000), np.empty(1000, np.float32), np.empty(1000, np.complex64)
+    fft = c.create("fft", type=c.type_code("cf32"), points=1000)
+    for name, work, bare in (
+        ("magnitude", lumra.magnitude, lambda n: c.call("magnitude_cf32", x, real, n)),
+        ("power", lumra.power, lambda n: c.call("power_cf32", x, real, n)),
+        ("fft", lumra.fft, lambda n: c.call("fft_forward", fft, x, out, n // 1000, None)),
+    ):
+        names = [f"call/{name}/{what}" for what in ("above", "python", "c", "c_nothing")]
+        if turns.wanted(*names):
+            works = (lambda: work(x), lambda: bare(1000), lambda: bare(0))
+            for whole, function, nothing in zip(*turns.beside(1000, dict(zip(names[1:], works)), always=True).values()):
+                turns.keep(names[0], *(t - (f - n) for t, f, n in zip(whole, function, nothing)))
 
 
-@row("threads")
-def _threads():
+def threads(turns):
+    names = [f"threads/{who}" for who in ("one", "two", "both", "after_another")]
+    if not turns.wanted(*names):
+        return
     x = noise(1 << 24)
-    half = x[: len(x) // 2]
+    halves = x[: len(x) // 2], x[len(x) // 2 :]
+    single = lambda part: lumra.spectrum(part, threads=1)
     with concurrent.futures.ThreadPoolExecutor(2) as pool:
-        one, two, both, single = least([
-            lambda: lumra.spectrum(x, threads=1), lambda: lumra.spectrum(x, threads=2),
-            lambda: list(pool.map(lambda part: lumra.spectrum(part, threads=1), (half, half))),
-            lambda: lumra.spectrum(half, threads=1),
-        ], 6, time.perf_counter)  # fmt: skip
-    print(f"threads=2: {one / two:.2f} of one; two Python threads: {2 * single / both:.2f} of one (goal 1.8)", flush=True)
+        works = (lambda: single(x), lambda: lumra.spectrum(x, threads=2), lambda: list(pool.map(single, halves)),
+                 lambda: list(map(single, halves)))  # fmt: skip
+        turns.beside(len(x), dict(zip(names, works)))
 
 
-@row("dask")
-def _workers():
+def processes(turns):
+    if not turns.wanted("dask/one", "dask/two", "dask/none_beside_1", "dask/none_beside_2"):
+        return
     from distributed import Client
 
     with tempfile.TemporaryDirectory() as folder:
@@ -141,20 +120,12 @@ def _workers():
             for _ in range(256):
                 file.write(block)
         recording = lumra.Recording(path, datatype="ci16_le", sample_rate=1e6)
-        seconds = {}
-        for workers in 1, 2:
+        for workers, name in (1, "dask/one"), (2, "dask/two"):
             with Client(n_workers=workers, threads_per_worker=1, dashboard_address=None, local_directory=folder) as client:
-                lumra.spectrum(recording, client=client)
-                before, turns = sum(client.run(time.process_time).values()), []
-                local, seconds[workers] = least([
-                    lambda: lumra.spectrum(recording, threads=1),
-                    lambda: turns.append(lumra.spectrum(recording, client=client)),
-                ], 10, time.perf_counter)  # fmt: skip
-                spent = (sum(client.run(time.process_time).values()) - before) / len(turns)
-            (alone,) = least([lambda: lumra.spectrum(recording, threads=1)], 5)
-            print(f"dask, {workers} worker(s): {local / seconds[workers]:.2f} of one process without Dask by the clock; "
-                  f"the workers' processors {spent:.2f} s, its own {alone:.2f} s", flush=True)  # fmt: skip
-        print(f"dask, two workers: {seconds[1] / seconds[2]:.2f} of one (goal 1.7)", flush=True)
+                turns.beside(256 << 20, {
+                    name: lambda: lumra.spectrum(recording, client=client),
+                    f"dask/none_beside_{workers}": lambda: lumra.spectrum(recording, threads=1),
+                })  # fmt: skip
 
 
 _memory = """
@@ -169,8 +140,10 @@ print(f"memory, {name}: {{resident('RssAnon') - before:.0f}} MB after a spectrum
 """
 
 
-@row("memory")
-def _memory_of_spectra():
+def memory(turns):
+    """Prints; nothing of it is timed."""
+    if not turns.wanted("memory"):
+        return
     with tempfile.TemporaryDirectory() as folder:
         path = os.path.join(folder, "long.cf32")
         with open(path, "wb") as file:
@@ -182,6 +155,6 @@ def _memory_of_spectra():
 
 
 if __name__ == "__main__":
-    for name, work in rows.items():
-        if len(sys.argv) < 2 or any(word in name for word in sys.argv[1:]):
-            work()
+    with Turns(__doc__) as turns:
+        for subject in spectra, rates, recursions, transforms, convolutions, calls, threads, processes, memory:
+            subject(turns)
