@@ -11,7 +11,10 @@ import measure
 import page
 import rows
 
-REPETITIONS, MIN_TIME = 5, 0.01  # of a process, of which the fastest counts
+MIN_TIME = 0.005  # seconds of a repetition; of those of a process the fastest counts
+FEWEST_REPETITIONS = 10
+LEAST_SPAN = 1  # seconds over which the repetitions of a process are spread: slow spells of machines last some tenths
+SPARE_TURNS = 6  # so that a few which are disturbed hide no change
 
 
 def names_of(build, program):
@@ -48,7 +51,8 @@ def take_turns(builds, wanted, turns, load):
     for turn, (program, names) in itertools.product(range(turns), wanted.items()):
         for which in (0, 1) if turn % 2 == 0 else (1, 0):
             load.begin()
-            timings, errors, _ = measure.run(builds[which], program, names, REPETITIONS, MIN_TIME)
+            repetitions = max(FEWEST_REPETITIONS, round(LEAST_SPAN / MIN_TIME / len(names)))
+            timings, errors, _ = measure.run(builds[which], program, names, repetitions, MIN_TIME)
             load.end()
             for name, timing in timings.items():
                 seconds = timing.wall if by_clock(name) else timing.cpu
@@ -75,7 +79,7 @@ def compare(old, new, pattern, turns):
     count = sum(map(len, wanted.values()))
     if not count:
         sys.exit("bench: both builds have no benchmark with such a name")
-    turns = turns or figures.fewest_turns(count) + 4
+    turns = turns or figures.fewest_turns(count) + SPARE_TURNS
     print(f"bench: {count} benchmarks, {turns} turns of each build", file=sys.stderr, flush=True)
     load = machine.Load()
     taken = take_turns(builds, wanted, turns, load)
@@ -84,7 +88,7 @@ def compare(old, new, pattern, turns):
     print(table(changes))
     print("".join(f"{line}\n" for line in (*alone, *(f"{name} ({program}): failed in some turns" for program, name in taken
                                                      if (program, name) not in changes))))  # fmt: skip
-    print(f"{turns} processes of each build, the fastest of {REPETITIONS} repetitions in each; others kept {load.others:.2f} "
-          f"processors busy. A change: rank test of Mann and Whitney, with Holm's correction at {figures.FAMILY_ERROR:.0%} "
-          f"for all {len(changes)} rows, and {figures.LEAST_EFFECT:.0%} or more.")  # fmt: skip
+    print(f"{turns} processes of each build, of each the fastest repetition by the processor's time; others kept "
+          f"{load.others:.2f} processors busy. A change: rank test of Mann and Whitney, by Benjamini's and Hochberg's "
+          f"correction at {figures.FALSE_CHANGES:.0%} for all {len(changes)} rows, and {figures.LEAST_EFFECT:.0%} or more.")
     print("\nChanged:\n\n" + table(found) if found else "Nothing changed beyond the noise.")

@@ -1,12 +1,12 @@
 # SPDX-License-Identifier: MIT
-"""What timings say: ratios of medians with their spread, and which of two builds' rows differ beyond the noise."""
+"""What timings say: ratios of typical times with their spread, and which of two builds' rows differ beyond the noise."""
 import dataclasses
 
 import numpy as np
 import scipy.stats
 
 LEAST_EFFECT = 0.03  # less is no change worth a word, however sure
-FAMILY_ERROR = 0.01  # how probable one false change among all rows may be
+FALSE_CHANGES = 0.01  # the share that may be false; where nothing has changed, how probable a single one is
 
 
 def typical(timings):
@@ -54,21 +54,22 @@ def changes(rows):
     rows  {name: (timings of the old build, of the new one)}, one timing a process: what differs from process to
           process, such as where memory lies, is noise then, and not taken for a change
 
-    A row has changed where the two-sided rank test of Mann and Whitney says so with Holm's correction for the number of
-    rows, and both typical times are LEAST_EFFECT apart.
+    A row has changed where the two-sided rank test of Mann and Whitney says so with the correction of Benjamini and
+    Hochberg for the number of rows, and both typical times are LEAST_EFFECT apart.
     """
     chances = {name: _chance(*pair) for name, pair in rows.items()}
-    found, sure = {}, True
-    for tested, name in enumerate(sorted(chances, key=chances.get)):
-        sure = sure and chances[name] <= FAMILY_ERROR / (len(rows) - tested)
-        speed = ratio(*rows[name])  # seconds of the old build over those of the new one
-        found[name] = speed, sure and abs(speed.value - 1) >= LEAST_EFFECT
-    return {name: found[name] for name in rows}
+    ranked = enumerate(sorted(chances.values()), start=1)
+    bound = max((chance for rank, chance in ranked if chance <= FALSE_CHANGES * rank / len(rows)), default=-1)
+    found = {}
+    for name, pair in rows.items():
+        speed = ratio(*pair)  # seconds of the old build over those of the new one
+        found[name] = speed, chances[name] <= bound and abs(speed.value - 1) >= LEAST_EFFECT
+    return found
 
 
 def fewest_turns(rows):
     """How many timings of each build can show a change among so many rows at all."""
     turns = 3
-    while _chance(range(turns), range(turns, 2 * turns)) > FAMILY_ERROR / rows:
+    while _chance(range(turns), range(turns, 2 * turns)) > FALSE_CHANGES / rows:
         turns += 1
     return turns

@@ -67,7 +67,8 @@ def read(document):
         elif entry["run_type"] == "iteration":
             unit = _seconds[entry["time_unit"]]
             cpu, wall = entry["cpu_time"] * unit, entry["real_time"] * unit
-            counted = entry.get("items_per_second", entry.get("bytes_per_second", 0))  # by the clock that its name tells
+            # Rates are by the clock that the name tells.
+            counted = entry.get("items_per_second", entry.get("bytes_per_second", 0))
             timing = timings.setdefault(name, Timing())
             timing.cpu.append(cpu)
             timing.wall.append(wall)
