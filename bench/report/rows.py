@@ -81,7 +81,7 @@ def _elements():
     yield older("RMS of I/Q", "rms", ("VOLK", "volk", (2.8, None, 1.0)), ("MKL's dot product", "mkl_dot", (1.0, None, 1.0)),
                 ("reading", "limit", None))  # fmt: skip
     yield older("polynomial of degree 8", "polynomial", ("Eigen, fused", "eigen", (0.85, None, None)))
-    yield older("table lookup", "lookup", ("a scalar loop", "scalar", 3))
+    yield older("table lookup", "lookup", ("a scalar loop", "scalar", (3, 3, None)))  # 4M on two threads: below
     yield row("table lookup of 4M elements, two threads", "vector_bench", f"lookup/lumra/{4 * M}/process_time/real_time", (
         Peer("one thread", "lookup/lumra_in_pieces/process_time/real_time", 1.8),
     ), clock="wall")  # fmt: skip
