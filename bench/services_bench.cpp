@@ -199,9 +199,9 @@ BENCHMARK(resampler_block_step)->Unit(benchmark::kMicrosecond)->ComputeStatistic
 BENCHMARK(mkl_transforms_alone)->Unit(benchmark::kMicrosecond)->ComputeStatistics("best", best);
 
 const char *chosen_kernels() {
-  const auto *const chosen = &qsrfhs::kernels::active();
-  if (chosen == &qsrfhs::kernels::avx_kernels) return "AVX";
-  return chosen == &qsrfhs::kernels::baseline_kernels ? "baseline" : "others";
+  for (const qsrfhs::kernels::build &build : qsrfhs::kernels::builds())
+    if (build.exact == &qsrfhs::kernels::exact()) return build.name;
+  return "unknown";
 }
 
 }  // namespace

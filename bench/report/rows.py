@@ -104,6 +104,8 @@ def _elements():
     for kind in ("f32", "cf32", "f64", "cf64"):
         yield row(f"levels of {kind}", "open_level_bench", f"level/{kind}/{{}}/real_time",
                   (Peer("reading", f"read/{kind}/{{}}/real_time"),), (16384, 8 * M))  # fmt: skip
+        yield row(f"levels of {kind}, two threads", "open_level_bench", f"level on two threads/{kind}/{{}}/real_time",
+                  (Peer("one thread", f"level/{kind}/{{}}/real_time"),), (8 * M,), clock="wall")  # fmt: skip
 
 
 def _transforms():
