@@ -323,9 +323,7 @@ void load(bench &b) {
   for (unsigned k = 0; how > 1 && k <= b.in.choice(4); ++k)
     bytes[b.in.raw<std::uint16_t>() % bytes.size()] ^= static_cast<unsigned char>(1 + b.in.choice(255));
   if (how == 3) {
-    std::uint64_t sum = 0xcbf29ce484222325;
-    for (std::size_t k = 0; k < bytes.size() - 8; ++k) sum = (sum ^ bytes[k]) * 0x100000001b3;
-    std::memcpy(&bytes[bytes.size() - 8], &sum, 8);
+    seal(bytes);
   }
   const arrays none(b.in);
   lumra_iir *recursive = nullptr;

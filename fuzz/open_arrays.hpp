@@ -3,13 +3,23 @@
 
 #include <lumra/lumra.h>
 
+#include <cstring>
+#include <span>
 #include <vector>
 
 #include "input.hpp"
+#include "open/state.hpp"
 
 namespace fuzz {
 
 constexpr std::uint64_t huge = std::uint64_t{1} << 61;  // more elements of any type than memory can hold
+
+/// Gives a changed state the checksum that fits.
+inline void seal(std::vector<unsigned char> &state) noexcept {
+  const std::span<unsigned char> all(state);
+  const std::uint64_t sum = doors::checksum(std::as_bytes(all.first(all.size() - sizeof sum)));
+  std::memcpy(all.last(sizeof sum).data(), &sum, sizeof sum);
+}
 
 /// The arrays of one call, exactly as long as they are said to be. Some are null, or begin in another.
 class arrays {

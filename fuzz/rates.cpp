@@ -232,11 +232,7 @@ void reload(input &in, std::unique_ptr<stream> &of) {
   for (unsigned k = 0; k <= in.choice(3); ++k)
     damaged[(in.flag() ? in.byte() : in.raw<std::uint32_t>()) % damaged.size()] ^=
         static_cast<unsigned char>(1 + in.choice(255));
-  if (in.flag()) {
-    std::uint64_t sum = 0xcbf29ce484222325;
-    for (std::size_t k = 0; k + 8 < damaged.size(); ++k) sum = (sum ^ damaged[k]) * 0x100000001b3;
-    std::memcpy(&damaged[damaged.size() - 8], &sum, 8);
-  }
+  if (in.flag()) seal(damaged);
   if (const auto other = of->load(damaged)) (void)other->announced(in.byte());
   of = of->load(state);
   hold(of != nullptr && of->save() == state, "the state that was saved");

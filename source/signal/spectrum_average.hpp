@@ -117,8 +117,10 @@ void spectrum_average<Sample>::save(Writer &to) const {
   to.add_all(std::span<const Sample>(head_));
   to.add_all(std::span<const Sample>(tail_.data(), tail_count_));
   const auto add_row = [&](std::span<const real> row) {
-    std::copy(row.begin(), row.end(), scratch_.data());
-    segment_power<Sample>::order(scratch_.elements());
+    if (!to.only_counts()) {
+      std::copy(row.begin(), row.end(), scratch_.data());
+      segment_power<Sample>::order(scratch_.elements());
+    }
     to.add_all(std::span<const real>(scratch_.elements()));
   };
   for (const auto &tree : all.forest.trees()) {
