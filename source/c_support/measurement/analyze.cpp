@@ -100,18 +100,21 @@ std::int32_t windowed_fft(LumraAlgoSession &session, std::int32_t window_type, s
   // A refused resize is not reported: what fits into the output is written.
   (void)host::resize_vector(&out.y, fft_size, n * sizeof(float));
 
-  const qsrfhs::aligned_buffer<sample> work(n);
-  const qsrfhs::aligned_buffer<float> power(n);
-  std::fill_n(power.data(), n, 0.0F);
+  // One block for both, on lines of their own: asking for memory takes as long as a short transform.
+  constexpr std::size_t line = 64 / sizeof(sample);
+  const std::size_t work_room = (n + line - 1) / line * line;
+  const qsrfhs::aligned_buffer<sample> room(work_room + (n + 1) / 2);
+  const std::span<sample> work = room.elements().first(n);
+  auto *const power = reinterpret_cast<float *>(room.data() + work_room);
+  std::fill_n(power, n, 0.0F);
   const qsrfhs::fft_lease transform = session.context.transforms.acquire(n);
   const LumraAlgoSession::window window = session.find_window({fft_size, window_type}).value_or(nullptr);
 
-  const std::uint64_t segments = sum_segments(input, step, window.get(), *transform, work.elements(), power.data());
-  if (segments > 1)
-    qsrfhs::kernels::exact().scale(power.data(), static_cast<float>(1.0 / static_cast<double>(segments)), n);
+  const std::uint64_t segments = sum_segments(input, step, window.get(), *transform, work, power);
+  if (segments > 1) qsrfhs::kernels::exact().scale(power, static_cast<float>(1.0 / static_cast<double>(segments)), n);
 
   const std::span<float> result = host::elements(out.y);
-  std::copy_n(power.data(), std::min(n, result.size()), result.begin());
+  std::copy_n(power, std::min(n, result.size()), result.begin());
   const double sample_rate = 1.0 / in.dt;
   out.f0 = -sample_rate * 0.5;
   out.df = sample_rate / fft_size;
