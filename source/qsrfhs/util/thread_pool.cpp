@@ -162,9 +162,4 @@ void thread_pool::after_fork_in_child() noexcept {
   shared_->mutex.unlock();
 }
 
-void thread_pool::forget_tasks() noexcept {
-  const std::lock_guard lock(shared_->mutex);
-  shared_->tasks.clear();
-}
-
 }  // namespace ctpl

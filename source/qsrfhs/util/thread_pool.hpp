@@ -19,13 +19,8 @@ class thread_pool {
   thread_pool &operator=(const thread_pool &) = delete;
   ~thread_pool();
 
-  using job = std::function<void(std::int32_t)>;
-
-  /// Queues work that throws nothing. Throws the system's error where no worker can be started, std::bad_alloc.
-  void post(job added);
-
   /// Queues task(worker index); its result or exception arrives in the future. Throws the system's error where no
-  /// worker can be started.
+  /// worker can be started, std::bad_alloc.
   template <class Task>
   auto push(Task &&task) -> std::future<std::invoke_result_t<Task &, std::int32_t>> {
     using result = std::invoke_result_t<Task &, std::int32_t>;
@@ -49,12 +44,14 @@ class thread_pool {
   void before_fork() noexcept;
   void after_fork_in_parent() noexcept;
   void after_fork_in_child() noexcept;
-  /// Forgets the tasks that were queued: for the child of a fork, where who waits for them is not there.
-  void forget_tasks() noexcept;
 
  private:
   struct state;
   struct member;
+  using job = std::function<void(std::int32_t)>;
+
+  /// Queues work that throws nothing.
+  void post(job added);
 
   void finish() noexcept;
   static void start_missing(state &shared);
