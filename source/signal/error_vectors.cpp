@@ -35,8 +35,8 @@ void walk_carried(delayed_reference<Sample> &reference, const stretch &part, con
   });
 }
 
-/// sum(part) of the pieces of a stretch. The sums stand in the order of the pieces, which lie at fixed places: added like
-/// that, they have the same bits for any number of threads.
+/// sum(part) of the pieces of a stretch. The sums stand in the order of the pieces, which lie at fixed places: added in
+/// that order, they have the same bits for any number of threads.
 template <class Sum>
 auto sum_pieces(const stretch &all, std::size_t piece, std::size_t threads, Sum sum) {
   std::vector<decltype(sum(all))> sums((all.count() + piece - 1) / piece);
