@@ -11,8 +11,8 @@
  *
  * All return 0, or in the order of the checks: LUMRA_OUT_OF_RANGE, LUMRA_NULL_ARGUMENT of each array, from the first
  * argument to the last (a count of more elements than memory can hold; a null address); LUMRA_OVERLAP out. What a
- * function checks before that is said there. Any thread, and no other one works for the call: share long arrays by giving
- * each thread a part of them. */
+ * function checks before that is said there. Any thread, and no other one works for the call: share long arrays by
+ * giving each thread a part of them. */
 #ifndef LUMRA_ELEMENTWISE_H
 #define LUMRA_ELEMENTWISE_H
 

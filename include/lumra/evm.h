@@ -102,11 +102,12 @@ typedef struct lumra_evm_result {
  * each thread takes 20 MB.
  *
  * Return 0, or in the order of the checks: LUMRA_BAD_SIZE_FIELD options; LUMRA_UNKNOWN_CHOICE align; LUMRA_OUT_OF_RANGE
- * sample_rate_hz, threads, reserved, n; LUMRA_NULL_ARGUMENT reference, measured; LUMRA_NULL_ARGUMENT, LUMRA_BAD_SIZE_FIELD result;
- * LUMRA_OVERLAP; LUMRA_TOO_FEW_SAMPLES; LUMRA_OUT_OF_RANGE a reference of zeros; LUMRA_NO_CONVERGENCE where gain, delay
- * or frequency is asked for and the recordings seem unrelated (the best alignment leaves errors of ten times the
- * reference, or no less than unrelated noise of this length would), or where what is asked for cannot be told from each
- * other (delay and phase of a reference that is a tone); LUMRA_TRANSFORM_FAILED. Any thread. */
+ * sample_rate_hz, threads, reserved, n; LUMRA_NULL_ARGUMENT reference, measured; LUMRA_NULL_ARGUMENT,
+ * LUMRA_BAD_SIZE_FIELD result; LUMRA_OVERLAP; LUMRA_TOO_FEW_SAMPLES; LUMRA_OUT_OF_RANGE a reference of zeros;
+ * LUMRA_NO_CONVERGENCE where gain, delay or frequency is asked for and the recordings seem unrelated (the best
+ * alignment leaves errors of ten times the reference, or no less than unrelated noise of this length would), or where
+ * what is asked for cannot be told from each other (delay and phase of a reference that is a tone);
+ * LUMRA_TRANSFORM_FAILED. Any thread. */
 LUMRA_EXPORT lumra_status lumra_evm_measure_cf32(const lumra_cf32 *reference, const lumra_cf32 *measured, uint64_t n,
                                                  const lumra_evm_options *options, lumra_evm_result *result,
                                                  lumra_cf32 *error, float *magnitude, float *phase);

@@ -141,8 +141,8 @@ LUMRA_EXPORT int32_t qsUtilHS_RMS_IQ_with_peak_calc(lumra_cf32_array x, float *r
  *              element is ignored; without a whole entry the output is zeros
  * start, step  key of entry 0, distance of the keys; step may be negative or NaN
  *
- * From 65537 samples on, the work is done in n / 32768 parts, at most 4: the last by the caller, the others meanwhile by
- * threads of the library, which are started at the first such call and end with the process.
+ * From 65537 samples on, the caller and threads of the library share the work: n / 32768 parts, at most 4, the last of
+ * which is the caller's. The threads are started at the first such call and end with the process.
  *
  * Returns 0, or in the order of the checks
  *   -380127    table or its block null, its count 0, or step 0; not recorded
