@@ -66,7 +66,7 @@ inline void scale(std::int32_t n, double a, std::complex<double> *x) noexcept {
 /// out[k] = conj(x[n - 1 - k]); x and out share no memory.
 inline void reverse_conjugate(const std::complex<float> *x, std::complex<float> *out, std::int64_t n) noexcept {
   qsrfhs::kernels::exact().reverse_conjugate(reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out),
-                                              static_cast<std::size_t>(n));
+                                             static_cast<std::size_t>(n));
 }
 template <class T>
 void reverse_conjugate(const T *x, T *out, std::int64_t n) noexcept {
@@ -76,7 +76,7 @@ void reverse_conjugate(const T *x, T *out, std::int64_t n) noexcept {
 /// a[k] *= b[k]; a and b may be the same.
 inline void multiply(std::complex<float> *a, const std::complex<float> *b, std::int64_t n) noexcept {
   qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b),
-                                     static_cast<std::size_t>(n));
+                                    static_cast<std::size_t>(n));
 }
 inline void multiply(std::complex<double> *a, const std::complex<double> *b, std::int64_t n) noexcept {
   for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);
@@ -95,7 +95,7 @@ inline void convolve(const double *x, std::span<const double> taps, std::size_t 
 inline void scaled_power(const std::complex<float> *x, float *out, float *mirror, double factor,
                          std::int64_t n) noexcept {
   qsrfhs::kernels::exact().scaled_power(reinterpret_cast<const float *>(x), out, mirror, factor,
-                                         static_cast<std::size_t>(n));
+                                        static_cast<std::size_t>(n));
 }
 inline void scaled_power(const std::complex<double> *x, double *out, double *mirror, double factor,
                          std::int64_t n) noexcept {

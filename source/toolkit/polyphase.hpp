@@ -44,7 +44,7 @@ inline void polyphase(const tap_place<float> *places, std::int64_t outputs, cons
 inline void polyphase(const tap_place<float> *places, std::int64_t outputs, const tap_rows<float> &rows,
                       const std::complex<float> *x, std::complex<float> *out) noexcept {
   qsrfhs::kernels::exact().complex_polyphase(places, static_cast<std::size_t>(outputs), rows,
-                                              reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
+                                             reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
 }
 
 inline void stretched(const tap_place<float> *places, std::int64_t outputs, const tap_offsets &taps, const float *x,
@@ -54,7 +54,7 @@ inline void stretched(const tap_place<float> *places, std::int64_t outputs, cons
 inline void stretched(const tap_place<float> *places, std::int64_t outputs, const tap_offsets &taps,
                       const std::complex<float> *x, std::complex<float> *out) noexcept {
   qsrfhs::kernels::exact().complex_stretched(places, static_cast<std::size_t>(outputs), taps,
-                                              reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
+                                             reinterpret_cast<const float *>(x), reinterpret_cast<float *>(out));
 }
 
 }  // namespace toolkit

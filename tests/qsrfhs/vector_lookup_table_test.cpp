@@ -64,8 +64,8 @@ struct long_call {
       keys.elements()[i] = static_cast<float>(i % 1000) * 0.01F - 1;
       in.elements()[i] = {static_cast<float>(i % 77), static_cast<float>(i % 31) - 15};
     }
-    qsrfhs::kernels::exact().lookup({&table.elements()[0].re, 4, 0.5F, 2}, keys.elements().data(),
-                                     &in.elements()[0].re, expected.data(), n);
+    qsrfhs::kernels::exact().lookup({&table.elements()[0].re, 4, 0.5F, 2}, keys.elements().data(), &in.elements()[0].re,
+                                    expected.data(), n);
   }
   bool run() {
     std::memset(out.elements().data(), 0x55, out.elements().size_bytes());
