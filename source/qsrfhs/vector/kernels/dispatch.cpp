@@ -47,7 +47,7 @@ struct trial {
 };
 
 /// Whether the wide build is clearly slower than the other one: by a tenth, each at its best of several turns. Takes
-/// some 50 microseconds.
+/// a tenth of a millisecond.
 bool is_slower(const build &wide, const build &narrow) noexcept {
   using clock = std::chrono::steady_clock;
   constexpr int turns = 12, passes = 4;
