@@ -21,7 +21,7 @@ namespace {
 /// out[k] = x[k] gains[k] factor; each gain stands twice.
 void weigh_and_rotate(const std::complex<float> *x, const float *gains, std::complex<double> factor,
                       std::complex<float> *out, std::size_t n) noexcept {
-  qsrfhs::kernels::fused().weigh_and_rotate(reinterpret_cast<const float *>(x), gains,
+  qsrfhs::kernels::exact().weigh_and_rotate(reinterpret_cast<const float *>(x), gains,
                                             static_cast<float>(factor.real()), static_cast<float>(factor.imag()),
                                             reinterpret_cast<float *>(out), n);
 }

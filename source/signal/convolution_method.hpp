@@ -45,10 +45,10 @@ inline constexpr std::size_t readable = 32;
 
 /// a[k] *= b[k].
 inline void multiply_bins(std::complex<float> *a, const std::complex<float> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::fused().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
+  qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
 }
 inline void multiply_bins(std::complex<double> *a, const std::complex<double> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::fused().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
+  qsrfhs::kernels::exact().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
 }
 
 // Costs in multiply-adds of real taps and samples in single precision, which are done eight at a time. The constants
