@@ -22,12 +22,11 @@ std::size_t width_of(std::size_t order) noexcept {
 }
 
 std::size_t plan_size(const recursion_coefficients &stage) noexcept {
-  return 8 * stage.reverse_order() + 32;
+  return 8 * stage.reverse_order() + block * block;
 }
 
 block_recursion plan_at(const recursion_coefficients &stage, const double *memory) noexcept {
-  const double *const own = memory + 8 * stage.reverse_order();
-  return {stage.reverse_order(), memory, own, own + 16};
+  return {stage.reverse_order(), memory, memory + 8 * stage.reverse_order()};
 }
 
 /// The next eight outputs of the recursion alone, from the outputs before, newest first, and one first sample.
@@ -53,12 +52,8 @@ void fill_plan(const recursion_coefficients &stage, double *memory) {
     memory = std::copy_n(respond(stage, past, 0).begin(), block, memory);
   }
   const auto h = respond(stage, std::vector<long double>(order), 1);
-  for (std::size_t i = 0; i < 4; ++i) {
-    for (std::size_t k = 0; k < 4; ++k) {
-      memory[4 * i + k] = k >= i ? h[k - i] : 0.0;
-      memory[16 + 4 * i + k] = h[4 + k - i];
-    }
-  }
+  for (std::size_t i = 0; i < block; ++i)
+    for (std::size_t k = 0; k < block; ++k) memory[block * i + k] = k >= i ? h[k - i] : 0.0;
 }
 
 using planes = std::array<double *, 2>;

@@ -66,8 +66,7 @@ constexpr int complex_tap_order[8] = {0, 1, 4, 5, 2, 3, 6, 7};
 struct block_recursion {
   std::size_t order;
   const double *responses;  // order x 8: what the outputs before, newest first, leave in the block's outputs
-  const double *own;        // 4 x 4: what each of four samples adds to the outputs at their places, 0 in front of it
-  const double *later;      // 4 x 4: what each of the first four samples adds to the last four outputs
+  const double *shares;     // 8 x 8: what each sample adds to the outputs, 0 to those in front of it
 };
 
 /// Angles of a table, all turned by one.

@@ -267,3 +267,14 @@ static inline bool all_below(d4 a, d4 least) {
   const __m256d size = _mm256_andnot_pd(_mm256_set1_pd(-0.0), a.v);
   return _mm256_movemask_pd(_mm256_cmp_pd(size, least.v, _CMP_LT_OQ)) == 0xf;
 }
+
+/// Lane 3 - k, four times.
+template <int k>
+static inline d4 broadcast_newest(d4 a) {
+  constexpr int lane = 3 - k;
+  return {_mm256_permute_pd(_mm256_permute2f128_pd(a.v, a.v, lane < 2 ? 0x00 : 0x11), lane % 2 != 0 ? 0xf : 0x0)};
+}
+/// Whether the last four lanes are smaller than `least`.
+static inline bool newest_are_below(d4 a, double least) {
+  return all_below(a, d4::broadcast(least));
+}

@@ -220,3 +220,14 @@ static inline d8 subtract_and_add(d8 a, d8 b) {
   const __m512d signs = _mm512_setr_pd(-0.0, 0.0, -0.0, 0.0, -0.0, 0.0, -0.0, 0.0);
   return {_mm512_add_pd(a.v, _mm512_xor_pd(b.v, signs))};
 }
+
+/// Lane 7 - k, eight times.
+template <int k>
+static inline d8 broadcast_newest(d8 a) {
+  return {_mm512_permutexvar_pd(_mm512_set1_epi64(7 - k), a.v)};
+}
+/// Whether the last four lanes are smaller than `least`.
+static inline bool newest_are_below(d8 a, double least) {
+  const __m512d size = _mm512_abs_pd(a.v);
+  return (_mm512_cmp_pd_mask(size, _mm512_set1_pd(least), _CMP_LT_OQ) & 0xf0) == 0xf0;
+}

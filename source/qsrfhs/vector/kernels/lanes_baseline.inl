@@ -278,3 +278,15 @@ static inline bool all_below(d4 a, d4 least) {
   const __m128d high = _mm_cmplt_pd(_mm_andnot_pd(sign, a.high), least.high);
   return _mm_movemask_pd(_mm_and_pd(low, high)) == 3;
 }
+
+/// Lane 3 - k, four times.
+template <int k>
+static inline d4 broadcast_newest(d4 a) {
+  const __m128d half = k < 2 ? a.high : a.low;
+  const __m128d both = k % 2 == 0 ? _mm_unpackhi_pd(half, half) : _mm_unpacklo_pd(half, half);
+  return {both, both};
+}
+/// Whether the last four lanes are smaller than `least`.
+static inline bool newest_are_below(d4 a, double least) {
+  return all_below(a, d4::broadcast(least));
+}
