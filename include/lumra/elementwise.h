@@ -5,9 +5,10 @@
  * "In place": out may be one of the named arrays, from the same address on. All other overlaps with out are refused.
  *
  * Every operation is rounded by itself in the type of the samples, so that results are the same on all processors, but
- * for logarithms, whose last bit may differ between models of processors, and polynomials, which say so. Zeros, denormals, infinities and NaNs take
- * part like any other value and are never an error. Squared magnitudes are not scaled: they leave the range where parts
- * exceed 1.8e19 (single precision; 1.3e154 in double), and lose accuracy where both are below 1.1e-19 (1.5e-154).
+ * for logarithms, whose last bit may differ between models of processors, and polynomials, which say so. Zeros,
+ * denormals, infinities and NaNs take part like any other value and are never an error. Squared magnitudes are not
+ * scaled: they leave the range where parts exceed 1.8e19 (single precision; 1.3e154 in double), and lose accuracy where
+ * both are below 1.1e-19 (1.5e-154).
  *
  * All return 0, or in the order of the checks: LUMRA_OUT_OF_RANGE, LUMRA_NULL_ARGUMENT of each array, from the first
  * argument to the last (a count of more elements than memory can hold; a null address); LUMRA_OVERLAP out. What a
@@ -80,9 +81,9 @@ LUMRA_EXPORT lumra_status lumra_log2_power_cf64(const lumra_cf64 *x, double a, d
 /* Polynomials: out[i] = c[0] + c[1] x[i] + ... + c[m - 1] x[i]^(m - 1), by Horner's scheme from c[m - 1] on. In place:
  * x, where it is of the type of out. "of_real": x is real, c and out are complex.
  *
- * Of real x in single precision each product is added before it is rounded where the processor has fused operations, and
- * rounded first where not: results are the same on all processors that have them, at every place in an array, and within
- * 2 m units of rounding (2^-24) of the sum of the terms' magnitudes.
+ * Of real x in single precision each product is added before it is rounded where the processor has fused operations,
+ * and rounded first where not: results are the same on all processors that have them, at every place in an array, and
+ * within 2 m units of rounding (2^-24) of the sum of the terms' magnitudes.
  *
  * c  m coefficients
  * m  1 or more

@@ -43,7 +43,8 @@
  * Results do not depend on how a stream was cut into calls, on the number of threads, or on which build of the loops
  * the processor gets, but where a header says so. The last bits of a Fourier transform may differ between models of
  * processors, those of filters with fixed taps, convolutions, resamplers and channels between processors with fused
- * multiply-add and those without. NaN and infinity follow IEEE arithmetic: they spoil the results they enter, not the object.
+ * multiply-add and those without. NaN and infinity follow IEEE arithmetic: they spoil the results they enter, not the
+ * object.
  *
  * Units stand on every value: seconds, hertz, cycles per sample, dB of full scale. A power is that of the samples: a
  * complex tone of amplitude 1 has power 1. */

@@ -1,7 +1,8 @@
 // Saved states: what streams or accumulates, as bytes that can be loaded in another process or on another machine.
 //
 // 8 bytes "lumra" and the kind of object, 4 bytes version, 4 bytes version of the frame, 8 bytes count of the payload,
-// the payload, 8 bytes checksum of all before. Numbers are little-endian, as every processor that the library runs on has them.
+// the payload, 8 bytes checksum of all before. Numbers are little-endian, as every processor that the library runs on
+// has them.
 // SPDX-License-Identifier: MIT
 #pragma once
 

@@ -1,7 +1,8 @@
 // Horner's scheme. SPDX-License-Identifier: MIT
 
 /// How many samples of a real polynomial are evaluated. With few enough coefficients all n; otherwise only those that
-/// the blocks of 16 leave over, in all builds but the baseline also those in front of the first boundary of 32 bytes in the output.
+/// the blocks of 16 leave over, in all builds but the baseline also those in front of the first boundary of
+/// 32 bytes in the output.
 static std::size_t polynomial_reach(const float *out, std::size_t n, std::size_t m) {
   if (m <= polynomial_coefficients) return n;
   std::size_t lead = 0;
