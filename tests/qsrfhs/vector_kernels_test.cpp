@@ -361,7 +361,7 @@ void check(const rooms &in, products how, const operation &op, std::size_t n, pl
 }
 
 std::vector<std::size_t> lengths() {
-  std::vector<std::size_t> all = {63, 64, 65, 127, 1003};
+  std::vector<std::size_t> all = {63, 64, 65, 127, 1031};  // the last begins at a boundary of the output
   for (std::size_t n = 0; n <= 3 * 16 + 1; ++n) all.push_back(n);
   return all;
 }

@@ -34,41 +34,58 @@ static inline void copy_values(const Real *from, Real *to, std::size_t n) {
 
 /// Whole blocks of `groups` groups, from element k on. Where it ended.
 template <class Put, std::size_t groups, class Step, class Real>
-static inline std::size_t go_over_blocks(const Step &step, const Real *x, const Real *y, Real *out, std::size_t k,
-                                         std::size_t n) {
+[[gnu::flatten]] static inline std::size_t go_over_blocks(const Step &step, const Real *x, const Real *y, Real *out,
+                                                          std::size_t k, std::size_t n) {
   constexpr std::size_t block = groups * wide::lanes;
   for (; k + block <= n; k += block)
     step.template run<Put, groups>(x + k * Step::x_width, y + k * Step::y_width, out + k * Step::out_width);
   return k;
 }
 
-template <class Put, class Step, class Real>
-static inline void go_over(const Step &step, const Real *x, const Real *y, Real *out, std::size_t n) {
-  std::size_t k = go_over_blocks<Put, Step::groups>(step, x, y, out, 0, n);
-  if constexpr (Step::groups > 1) k = go_over_blocks<Put, 1>(step, x, y, out, k, n);
-  if (k == n) return;
-  // The rest is padded to a group, with ones: they raise no floating-point exception.
-  const std::size_t rest = n - k;
+/// At most a group of elements, padded to it with ones, which raise no floating-point exception.
+template <class Step, class Real>
+[[gnu::noinline]] static void go_over_few(const Step &step, const Real *x, const Real *y, Real *out, std::size_t n) {
   Real xs[2 * wide::lanes], ys[2 * wide::lanes], outs[2 * wide::lanes];
   for (std::size_t i = 0; i < 2 * wide::lanes; ++i) xs[i] = ys[i] = 1;
-  copy_values(x + k * Step::x_width, xs, rest * Step::x_width);
-  copy_values(y + k * Step::y_width, ys, rest * Step::y_width);
+  copy_values(x, xs, n * Step::x_width);
+  copy_values(y, ys, n * Step::y_width);
   step.template run<into_caches, 1>(xs, ys, outs);
-  copy_values(outs, out + k * Step::out_width, rest * Step::out_width);
+  copy_values(outs, out, n * Step::out_width);
 }
 
-/// Outputs past the caches pay where they are complex and lie on the boundary that such stores need. Gathering whole
-/// lines for others costs more than it saves, and lines of an output that is an input are in the caches anyway.
+template <class Put, class Step, class Real>
+static inline void go_over(const Step &step, const Real *x, const Real *y, Real *out, std::size_t n,
+                           std::size_t first = 0) {
+  std::size_t k = go_over_blocks<Put, Step::groups>(step, x, y, out, first, n);
+  if constexpr (Step::groups > 1) k = go_over_blocks<Put, 1>(step, x, y, out, k, n);
+  if (k < n) go_over_few(step, x + k * Step::x_width, y + k * Step::y_width, out + k * Step::out_width, n - k);
+}
+
+/// Elements of the output in front of the first that lies on a boundary of registers; none where no element does, and
+/// in short calls, which do not earn that back.
+template <class Step>
+static inline std::size_t in_front_of_boundary(const float *out, std::size_t n) {
+  constexpr std::size_t boundary = sizeof(float) * wide::lanes, element = sizeof(float) * Step::out_width;
+  const std::size_t past = reinterpret_cast<std::size_t>(out) % boundary;
+  return past == 0 || past % element || n < 1024 ? 0 : (boundary - past) / element;
+}
+
+/// Outputs past the caches pay where they are complex. Gathering whole lines for others costs more than it saves, and
+/// lines of an output that is an input are in the caches anyway.
 template <class Step>
 static inline bool passes_caches(const float *x, const float *y, const float *out, std::size_t n) {
   constexpr std::size_t bytes = sizeof(float) * (Step::x_width + Step::y_width + Step::out_width);
-  return Step::out_width == 2 && n >= streaming_bytes / bytes && reinterpret_cast<std::size_t>(out) % 32 == 0 &&
-         out != x && out != y;
+  return Step::out_width == 2 && n >= streaming_bytes / bytes && out != x && out != y &&
+         reinterpret_cast<std::size_t>(out) % 8 == 0;
 }
 
+/// A record, in groups that begin where the output lies on a boundary: no store is split between two lines of the
+/// caches, and no load of inputs that lie as the output does, as most allocators place them.
 template <class Step>
 static inline void run(const Step &step, const float *x, const float *y, float *out, std::size_t n) {
-  if (!passes_caches<Step>(x, y, out, n)) return go_over<into_caches>(step, x, y, out, n);
-  go_over<past_caches>(step, x, y, out, n);
+  const std::size_t first = in_front_of_boundary<Step>(out, n);
+  if (first) go_over_few(step, x, y, out, first);
+  if (!passes_caches<Step>(x, y, out, n)) return go_over<into_caches>(step, x, y, out, n, first);
+  go_over<past_caches>(step, x, y, out, n, first);
   _mm_sfence();
 }
