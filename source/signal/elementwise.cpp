@@ -9,7 +9,6 @@
 #include <type_traits>
 
 #include "qsrfhs/math/mkl_runtime.hpp"
-#include "qsrfhs/util/aligned_buffer.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
 
 namespace dsp {
@@ -219,34 +218,29 @@ gain_place<Real> place_of(Real t, std::size_t m) noexcept {
 
 template <class Real>
 void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
-             std::span<std::complex<Real>> out) {
+             std::span<std::complex<Real>> out) noexcept {
   const auto gains = table.gains;
-  // The kernel takes entries of gain and slope, which are worth making for as many keys.
-  if (std::is_same_v<Real, float> && gains.size() <= out.size()) {
-    qsrfhs::aligned_buffer<std::complex<Real>> entries(2 * gains.size());
-    for (std::size_t k = 0; k < gains.size(); ++k) {
-      entries.data()[2 * k] = gains[k];
-      entries.data()[2 * k + 1] = k + 1 < gains.size() ? gains[k + 1] - gains[k] : 0;
+  if constexpr (std::is_same_v<Real, float>) {
+    const std::complex<Real> alone[] = {gains.front(), gains.front()};
+    const auto entries = gains.size() > 1 ? gains : std::span<const std::complex<Real>>(alone);
+    exact().lookup_between({parts(entries), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
+                           parts(x), parts(out), out.size());
+  } else {
+    const Real inverse_step = 1 / table.step;
+    const Real *const in = parts(x), *const values = parts(gains);
+    Real *const result = parts(out);
+    for (std::size_t i = 0; i < out.size(); ++i) {
+      const auto place = place_of((keys[i] - table.start) * inverse_step, gains.size());
+      const Real *const low = values + 2 * place.k, *const high = low + 2;
+      Real g_re = low[0], g_im = low[1];
+      if (place.between) {
+        g_re = place.fraction * (high[0] - g_re) + g_re;
+        g_im = place.fraction * (high[1] - g_im) + g_im;
+      }
+      const Real re = in[2 * i], im = in[2 * i + 1];
+      result[2 * i] = g_re * re - g_im * im;
+      result[2 * i + 1] = g_re * im + g_im * re;
     }
-    if constexpr (std::is_same_v<Real, float>)
-      exact().lookup({parts(entries.elements()), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
-                     parts(x), parts(out), out.size());
-    return;
-  }
-  const Real inverse_step = 1 / table.step;
-  const Real *const in = parts(x), *const values = parts(gains);
-  Real *const result = parts(out);
-  for (std::size_t i = 0; i < out.size(); ++i) {
-    const auto place = place_of((keys[i] - table.start) * inverse_step, gains.size());
-    const Real *const low = values + 2 * place.k, *const high = low + 2;
-    Real g_re = low[0], g_im = low[1];
-    if (place.between) {
-      g_re = place.fraction * (high[0] - g_re) + g_re;
-      g_im = place.fraction * (high[1] - g_im) + g_im;
-    }
-    const Real re = in[2 * i], im = in[2 * i + 1];
-    result[2 * i] = g_re * re - g_im * im;
-    result[2 * i + 1] = g_re * im + g_im * re;
   }
 }
 
@@ -264,7 +258,7 @@ void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, 
   template void log2(std::span<const T>, T, T, std::span<T>) noexcept;                                                 \
   template void polynomial(std::span<const T>, std::span<const std::complex<T>>, std::span<std::complex<T>>) noexcept; \
   template void look_up(std::span<const std::complex<T>>, std::span<const T>, const gain_table<T> &,                   \
-                        std::span<std::complex<T>>);
+                        std::span<std::complex<T>>) noexcept;
 LUMRA_FOR_REAL_TYPE(float)
 LUMRA_FOR_REAL_TYPE(double)
 

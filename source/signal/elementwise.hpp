@@ -42,9 +42,9 @@ struct gain_table {
   Real start, step;
 };
 
-/// out = x times the gain at its key, interpolated. Throws std::bad_alloc.
+/// out = x times the gain at its key, interpolated.
 template <class Real>
 void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
-             std::span<std::complex<Real>> out);
+             std::span<std::complex<Real>> out) noexcept;
 
 }  // namespace dsp

@@ -180,6 +180,28 @@ void define_lookup(const qsrfhs::kernels::lookup_table &table, float key, const 
   out[1] = im;
 }
 
+/// The gains of a table alone, as floats; one gain stands there twice.
+std::vector<float> gains_of(const qsrfhs::kernels::lookup_table &table) {
+  std::vector<float> gains;
+  for (int k = 0; k < std::max(table.count, 2); ++k) {
+    const float *const entry = table.entries + 4 * std::min(k, table.count - 1);
+    gains.insert(gains.end(), entry, entry + 2);
+  }
+  return gains;
+}
+
+/// The same table with the differences of its gains for slopes.
+std::vector<float> slopes_of(const qsrfhs::kernels::lookup_table &table) {
+  const std::vector<float> gains = gains_of(table);
+  std::vector<float> entries;
+  for (std::size_t k = 0; k < 2 * static_cast<std::size_t>(table.count); k += 2) {
+    const bool between = k + 2 < gains.size();
+    for (const std::size_t part : {k, k + 1}) entries.push_back(gains[part]);
+    for (const std::size_t part : {k, k + 1}) entries.push_back(between ? gains[part + 2] - gains[part] : 0);
+  }
+  return entries;
+}
+
 /// The loops around transforms. Those that work on their output itself find x there.
 void add_transform_loops(std::vector<operation> &all, products how) {
   const auto window = [](auto x, auto w, auto out) { out[0] = x[0] * *w, out[1] = x[1] * *w; };
@@ -328,6 +350,13 @@ std::vector<operation> operations(products how) {
     table.entries = at_a_page({entries.begin(), entries.begin() + 4 * table.count});
     all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
                    [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
+    all.push_back({"lookup_between", 1, 2, 2,
+                   [=, p = at_a_page(gains_of(table))](auto &t, auto x, auto y, auto out, auto n) {
+                     t.lookup_between({p, table.count, table.start, table.step}, x, y, out, n);
+                   },
+                   [=, with_slopes = at_a_page(slopes_of(table))](auto x, auto y, auto out) {
+                     define_lookup({with_slopes, table.count, table.start, table.step}, *x, y, out);
+                   }});
   }
   add_transform_loops(all, how);
   return all;

@@ -44,6 +44,7 @@ static constexpr kernel_table table = {
     .sum_power = &sum_power,
     .sum_power_and_peak = &sum_power_and_peak,
     .lookup = &lookup,
+    .lookup_between = &lookup_between,
     .weigh = &weigh,
     .weigh_and_rotate = &weigh_and_rotate,
     .polyphase = &polyphase,

@@ -12,7 +12,7 @@
 
 namespace qsrfhs::kernels {
 
-/// Gains at keys start + k * step. An entry is a value and its slope for one step, both complex.
+/// Gains at keys start + k * step. An entry is a value and its slope for one step, both complex, or a value.
 struct lookup_table {
   const float *entries;
   int count;  // of entries, at least 1
@@ -134,6 +134,8 @@ struct kernel_table {
 
   /// out[k] = in[k] * (gain at keys[k]), n complex.
   void (*lookup)(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n);
+  /// The same, where an entry is a gain alone and the slope the difference to the next; of one gain there are two alike.
+  void (*lookup_between)(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n);
 
   /// out[k] = x[k] * w[k], real parts and imaginary parts each with their own weight, n complex.
   void (*weigh)(const float *x, const float *w, float *out, std::size_t n);

@@ -139,8 +139,9 @@ static inline void join(f8 re, f8 im, f8 &a, f8 &b) {
 }
 
 /// Rows of four floats by index, turned into four columns.
+template <std::size_t stride>
 static inline void load_columns(const float *rows, const int *index, f8 *columns) {
-  const auto row = [=](int i) { return rows + 4 * static_cast<std::size_t>(index[i]); };
+  const auto row = [=](int i) { return rows + stride * static_cast<std::size_t>(index[i]); };
   const __m256 r0 = load_halves(row(0), row(4)), r1 = load_halves(row(1), row(5));
   const __m256 r2 = load_halves(row(2), row(6)), r3 = load_halves(row(3), row(7));
   const __m256d a = _mm256_castps_pd(_mm256_unpacklo_ps(r0, r1)), b = _mm256_castps_pd(_mm256_unpacklo_ps(r2, r3));

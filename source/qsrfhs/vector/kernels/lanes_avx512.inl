@@ -29,10 +29,9 @@ using wide_mask = mask16;
 static inline void store(float *p, f16 a) {
   _mm512_storeu_ps(p, a.v);
 }
-/// Stores past the caches; p lies on a boundary of 32 bytes.
+/// Stores past the caches; p lies on a boundary of 64 bytes.
 static inline void stream(float *p, f16 a) {
-  _mm256_stream_ps(p, _mm512_castps512_ps256(a.v));
-  _mm256_stream_ps(p + 8, _mm512_extractf32x8_ps(a.v, 1));
+  _mm512_stream_ps(p, a.v);
 }
 
 static inline f16 swap_pairs(f16 a) {
@@ -111,8 +110,9 @@ static inline void join(f16 re, f16 im, f16 &a, f16 &b) {
 }
 
 /// Rows of four floats by index, turned into four columns.
+template <std::size_t stride>
 static inline void load_columns(const float *rows, const int *index, f16 *columns) {
-  const auto row = [=](int i) { return _mm_loadu_ps(rows + 4 * static_cast<std::size_t>(index[i])); };
+  const auto row = [=](int i) { return _mm_loadu_ps(rows + stride * static_cast<std::size_t>(index[i])); };
   const auto four_rows = [=](int i) {
     const __m512 two = _mm512_insertf32x4(_mm512_castps128_ps512(row(i)), row(i + 4), 1);
     return _mm512_insertf32x4(_mm512_insertf32x4(two, row(i + 8), 2), row(i + 12), 3);

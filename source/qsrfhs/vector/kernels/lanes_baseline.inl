@@ -135,8 +135,9 @@ static inline void join(f8 re, f8 im, f8 &a, f8 &b) {
 }
 
 /// Four rows of four floats by index, turned into columns.
+template <std::size_t stride>
 static inline void load_four_columns(const float *rows, const int *index, __m128 *columns) {
-  const auto row = [=](int i) { return _mm_loadu_ps(rows + 4 * static_cast<std::size_t>(index[i])); };
+  const auto row = [=](int i) { return _mm_loadu_ps(rows + stride * static_cast<std::size_t>(index[i])); };
   const __m128 r0 = row(0), r1 = row(1), r2 = row(2), r3 = row(3);
   const __m128 a = _mm_unpacklo_ps(r0, r1), b = _mm_unpacklo_ps(r2, r3);
   const __m128 c = _mm_unpackhi_ps(r0, r1), d = _mm_unpackhi_ps(r2, r3);
@@ -147,10 +148,11 @@ static inline void load_four_columns(const float *rows, const int *index, __m128
 }
 
 /// Rows of four floats by index, turned into four columns.
+template <std::size_t stride>
 static inline void load_columns(const float *rows, const int *index, f8 *columns) {
   __m128 low[4], high[4];
-  load_four_columns(rows, index, low);
-  load_four_columns(rows, index + 4, high);
+  load_four_columns<stride>(rows, index, low);
+  load_four_columns<stride>(rows, index + 4, high);
   for (int i = 0; i < 4; ++i) columns[i] = {low[i], high[i]};
 }
 
