@@ -61,12 +61,14 @@ static inline void go_over(const Step &step, const Real *x, const Real *y, Real 
   if (k < n) go_over_few(step, x + k * Step::x_width, y + k * Step::y_width, out + k * Step::out_width, n - k);
 }
 
-/// Elements of the output in front of the first that lies on a boundary of registers; none where no element does, and
-/// in short calls, which do not earn that back.
+/// Elements in front of the first at which the array with the most bytes an element lies on a boundary of registers, the
+/// output or else x; none where no element does, and in short calls, which do not earn that back.
 template <class Step>
-static inline std::size_t in_front_of_boundary(const float *out, std::size_t n) {
-  constexpr std::size_t boundary = sizeof(float) * wide::lanes, element = sizeof(float) * Step::out_width;
-  const std::size_t past = reinterpret_cast<std::size_t>(out) % boundary;
+static inline std::size_t in_front_of_boundary(const float *x, const float *out, std::size_t n) {
+  constexpr bool by_x = Step::x_width > Step::out_width;
+  constexpr std::size_t boundary = sizeof(float) * wide::lanes;
+  constexpr std::size_t element = sizeof(float) * (by_x ? Step::x_width : Step::out_width);
+  const std::size_t past = reinterpret_cast<std::size_t>(by_x ? x : out) % boundary;
   return past == 0 || past % element || n < 1024 ? 0 : (boundary - past) / element;
 }
 
@@ -79,11 +81,11 @@ static inline bool passes_caches(const float *x, const float *y, const float *ou
          reinterpret_cast<std::size_t>(out) % 8 == 0;
 }
 
-/// A record, in groups that begin where the output lies on a boundary: no store is split between two lines of the
-/// caches, and no load of inputs that lie as the output does, as most allocators place them.
+/// A record, in groups that begin on a boundary, so that fewer loads and stores are split between two lines of the
+/// caches: most allocators place all arrays alike, 16 bytes behind one.
 template <class Step>
 static inline void run(const Step &step, const float *x, const float *y, float *out, std::size_t n) {
-  const std::size_t first = in_front_of_boundary<Step>(out, n);
+  const std::size_t first = in_front_of_boundary<Step>(x, out, n);
   if (first) go_over_few(step, x, y, out, first);
   if (!passes_caches<Step>(x, y, out, n)) return go_over<into_caches>(step, x, y, out, n, first);
   go_over<past_caches>(step, x, y, out, n, first);
