@@ -6,6 +6,7 @@
 #include <lumra/lumra.hpp>
 
 #include <algorithm>
+#include <barrier>
 #include <cmath>
 #include <complex>
 #include <cstdlib>
@@ -13,6 +14,7 @@
 #include <new>
 #include <numbers>
 #include <random>
+#include <thread>
 #include <vector>
 
 #if defined(LUMRA_PEER_FFTW) && defined(LUMRA_PEER_VOLK)
@@ -71,6 +73,31 @@ void lumra_accumulator(benchmark::State &state) {
       {.points = static_cast<std::uint64_t>(state.range(0)), .threads = static_cast<std::uint32_t>(state.range(1))});
   for (int i = 0; i < 4; ++i) average.add(input().elements());  // its memory and its threads are there
   for (auto _ : state) average.add(input().elements());
+  report(state, count);
+}
+
+// What two threads of this machine can give at most: each has an accumulator and half of the samples of its own.
+void lumra_accumulators_side_by_side(benchmark::State &state) {
+  const auto accumulator = [&] {
+    return lumra::spectrum_average<sample>({.points = static_cast<std::uint64_t>(state.range(0)), .threads = 1});
+  };
+  const auto samples = input().elements();
+  auto here = accumulator(), there = accumulator();
+  std::barrier both(2);
+  bool ended = false;
+  std::jthread other([&] {
+    for (both.arrive_and_wait(); !ended; both.arrive_and_wait()) {
+      there.add(samples.last(count / 2));
+      both.arrive_and_wait();
+    }
+  });
+  for (auto _ : state) {
+    both.arrive_and_wait();
+    here.add(samples.first(count / 2));
+    both.arrive_and_wait();
+  }
+  ended = true;
+  both.arrive_and_wait();
   report(state, count);
 }
 
@@ -190,6 +217,7 @@ BENCHMARK(lumra_accumulator)
     ->MeasureProcessCPUTime()
     ->UseRealTime()
     ->ComputeStatistics("best", best);
+BENCHMARK(lumra_accumulators_side_by_side) SIZES->UseRealTime();
 BENCHMARK(lumra_accumulator_saved)->Arg(1024)->Arg(4096);
 BENCHMARK(lumra_accumulator_merged)->Arg(1024)->Arg(4096);
 BENCHMARK(mkl_transforms_alone) SIZES;

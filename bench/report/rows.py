@@ -57,6 +57,7 @@ def _spectra():
     ), points, drawn)  # fmt: skip
     yield row("the same as an accumulator, two threads", program, "lumra_accumulator/{}/2/process_time/real_time", (
         Peer("one thread", "lumra_accumulator/{}/1/process_time/real_time", 1.9),
+        Peer("two accumulators side by side", "lumra_accumulators_side_by_side/{}/real_time"),
     ), points, clock="wall")  # fmt: skip
     for what, name in (("saving", "saved"), ("merging", "merged")):
         yield row(f"{what} an accumulator", program, f"lumra_accumulator_{name}/{{}}", (

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <chrono>
 #include <condition_variable>
 #include <exception>
 #include <mutex>
@@ -17,6 +18,18 @@
 
 namespace dsp {
 namespace {
+
+/// Whether something comes true while a thread would at most fall asleep and be woken again, which takes as long.
+template <class Condition>
+bool comes_soon(Condition condition) noexcept {
+  constexpr std::chrono::microseconds soon(50);
+  const auto begun = std::chrono::steady_clock::now();
+  while (!condition()) {
+    if (std::chrono::steady_clock::now() - begun > soon) return false;
+    _mm_pause();
+  }
+  return true;
+}
 
 /// Parts that are handed out one by one, on the stack of the thread that wants them done.
 class handed_out {
@@ -72,6 +85,7 @@ class workers {
       start_missing(others);
       parts.wanted = others;
       *end() = &parts;
+      offered_.fetch_add(1, std::memory_order_relaxed);
     }
     for (std::size_t k = 0; k < others; ++k) more_.notify_one();
     parts.run();
@@ -112,8 +126,7 @@ class workers {
       remove(parts);
     }
     // They are about to end: each was at its last part when no other was left.
-    constexpr int rounds = 200;
-    for (int round = 0; round < rounds && parts.inside.load(std::memory_order_relaxed) != 0; ++round) _mm_pause();
+    comes_soon([&] { return parts.inside.load(std::memory_order_relaxed) == 0; });
     std::unique_lock lock(mutex_);
     left_.wait(lock, [&] { return parts.inside.load(std::memory_order_relaxed) == 0; });
   }
@@ -135,6 +148,12 @@ class workers {
       taken.run();
       lock.lock();
       if (taken.inside.fetch_sub(1, std::memory_order_relaxed) == 1) left_.notify_all();
+      if (offers_ != nullptr) continue;
+      // Whoever goes over a record piece by piece brings the next one at once.
+      const std::size_t seen = offered_.load(std::memory_order_relaxed);
+      lock.unlock();
+      comes_soon([&] { return offered_.load(std::memory_order_relaxed) != seen; });
+      lock.lock();
     }
   }
   static void *begin(void *own) { static_cast<workers *>(own)->serve(); }
@@ -143,7 +162,8 @@ class workers {
   std::mutex mutex_;
   // All under mutex_.
   std::condition_variable more_, left_;
-  handed_out *offers_ = nullptr;  // the oldest first
+  handed_out *offers_ = nullptr;         // the oldest first
+  std::atomic<std::size_t> offered_{0};  // how many there have been; read without the mutex, too
   std::size_t started_ = 0;
 };
 
