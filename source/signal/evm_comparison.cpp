@@ -17,15 +17,54 @@ using wide = std::complex<double>;
 
 constexpr std::size_t run = error_sums::longest_run;
 
-/// Angles of a run of products, those of 0 being 0.
-void find_angles(std::span<const wide> products, double *angles) noexcept {
+/// Values of a run, real and imaginary parts in planes of their own, which the compiler's loops take side by side.
+struct planes {
   std::array<double, run> re, im;
-  for (std::size_t k = 0; k < products.size(); ++k) {
-    const bool none = products[k] == 0.0;
-    re[k] = none ? 1 : products[k].real();
-    im[k] = none ? 0 : products[k].imag();
+};
+
+/// Squared magnitudes of a run.
+void find_powers(const planes &x, std::size_t count, double *powers) noexcept {
+  for (std::size_t k = 0; k < count; ++k) powers[k] = x.re[k] * x.re[k] + x.im[k] * x.im[k];
+}
+
+/// Angles of a run of products, those of 0 being 0.
+void find_angles(planes &products, std::size_t count, double *angles) noexcept {
+  for (std::size_t k = 0; k < count; ++k) {
+    const bool none = products.re[k] == 0 && products.im[k] == 0;
+    products.re[k] = none ? 1 : products.re[k];
+    products.im[k] = none ? 0 : products.im[k];
   }
-  vmdAtan2(static_cast<MKL_INT>(products.size()), im.data(), re.data(), angles, VML_HA);
+  vmdAtan2(static_cast<MKL_INT>(count), products.im.data(), products.re.data(), angles, VML_HA);
+}
+
+/// The largest of powers without NaNs.
+double largest_of(const double *powers, std::size_t count) noexcept {
+  constexpr std::size_t lanes = 8;
+  double largest[lanes];
+  std::fill_n(largest, lanes, -1.0);
+  std::size_t k = 0;
+  for (; k + lanes <= count; k += lanes)
+    for (std::size_t l = 0; l < lanes; ++l) largest[l] = powers[k + l] > largest[l] ? powers[k + l] : largest[l];
+  for (; k < count; ++k) largest[0] = std::max(largest[0], powers[k]);
+  return *std::max_element(largest, largest + lanes);
+}
+
+/// Takes the peak of powers from a position on, whose sum is known.
+void take_peak(power_peak &peak, std::span<const double> powers, double sum, std::uint64_t position) noexcept {
+  if (std::isnan(sum)) {
+    for (std::size_t k = 0; k < powers.size(); ++k) peak.take(powers[k], position + k);
+    return;
+  }
+  const double largest = largest_of(powers.data(), powers.size());
+  if (largest < peak.power) return;
+  const auto first = std::find(powers.begin(), powers.end(), largest);
+  peak.take(largest, position + static_cast<std::uint64_t>(first - powers.begin()));
+}
+
+double sum_of_squares(const double *x, std::size_t count) noexcept {
+  double sum = 0;
+  for (std::size_t k = 0; k < count; ++k) sum += x[k] * x[k];
+  return sum;
 }
 
 }  // namespace
@@ -34,32 +73,38 @@ template <class Real>
 void error_sums::add(std::span<const wide> carried, const std::complex<Real> *measured, const stream_model &model,
                      std::uint64_t position, double scale, const error_traces<Real> &traces) noexcept {
   if (carried.empty()) return;
-  const wide inverse_gain = 1.0 / model.gain;
-  std::array<wide, run> errors, products;
-  std::array<double, run> magnitudes, angles;
   const std::size_t count = carried.size();
+  const wide inverse_gain = 1.0 / model.gain;
+  const double gain_re = inverse_gain.real(), gain_im = inverse_gain.imag();
+  const double dc_re = model.dc.real(), dc_im = model.dc.imag();
+  const auto *const u = reinterpret_cast<const double *>(carried.data());
+  const auto *const m = reinterpret_cast<const Real *>(measured);
+  planes errors, products;
+  std::array<double, run> magnitudes, powers, angles;
   for (std::size_t k = 0; k < count; ++k) {
-    const wide z = times(wide(measured[k]) - model.dc, inverse_gain), u = carried[k];
-    errors[k] = (z - u) * scale;
-    magnitudes[k] = (std::sqrt(std::norm(z)) - std::sqrt(std::norm(u))) * scale;
-    products[k] = times(z, std::conj(u));
+    const double u_re = u[2 * k], u_im = u[2 * k + 1];
+    const double m_re = static_cast<double>(m[2 * k]) - dc_re, m_im = static_cast<double>(m[2 * k + 1]) - dc_im;
+    const double z_re = m_re * gain_re - m_im * gain_im, z_im = m_re * gain_im + m_im * gain_re;
+    errors.re[k] = (z_re - u_re) * scale;
+    errors.im[k] = (z_im - u_im) * scale;
+    magnitudes[k] = (std::sqrt(z_re * z_re + z_im * z_im) - std::sqrt(u_re * u_re + u_im * u_im)) * scale;
+    products.re[k] = z_re * u_re + z_im * u_im;
+    products.im[k] = z_im * u_re - z_re * u_im;
   }
-  find_angles({products.data(), count}, angles.data());
-  double sums[3] = {};
-  for (std::size_t k = 0; k < count; ++k) {
-    const double p = std::norm(errors[k]);
-    peak.take(p, position + k);
-    sums[0] += p;
-    sums[1] += magnitudes[k] * magnitudes[k];
-    sums[2] += angles[k] * angles[k];
-  }
-  error += sums[0];
-  magnitude += sums[1];
-  phase += sums[2];
+  find_angles(products, count, angles.data());
+  find_powers(errors, count, powers.data());
+  double sum = 0;
+  for (std::size_t k = 0; k < count; ++k) sum += powers[k];
+  error += sum;
+  take_peak(peak, {powers.data(), count}, sum, position);
+  magnitude += sum_of_squares(magnitudes.data(), count);
+  phase += sum_of_squares(angles.data(), count);
   if (traces.error) {
+    std::array<wide, run> turned;
+    for (std::size_t k = 0; k < count; ++k) turned[k] = {errors.re[k], errors.im[k]};
     if (model.frequency != 0)
-      rotate(std::span(errors).first(count), -model.frequency, static_cast<double>(position), 1, errors);
-    for (std::size_t k = 0; k < count; ++k) traces.error[k] = std::complex<Real>(errors[k]);
+      rotate(std::span(turned).first(count), -model.frequency, static_cast<double>(position), 1, turned);
+    for (std::size_t k = 0; k < count; ++k) traces.error[k] = std::complex<Real>(turned[k]);
   }
   if (traces.magnitude)
     for (std::size_t k = 0; k < count; ++k) traces.magnitude[k] = static_cast<Real>(magnitudes[k]);
