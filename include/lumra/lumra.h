@@ -23,7 +23,8 @@
  * Objects are opaque: lumra_x_create makes one from a lumra_x_options and writes its address, lumra_x_free frees it
  * and takes null, too. A function that is given a freed object, or another kind of one, refuses it
  * (LUMRA_WRONG_OBJECT). One thread at a time may use an object; any number of objects may be used at once. Functions
- * without an object may be called by any number of threads. An object starts threads only where its options say so.
+ * without an object may be called by any number of threads. An object starts threads only where its options say so, a
+ * function without one where lumra_elementwise_set_threads does.
  *
  * Options are records that begin with their own size, so that they can grow. Begin with the header's initialiser, then
  * change what you need:

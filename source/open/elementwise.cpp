@@ -9,9 +9,14 @@
 #include <span>
 
 #include "open/door.hpp"
+#include "open/option_checks.hpp"
 
 namespace doors {
 namespace {
+
+/// Threads that the calling thread's functions may use, 0 as many as pay. In the memory that a thread has from its
+/// start: looking it up takes one instruction.
+[[gnu::tls_model("initial-exec")]] constinit thread_local std::uint32_t threads = 1;
 
 std::complex<float> sample(lumra_cf32 value) noexcept {
   return {value.re, value.im};
@@ -45,38 +50,38 @@ lumra_status divide(const char *function, const T *x, const T *y, T *out, std::u
     const auto quotient = array(samples(out), n, "out");
     require_same_or_apart(quotient, "out", dividend, "x");
     require_same_or_apart(quotient, "out", divisor, "y");
-    dsp::divide(dividend, divisor, quotient);
+    dsp::divide(dividend, divisor, quotient, threads);
   });
 }
 
 template <class T>
 lumra_status divide_by_value(const char *function, const T *x, T value, T *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::divide_by_value(in, sample(value), to); });
+  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::divide_by_value(in, sample(value), to, threads); });
 }
 
 template <class T, class Real>
 lumra_status scale(const char *function, const T *x, Real factor, T *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::scale(in, factor, to); });
+  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::scale(in, factor, to, threads); });
 }
 
 template <class T, class Real>
 lumra_status magnitude(const char *function, const T *x, Real *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [](auto in, auto to) { dsp::magnitude(in, to); });
+  return from_one(function, x, out, n, [](auto in, auto to) { dsp::magnitude(in, to, threads); });
 }
 
 template <class T, class Real>
 lumra_status power(const char *function, const T *x, Real *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [](auto in, auto to) { dsp::power(in, to); });
+  return from_one(function, x, out, n, [](auto in, auto to) { dsp::power(in, to, threads); });
 }
 
 template <class Real>
 lumra_status log2(const char *function, const Real *x, Real a, Real b, Real *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::log2(in, a, b, to); });
+  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::log2(in, a, b, to, threads); });
 }
 
 template <class T, class Real>
 lumra_status log2_power(const char *function, const T *x, Real a, Real b, Real *out, std::uint64_t n) noexcept {
-  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::log2_power(in, a, b, to); });
+  return from_one(function, x, out, n, [=](auto in, auto to) { dsp::log2_power(in, a, b, to, threads); });
 }
 
 template <class T, class C>
@@ -89,7 +94,7 @@ lumra_status polynomial(const char *function, const T *x, const C *c, std::uint6
     const auto to = array(samples(out), n, "out");
     require_same_or_apart(to, "out", in, "x");
     require_apart(to, "out", coefficients, "c");
-    dsp::polynomial(in, coefficients, to);
+    dsp::polynomial(in, coefficients, to, threads);
   });
 }
 
@@ -109,12 +114,23 @@ lumra_status look_up(const char *function, const T *x, const Real *keys, const T
     require_same_or_apart(to, "out", in, "x");
     require_apart(to, "out", at, "keys");
     require_apart(to, "out", gains, "table");
-    dsp::look_up(in, at, {gains, start, step}, to);
+    dsp::look_up(in, at, {gains, start, step}, to, threads);
   });
 }
 
 }  // namespace
 }  // namespace doors
+
+lumra_status lumra_elementwise_set_threads(uint32_t threads) {
+  return doors::enter(__func__, [&] {
+    doors::require_threads(threads, "threads");
+    doors::threads = threads;
+  });
+}
+
+uint32_t lumra_elementwise_threads(void) {
+  return doors::threads;
+}
 
 lumra_status lumra_divide_f32(const float *x, const float *y, float *out, uint64_t n) {
   return doors::divide(__func__, x, y, out, n);

@@ -10,6 +10,7 @@
 
 #include "qsrfhs/math/mkl_runtime.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/shared_loop.hpp"
 
 namespace dsp {
 namespace {
@@ -36,10 +37,8 @@ void divide_one(const Real *a, Real br, Real bi, Real r, Real *out) noexcept {
   out[1] = (ai * br - ar * bi) * r;
 }
 
-}  // namespace
-
 template <class T>
-void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexcept {
+void divide_each(std::span<const T> x, std::span<const T> y, std::span<T> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     exact().divide(parts(x), parts(y), parts(out), out.size());
   } else if constexpr (is_complex<T>) {
@@ -55,7 +54,7 @@ void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) noexce
 }
 
 template <class T>
-void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept {
+void divide_by_value_each(std::span<const T> x, T value, std::span<T> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     exact().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), out.size());
   } else if constexpr (is_complex<T>) {
@@ -67,7 +66,7 @@ void divide_by_value(std::span<const T> x, T value, std::span<T> out) noexcept {
 }
 
 template <class T>
-void scale(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept {
+void scale_each(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept {
   const real_of<T> *const in = parts(x);
   real_of<T> *const product = parts(out);
   const std::size_t count = out.size_bytes() / sizeof(real_of<T>);
@@ -75,7 +74,7 @@ void scale(std::span<const T> x, real_of<T> factor, std::span<T> out) noexcept {
 }
 
 template <class T>
-void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept {
+void magnitude_each(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     exact().magnitude(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
@@ -88,7 +87,7 @@ void magnitude(std::span<const T> x, std::span<real_of<T>> out) noexcept {
 }
 
 template <class T>
-void power(std::span<const T> x, std::span<real_of<T>> out) noexcept {
+void power_each(std::span<const T> x, std::span<real_of<T>> out) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
     exact().magnitude_squared(parts(x), out.data(), out.size());
   } else if constexpr (is_complex<T>) {
@@ -98,8 +97,6 @@ void power(std::span<const T> x, std::span<real_of<T>> out) noexcept {
     for (std::size_t i = 0; i < out.size(); ++i) out[i] = x[i] * x[i];
   }
 }
-
-namespace {
 
 /// x = a log2(x) + b.
 template <class Real>
@@ -127,24 +124,20 @@ void log2_in_pieces(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<
   }
 }
 
-}  // namespace
-
 template <class T>
-void log2(std::span<const T> x, T a, T b, std::span<T> out) noexcept {
+void log2_each(std::span<const T> x, T a, T b, std::span<T> out) noexcept {
   log2_in_pieces(x, a, b, out, [](std::span<const T> values, std::span<T> piece) {
     if (values.data() != piece.data()) std::copy(values.begin(), values.end(), piece.begin());
   });
 }
 
 template <class T>
-void log2_power(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out) noexcept {
+void log2_power_each(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out) noexcept {
   if constexpr (is_complex<T>)
-    log2_in_pieces(x, a, b, out, power<T>);
+    log2_in_pieces(x, a, b, out, power_each<T>);
   else
-    log2_in_pieces(x, 2 * a, b, out, magnitude<T>);
+    log2_in_pieces(x, 2 * a, b, out, magnitude_each<T>);
 }
-
-namespace {
 
 /// Values that go through Horner's scheme side by side: one alone would wait for each of its operations.
 constexpr std::size_t polynomial_block = 32;
@@ -180,10 +173,8 @@ void polynomial_of_block(const T *x, std::span<const C> c, C *out, std::size_t n
   }
 }
 
-}  // namespace
-
 template <class T, class C>
-void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept {
+void polynomial_each(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept {
   if constexpr (std::is_same_v<C, float>) {
     fused().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else if constexpr (std::is_same_v<T, float>) {
@@ -193,8 +184,6 @@ void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out) no
       polynomial_of_block(x.data() + i, c, out.data() + i, std::min(polynomial_block, out.size() - i));
   }
 }
-
-namespace {
 
 /// Where in a table of m gains the one at t steps from the first lies: at the gain k, and on the way to the next.
 template <class Real>
@@ -214,24 +203,21 @@ gain_place<Real> place_of(Real t, std::size_t m) noexcept {
   return {k, t - static_cast<Real>(cut), true};
 }
 
-}  // namespace
-
 template <class Real>
-void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
-             std::span<std::complex<Real>> out) noexcept {
-  const auto gains = table.gains;
+void look_up_each(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
+                  std::span<std::complex<Real>> out) noexcept {
   if constexpr (std::is_same_v<Real, float>) {
-    const std::complex<Real> alone[] = {gains.front(), gains.front()};
-    const auto entries = gains.size() > 1 ? gains : std::span<const std::complex<Real>>(alone);
-    exact().lookup_between({parts(entries), static_cast<int>(gains.size()), table.start, table.step}, keys.data(),
+    const cf32 alone[] = {table.gains.front(), table.gains.front()};
+    const auto gains = table.gains.size() > 1 ? table.gains : std::span<const cf32>(alone);
+    exact().lookup_between({parts(gains), static_cast<int>(table.gains.size()), table.start, table.step}, keys.data(),
                            parts(x), parts(out), out.size());
   } else {
     const Real inverse_step = 1 / table.step;
-    const Real *const in = parts(x), *const values = parts(gains);
+    const Real *const in = parts(x), *const gains = parts(table.gains);
     Real *const result = parts(out);
     for (std::size_t i = 0; i < out.size(); ++i) {
-      const auto place = place_of((keys[i] - table.start) * inverse_step, gains.size());
-      const Real *const low = values + 2 * place.k, *const high = low + 2;
+      const auto place = place_of((keys[i] - table.start) * inverse_step, table.gains.size());
+      const Real *const low = gains + 2 * place.k, *const high = low + 2;
       Real g_re = low[0], g_im = low[1];
       if (place.between) {
         g_re = place.fraction * (high[0] - g_re) + g_re;
@@ -244,21 +230,85 @@ void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, 
   }
 }
 
-#define LUMRA_FOR_TYPE(T)                                                                               \
-  template void divide(std::span<const T>, std::span<const T>, std::span<T>) noexcept;                  \
-  template void divide_by_value(std::span<const T>, T, std::span<T>) noexcept;                          \
-  template void scale(std::span<const T>, real_of<T>, std::span<T>) noexcept;                           \
-  template void magnitude(std::span<const T>, std::span<real_of<T>>) noexcept;                          \
-  template void power(std::span<const T>, std::span<real_of<T>>) noexcept;                              \
-  template void log2_power(std::span<const T>, real_of<T>, real_of<T>, std::span<real_of<T>>) noexcept; \
-  template void polynomial(std::span<const T>, std::span<const T>, std::span<T>) noexcept;
-#define LUMRA_FOR_REAL_TYPE(T)                                                                                         \
-  LUMRA_FOR_TYPE(T)                                                                                                    \
-  LUMRA_FOR_TYPE(std::complex<T>)                                                                                      \
-  template void log2(std::span<const T>, T, T, std::span<T>) noexcept;                                                 \
-  template void polynomial(std::span<const T>, std::span<const std::complex<T>>, std::span<std::complex<T>>) noexcept; \
-  template void look_up(std::span<const std::complex<T>>, std::span<const T>, const gain_table<T> &,                   \
-                        std::span<std::complex<T>>) noexcept;
+// Nanoseconds for an element, beside what its bytes take.
+constexpr double no_more = 0;
+template <class Real>
+constexpr double logarithm_cost = std::is_same_v<Real, float> ? 0.4 : 1.2;
+
+}  // namespace
+
+template <class T>
+void divide(std::span<const T> x, std::span<const T> y, std::span<T> out, std::size_t threads) noexcept {
+  share(threads, no_more, divide_each<T>, x, y, out);
+}
+
+template <class T>
+void divide_by_value(std::span<const T> x, T value, std::span<T> out, std::size_t threads) noexcept {
+  const auto loop = [=](auto in, auto quotients) { divide_by_value_each<T>(in, value, quotients); };
+  share(threads, no_more, loop, x, out);
+}
+
+template <class T>
+void scale(std::span<const T> x, real_of<T> factor, std::span<T> out, std::size_t threads) noexcept {
+  const auto loop = [=](auto in, auto products) { scale_each<T>(in, factor, products); };
+  share(threads, no_more, loop, x, out);
+}
+
+template <class T>
+void magnitude(std::span<const T> x, std::span<real_of<T>> out, std::size_t threads) noexcept {
+  share(threads, no_more, magnitude_each<T>, x, out);
+}
+
+template <class T>
+void power(std::span<const T> x, std::span<real_of<T>> out, std::size_t threads) noexcept {
+  share(threads, no_more, power_each<T>, x, out);
+}
+
+template <class T>
+void log2(std::span<const T> x, T a, T b, std::span<T> out, std::size_t threads) noexcept {
+  const auto loop = [=](auto in, auto logarithms) { log2_each<T>(in, a, b, logarithms); };
+  share(threads, logarithm_cost<T>, loop, x, out);
+}
+
+template <class T>
+void log2_power(std::span<const T> x, real_of<T> a, real_of<T> b, std::span<real_of<T>> out,
+                std::size_t threads) noexcept {
+  const auto loop = [=](auto in, auto logarithms) { log2_power_each<T>(in, a, b, logarithms); };
+  share(threads, logarithm_cost<real_of<T>>, loop, x, out);
+}
+
+template <class T, class C>
+void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out, std::size_t threads) noexcept {
+  constexpr bool by_kernel = std::is_same_v<T, float>;
+  constexpr double cost_of_coefficient = by_kernel ? 0.012 : is_complex<T> ? 0.48 : 0.18;
+  const auto loop = [=](auto in, auto values) { polynomial_each<T, C>(in, c, values); };
+  share(threads, cost_of_coefficient * static_cast<double>(c.size()), loop, x, out);
+}
+
+template <class Real>
+void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
+             std::span<std::complex<Real>> out, std::size_t threads) noexcept {
+  constexpr double cost = std::is_same_v<Real, float> ? 0.7 : 3;
+  const auto loop = [&](auto in, auto at, auto products) { look_up_each<Real>(in, at, table, products); };
+  share(threads, cost, loop, x, keys, out);
+}
+
+#define LUMRA_FOR_TYPE(T)                                                                                            \
+  template void divide(std::span<const T>, std::span<const T>, std::span<T>, std::size_t) noexcept;                  \
+  template void divide_by_value(std::span<const T>, T, std::span<T>, std::size_t) noexcept;                          \
+  template void scale(std::span<const T>, real_of<T>, std::span<T>, std::size_t) noexcept;                           \
+  template void magnitude(std::span<const T>, std::span<real_of<T>>, std::size_t) noexcept;                          \
+  template void power(std::span<const T>, std::span<real_of<T>>, std::size_t) noexcept;                              \
+  template void log2_power(std::span<const T>, real_of<T>, real_of<T>, std::span<real_of<T>>, std::size_t) noexcept; \
+  template void polynomial(std::span<const T>, std::span<const T>, std::span<T>, std::size_t) noexcept;
+#define LUMRA_FOR_REAL_TYPE(T)                                                                               \
+  LUMRA_FOR_TYPE(T)                                                                                          \
+  LUMRA_FOR_TYPE(std::complex<T>)                                                                            \
+  template void log2(std::span<const T>, T, T, std::span<T>, std::size_t) noexcept;                          \
+  template void polynomial(std::span<const T>, std::span<const std::complex<T>>, std::span<std::complex<T>>, \
+                           std::size_t) noexcept;                                                            \
+  template void look_up(std::span<const std::complex<T>>, std::span<const T>, const gain_table<T> &,         \
+                        std::span<std::complex<T>>, std::size_t) noexcept;
 LUMRA_FOR_REAL_TYPE(float)
 LUMRA_FOR_REAL_TYPE(double)
 

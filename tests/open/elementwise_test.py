@@ -1,11 +1,13 @@
 # SPDX-License-Identifier: MIT
 """Element-wise functions against NumPy in extended precision."""
+import threading
 import unittest
 
 import numpy as np
 import open as lumra
 
 TYPES = lumra.types
+long = 300_007  # elements that threads share
 
 
 def noise(n, dtype):
@@ -30,13 +32,22 @@ def value(suffix, number):
 
 
 class Elementwise(lumra.Test):
+    def tearDown(self):
+        lumra.call("elementwise_set_threads", 1)
+
     def check(self, function, inputs, arguments, expected, error, out_type, in_place=True):
-        """All inputs but scalars; `arguments` take `out` and then n after them. Errors are absolute."""
+        """All inputs but scalars; `arguments` take `out` and then n after them. Errors are absolute. By any number of
+        threads, to the same bits."""
         n, inputs = len(expected), [lumra.odd(x) for x in inputs]
         kept = [x.copy() for x in inputs]
-        whole = lumra.odd(np.full(n + 2, 7, out_type))
-        lumra.call(function, *inputs, *arguments, whole[:n], n)
-        what, out = (function, n), whole[:n]
+        what, results = (function, n), []
+        for threads in (1, 2, 3, 0):
+            lumra.call("elementwise_set_threads", threads)
+            whole = lumra.odd(np.full(n + 2, 7, out_type))
+            lumra.call(function, *inputs, *arguments, whole[:n], n)
+            results.append(whole.tobytes())
+        self.assertEqual(1, len(set(results)), what)
+        out = whole[:n]
         for x, y in zip(kept, inputs):
             np.testing.assert_array_equal(x, y, what)
         self.assertTrue((whole[n:] == 7).all(), what)
@@ -50,7 +61,7 @@ class Elementwise(lumra.Test):
                 x[...] = kept[k]
 
     def test_quotients_products_and_powers(self):
-        for (suffix, dtype), n in ((t, n) for t in TYPES.items() for n in (*range(41), 4097)):
+        for (suffix, dtype), n in ((t, n) for t in TYPES.items() for n in (*range(41), 4097, long)):
             real, eps = real_type(dtype), np.finfo(dtype).eps
             x, y = noise(n, dtype), noise(n, dtype)
             v = complex(1.5, -0.75) if dtype.kind == "c" else -0.7
@@ -66,7 +77,7 @@ class Elementwise(lumra.Test):
 
     def test_logarithms(self):
         special = [0.0, -0.0, np.inf, -np.inf, np.nan, 1.0, np.nextafter(1, 0), 1e30, 1e-30, 1e-44]
-        for (suffix, dtype), n in ((t, n) for t in TYPES.items() for n in (*range(41), 5000)):
+        for (suffix, dtype), n in ((t, n) for t in TYPES.items() for n in (*range(41), 5000, long)):
             real, eps = real_type(dtype), np.finfo(dtype).eps
             a, b, x = real.type(10 * np.log10(2)), real.type(-3.25), noise(n, dtype)
             x[n - len(special) :] = special if n > 2 * len(special) else x[n - len(special) :]
@@ -86,8 +97,8 @@ class Elementwise(lumra.Test):
     def test_polynomials(self):
         kinds = [(s, s, "polynomial_") for s in TYPES]
         kinds += [("f32", "cf32", "polynomial_of_real_"), ("f64", "cf64", "polynomial_of_real_")]
-        for (of, suffix, function), n in ((k, n) for k in kinds for n in (*range(41), 200)):
-            for m in (1, 2, 3, 9, 40):
+        for (of, suffix, function), n in ((k, n) for k in kinds for n in (*range(41), 200, long)):
+            for m in (1, 2, 3, 9, 40) if n < long else (5,):
                 x, c = noise(n, TYPES[of]).clip(-1.5, 1.5), noise(m, TYPES[suffix])
                 powers = wide(x)[:, None] ** np.arange(m)
                 expected, size = powers @ wide(c), np.abs(powers) @ np.abs(wide(c))
@@ -95,7 +106,7 @@ class Elementwise(lumra.Test):
                 self.check(function + suffix, [x], [c, m], expected, error, TYPES[suffix], of == suffix)
 
     def test_gains_by_key_are_the_formulas_bits(self):
-        for suffix, n in ((t, n) for t in ("cf32", "cf64") for n in (*range(41), 300)):
+        for suffix, n in ((t, n) for t in ("cf32", "cf64") for n in (*range(41), 300, long)):
             dtype, real = TYPES[suffix], real_type(TYPES[suffix]).type
             for m, start, step in ((1, 0.5, 1.0), (7, -2.0, 0.3), (200, 1.0, -0.01)):
                 table, x = noise(m, dtype), noise(n, dtype)
@@ -113,6 +124,19 @@ class Elementwise(lumra.Test):
                     expected = (re * x.real - im * x.imag) + 1j * (re * x.imag + im * x.real)
                 arguments = [table, m, float(start), float(step)]
                 self.check(f"lookup_{suffix}", [x, keys], arguments, expected.astype(dtype), 0, dtype)
+
+    def test_threads_are_the_calling_threads_own(self):
+        def other():
+            found.append(lumra.run("elementwise_threads"))
+            lumra.call("elementwise_set_threads", 1024)
+
+        found = []
+        lumra.call("elementwise_set_threads", 2)
+        thread = threading.Thread(target=other)
+        thread.start()
+        thread.join()
+        self.refused("LUMRA_OUT_OF_RANGE", "elementwise_set_threads", 1025, says="threads is 1025; it is 0 to 1024")
+        self.assertEqual([1, 2], [*found, lumra.run("elementwise_threads")])
 
     def test_refusals(self):
         x, real = noise(20, TYPES["cf32"]), noise(50, TYPES["f32"])
