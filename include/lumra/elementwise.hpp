@@ -7,10 +7,26 @@
 #include <lumra/elementwise.h>
 #include <lumra/object.hpp>
 
+#include <cstdint>
 #include <span>
 #include <type_traits>
 
 namespace lumra {
+
+/// Lets the calling thread's functions of this header use other threads as long as this lives: 0 as many as pay, more
+/// at most so many, 1 none. Then holds what held before. It begins and ends in one thread.
+class [[nodiscard]] elementwise_threads {
+ public:
+  explicit elementwise_threads(std::uint32_t threads) : before_(lumra_elementwise_threads()) {
+    check_open(lumra_elementwise_set_threads(threads));
+  }
+  elementwise_threads(const elementwise_threads &) = delete;
+  elementwise_threads &operator=(const elementwise_threads &) = delete;
+  ~elementwise_threads() { (void)lumra_elementwise_set_threads(before_); }
+
+ private:
+  std::uint32_t before_;
+};
 
 template <sample T>
 void divide(std::span<const T> x, std::span<const T> y, std::span<T> out) {

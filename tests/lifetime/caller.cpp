@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: MIT
 #include "lifetime/caller.hpp"
 
+#include <lumra/elementwise.hpp>
+
+#include <algorithm>
 #include <cmath>
 #include <cstdio>
 #include <cstring>
@@ -32,6 +35,17 @@ bool has_power(const lumra_cf32 *x, double power) {
                     lumra_level_read(level, &result) == 0 && result.power == power && result.peak_index == 0;
   lumra_level_free(level);
   return good;
+}
+
+/// A polynomial of a long constant, by the library's own threads.
+bool has_polynomial(const lumra_cf32 *x, lumra_cf32 *out, lumra_cf32 value) {
+  const lumra_cf32 c[9] = {{1, 0}, {2, 0}};
+  {
+    const lumra::elementwise_threads use(2);
+    if (lumra_polynomial_cf32(x, c, 9, out, long_samples) != 0) return false;
+  }
+  return lumra_elementwise_threads() == 1 &&
+         std::all_of(out, out + long_samples, [&](lumra_cf32 y) { return y.re == value.re && y.im == value.im; });
 }
 
 }  // namespace
@@ -237,7 +251,8 @@ bool caller::lookup_and_errors() {
   return qsrfhs_getErrorCnt(&before) == 0 && qsUtilHS_FreeArray_CSG(nullptr) == -33620097 &&
          qsrfhs_getErrorCnt(&after) == 0 && after > before &&
          qsUtilHS_LookupTable(keys_, long_in_, &long_out_, table_, 0, 1) == 0 && (*long_out_)->elements[0].im == 6 &&
-         (*long_out_)->elements[long_samples - 1].re == 3 && has_power((*long_in_)->elements, 5);
+         (*long_out_)->elements[long_samples - 1].re == 3 && has_power((*long_in_)->elements, 5) &&
+         has_polynomial((*long_in_)->elements, (*long_out_)->elements, {3, 4});
 }
 
 }  // namespace lifetime
