@@ -3,7 +3,7 @@
 from lumra import _lumra
 
 
-def magnitude(x, out=None):
+def magnitude(x, out=None, *, threads=None):
     """Magnitudes.
 
     Parameters
@@ -12,6 +12,8 @@ def magnitude(x, out=None):
         Samples of one dimension.
     out : numpy.ndarray, optional
         Written and returned: float32 for float32 and complex64, else float64; `x` where that is real.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -24,10 +26,10 @@ def magnitude(x, out=None):
     >>> lumra.magnitude([3 + 4j, -2])
     array([5., 2.])
     """
-    return _lumra.magnitude(x, out)
+    return _lumra.magnitude(x, out, threads)
 
 
-def power(x, out=None):
+def power(x, out=None, *, threads=None):
     """Powers, which are squared magnitudes.
 
     Parameters
@@ -36,6 +38,8 @@ def power(x, out=None):
         Samples of one dimension.
     out : numpy.ndarray, optional
         Written and returned: float32 for float32 and complex64, else float64; `x` where that is real.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -48,10 +52,10 @@ def power(x, out=None):
     >>> lumra.power([3 + 4j, -2])
     array([25.,  4.])
     """
-    return _lumra.power(x, out)
+    return _lumra.power(x, out, threads)
 
 
-def divide(x, y, out=None):
+def divide(x, y, out=None, *, threads=None):
     """Quotients.
 
     Parameters
@@ -62,6 +66,8 @@ def divide(x, y, out=None):
         As many divisors, or one number for all, which has the precision of x.
     out : numpy.ndarray, optional
         Written and returned; may be `x` or `y`.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -74,10 +80,10 @@ def divide(x, y, out=None):
     >>> lumra.divide([2, 4, 9], [1, 2, 3])
     array([2., 2., 3.])
     """
-    return _lumra.divide(x, y, out)
+    return _lumra.divide(x, y, out, threads)
 
 
-def decibels(x, out=None):
+def decibels(x, out=None, *, threads=None):
     """Levels of samples in decibels of an amplitude of 1.
 
     Parameters
@@ -86,6 +92,8 @@ def decibels(x, out=None):
         Samples of one dimension.
     out : numpy.ndarray, optional
         Written and returned: float32 for float32 and complex64, else float64; `x` where that is real.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -98,10 +106,10 @@ def decibels(x, out=None):
     >>> lumra.decibels([1, 10, 0])
     array([  0.,  20., -inf])
     """
-    return _lumra.decibels(x, out)
+    return _lumra.decibels(x, out, threads)
 
 
-def polynomial(x, c, out=None):
+def polynomial(x, c, out=None, *, threads=None):
     """Values of a polynomial.
 
     Parameters
@@ -112,6 +120,8 @@ def polynomial(x, c, out=None):
         Coefficients, that of the power 0 first. They have the precision of x.
     out : numpy.ndarray, optional
         Written and returned; may be `x` where it is of the result's type.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -124,10 +134,10 @@ def polynomial(x, c, out=None):
     >>> lumra.polynomial([0, 1, 2], [1, 0, 3])
     array([ 1.,  4., 13.])
     """
-    return _lumra.polynomial(x, c, out)
+    return _lumra.polynomial(x, c, out, threads)
 
 
-def lookup(keys, x, table, start, step, out=None):
+def lookup(keys, x, table, start, step, out=None, *, threads=None):
     """Samples times gains that are looked up and interpolated.
 
     Parameters
@@ -144,6 +154,8 @@ def lookup(keys, x, table, start, step, out=None):
         Finite; the step is not 0, and may be negative.
     out : numpy.ndarray, optional
         Written and returned; may be `x`.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay.
 
     Returns
     -------
@@ -156,4 +168,4 @@ def lookup(keys, x, table, start, step, out=None):
     >>> lumra.lookup([0.0, 0.5, 7.0], [1, 1, 2], [1, 3], start=0, step=1)
     array([1., 2., 6.])
     """
-    return _lumra.lookup(keys, x, table, start, step, out)
+    return _lumra.lookup(keys, x, table, start, step, out, threads)

@@ -160,15 +160,24 @@ py::array lookup(py::handle keys_given, py::handle of, py::handle table_given, p
   return result.finish();
 }
 
+/// The function with one argument more: how many threads it may use.
+template <class... Arguments>
+auto by_threads(py::array (*function)(Arguments...)) {
+  return [function](Arguments... arguments, py::handle threads) {
+    const lumra::elementwise_threads use(number_of_threads(threads));
+    return function(arguments...);
+  };
+}
+
 }  // namespace
 
 void add_elements(py::module_ &module) {
-  module.def("magnitude", &magnitude);
-  module.def("power", &power);
-  module.def("decibels", &decibels);
-  module.def("divide", &divide);
-  module.def("polynomial", &polynomial);
-  module.def("lookup", &lookup);
+  module.def("magnitude", by_threads(&magnitude));
+  module.def("power", by_threads(&power));
+  module.def("decibels", by_threads(&decibels));
+  module.def("divide", by_threads(&divide));
+  module.def("polynomial", by_threads(&polynomial));
+  module.def("lookup", by_threads(&lookup));
 }
 
 }  // namespace binding

@@ -100,6 +100,14 @@ std::int64_t whole_number(py::handle object, const char *name, std::int64_t leas
   return value;
 }
 
+std::uint32_t number_of_threads(py::handle threads) {
+  if (threads.is_none()) return 0;
+  constexpr std::int64_t most = 1024;
+  const std::int64_t count = whole_number(threads, "threads", 1);
+  if (count > most) refuse_value("threads", text_of(threads), "give at most 1024, or None");
+  return static_cast<std::uint32_t>(count);
+}
+
 double number(py::handle object, const char *name) {
   const double value = PyFloat_AsDouble(object.ptr());
   if (value == -1.0 && PyErr_Occurred() != nullptr) {

@@ -20,6 +20,8 @@ std::string text_of(py::handle object);
 std::int64_t whole_number(py::handle object, const char *name, std::int64_t least);
 /// A number, not NaN. The same.
 double number(py::handle object, const char *name);
+/// How many threads may work: a whole number from 1 to 1024, or 0 for None, which is as many as pay. The same.
+std::uint32_t number_of_threads(py::handle threads);
 
 /// Makes lumra::error and what recordings throw into Python's exceptions.
 void translate_failures();

@@ -70,12 +70,7 @@ std::unique_ptr<average> make(py::handle sample_rate, py::handle nfft, py::handl
   kind.options.centre_hz = number(frequency, "frequency");
   kind.start = static_cast<std::uint64_t>(whole_number(start, "start", 0));
   kind.origin = static_cast<std::uint64_t>(whole_number(origin, "origin", 0));
-  if (!threads.is_none()) {
-    constexpr std::int64_t most = 1024;
-    const std::int64_t count = whole_number(threads, "threads", 1);
-    if (count > most) refuse_value("threads", text_of(threads), "give at most 1024, or None");
-    kind.options.threads = static_cast<std::uint32_t>(count);
-  }
+  kind.options.threads = number_of_threads(threads);
   kind.real = real;
   const py::gil_scoped_release released;
   return std::make_unique<average>(kind);

@@ -232,6 +232,7 @@ class Refusals(Test):
             self.refused(kind, words, call, *arguments)
         self.refused(TypeError, "dtype is", lumra.window, "hann", 8, dtype=np.int16)
         self.refused(ValueError, "workers is 0", lumra.fft, x, workers=0)
+        self.refused(ValueError, "threads is 1025", lumra.power, x, threads=1025)
 
     def test_damaged_states(self):
         stream = lumra.FirFilter(h)
