@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <complex>
+#include <initializer_list>
 #include <random>
 #include <string>
 #include <vector>
@@ -54,9 +55,11 @@ struct host_arrays {
   lumra::host_array<float> coefficients;
 };
 
+constexpr std::size_t in_cache = 4096, in_memory = std::size_t{4} << 20;
+
 template <class Arrays, class Work>
-void add(const std::string &name, Work work) {
-  for (const std::size_t n : {std::size_t{4096}, std::size_t{4} << 20})
+void add(const std::string &name, Work work, std::initializer_list<std::size_t> lengths = {in_cache, in_memory}) {
+  for (const std::size_t n : lengths)
     benchmark::RegisterBenchmark((name + "/" + std::to_string(n)).c_str(),
                                  [=](benchmark::State &state) {
                                    Arrays &a = bench::kept<Arrays>(n);
@@ -70,10 +73,15 @@ void add(const std::string &name, Work work) {
         ->UseRealTime();
 }
 
-/// One operation in single precision, in double, and through the older function.
+/// One operation in single precision, by two threads, too, in double, and through the older function.
 template <class Single, class Double, class Older>
 void add_all(const std::string &name, Single single, Double twice, Older older) {
   add<single_arrays>(name + "/single", single);
+  const auto by_two_threads = [=](auto &a, auto n) {
+    const lumra::elementwise_threads use(2);
+    single(a, n);
+  };
+  add<single_arrays>(name + "/single_two_threads", by_two_threads, {in_memory});
   add<double_arrays>(name + "/double", twice);
   add<host_arrays>(name + "/older", older);
 }

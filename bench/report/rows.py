@@ -99,6 +99,9 @@ def _elements():
         yield row(f"{work}, open interface, single precision", "open_elementwise_bench", f"{name}/single{clocked}", (
             Peer("the older function", f"{name}/older{clocked}", 1.0),
         ), (4096, 4 * M))  # fmt: skip
+        yield row(f"{work}, open interface, two threads", "open_elementwise_bench", f"{name}/single_two_threads{clocked}", (
+            Peer("one thread", f"{name}/single{clocked}", 1.8),
+        ), (4 * M,), clock="wall")  # fmt: skip
     yield row("polynomial of degree 8, open interface", "open_elementwise_bench", f"polynomial/single{clocked}", (
         Peer("Eigen, fused", f"polynomial/eigen{clocked}", (1.0, None)),
     ), (4096, 4 * M))  # fmt: skip
