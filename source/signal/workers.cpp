@@ -49,6 +49,9 @@ class handed_out {
     if (failure_) std::rethrow_exception(failure_);
   }
 
+  /// How a worker rounds, and what it makes of denormals: as the thread does whose work it is.
+  void compute_as_its_owner() const noexcept { _mm_setcsr(control_); }
+
   // For the workers, under their mutex.
   handed_out *following = nullptr;
   std::size_t wanted = 0;              // workers that may still come
@@ -62,6 +65,7 @@ class handed_out {
     failure_ = std::current_exception();
   }
 
+  const unsigned control_ = _mm_getcsr();
   const std::size_t parts_;
   std::atomic<std::size_t> next_{0};
   std::mutex failure_mutex_;
@@ -145,6 +149,7 @@ class workers {
       if (--taken.wanted == 0) offers_ = taken.following;
       taken.inside.fetch_add(1, std::memory_order_relaxed);
       lock.unlock();
+      taken.compute_as_its_owner();
       taken.run();
       lock.lock();
       if (taken.inside.fetch_sub(1, std::memory_order_relaxed) == 1) left_.notify_all();

@@ -26,7 +26,8 @@ class part_of_work {
 /// Runs part(0) to part(parts - 1), each once, by the caller and by workers that are started at the first need and then
 /// wait for the next: one less than there are processors. Returns when all parts are done; throws what the first of
 /// those threw that failed. A worker that is late is not waited for: the caller runs whatever no other has begun, and
-/// so all parts where the system gives no thread. Allocates nothing. Any thread, but no part may call it.
+/// so all parts where the system gives no thread. Workers round as the caller does, and take denormals as it does.
+/// Allocates nothing. Any thread, but no part may call it.
 void run_parts(std::size_t parts, part_of_work part);
 
 }  // namespace dsp

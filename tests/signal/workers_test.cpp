@@ -2,6 +2,7 @@
 #include "signal/workers.hpp"
 
 #include <gtest/gtest.h>
+#include <immintrin.h>
 
 #include <atomic>
 #include <latch>
@@ -28,6 +29,22 @@ TEST(WorkersConcurrency, TakePart) {
   if (std::thread::hardware_concurrency() < 2) GTEST_SKIP() << "no workers on one processor";
   std::latch both(2);
   dsp::run_parts(2, [&](std::size_t) { both.arrive_and_wait(); });
+}
+
+TEST(WorkersConcurrency, RoundAsTheirCaller) {
+  if (std::thread::hardware_concurrency() < 2) GTEST_SKIP() << "no workers on one processor";
+  constexpr unsigned control = 0x1f80, upwards = 0x4000, no_denormals = 0x8040;
+  for (const unsigned wanted : {control | upwards, control | no_denormals, control}) {
+    std::latch both(2);
+    unsigned found[2]{};
+    _mm_setcsr(wanted);
+    dsp::run_parts(2, [&](std::size_t k) {
+      both.arrive_and_wait();
+      found[k] = _mm_getcsr();
+    });
+    EXPECT_EQ(wanted, found[0] & ~0x3fU);
+    EXPECT_EQ(wanted, found[1] & ~0x3fU);
+  }
 }
 
 TEST(WorkersConcurrency, ThrowWhatTheFirstFailureThrew) {
