@@ -11,6 +11,7 @@
 #include "planes.inl"
 #include "polynomial.inl"
 #include "polyphase.inl"
+#include "radix.inl"
 #include "recursion.inl"
 #include "resampler.inl"
 #include "rms.inl"
@@ -26,6 +27,8 @@ static constexpr kernel_table table = {
     .store_power_then_apply_window = &store_power_then_apply_window,
     .accumulate_power_then_apply_window = &accumulate_power_then_apply_window,
     .order_power = &order_power,
+    .windowed_radix_16 = &windowed_radix_16,
+    .windowed_radix_16_double = &windowed_radix_16_double,
     .add = &add,
     .reverse_conjugate = &reverse_conjugate,
     .scaled_power = &scaled_power,

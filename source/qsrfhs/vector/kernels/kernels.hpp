@@ -75,6 +75,17 @@ struct turned_angles {
   double cosine, sine;            // of the turn
 };
 
+/// The first pass of a transform of radix * row points, for samples x[r * row + n].
+template <class Real>
+struct radix_plan {
+  std::size_t row, stride;  // samples in a row, a multiple of radix_group, and from a row to the next of the results
+  const Real *window;       // for each group of columns n, the values for row 0, then for row 1, and so on
+  // Factors whose products are the twiddle factors exp(-2 pi j k n / (radix row)), 1 for k = 0:
+  const Real *columns;  // for each k, those of the first group: real parts, then imaginary ones
+  const Real *blocks;   // for each group, those of its first column, for each k: complex
+};
+inline constexpr std::size_t radix = 16, radix_group = 16;
+
 struct kernel_table {
   /// out[k] = x[k], n complex.
   void (*copy)(const float *x, float *out, std::size_t n);
@@ -92,6 +103,11 @@ struct kernel_table {
                                              const float *ahead, std::size_t ahead_count, std::size_t n);
   /// Puts powers into their order, or out of it again, n real.
   void (*order_power)(float *power, std::size_t n);
+  /// out[k * stride + n] = exp(-2 pi j k n / (16 row)) times the sum over r < 16 of
+  /// x[r * row + n] w[r * row + n] exp(-2 pi j k r / 16), for k < 16 and n < row; x apart from out. The transforms of
+  /// `row` points of the rows k then have bins k, k + 16, k + 32 and so on of the transform of all.
+  void (*windowed_radix_16)(const float *x, const radix_plan<float> &plan, float *out);
+  void (*windowed_radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
   /// sum[k] += x[k], n real.
   void (*add)(const float *x, float *sum, std::size_t n);
 

@@ -226,6 +226,9 @@ static inline void store(double *p, d4 a) {
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm256_add_pd(a.v, b.v)};
 }
+static inline d4 operator-(d4 a, d4 b) {
+  return {_mm256_sub_pd(a.v, b.v)};
+}
 static inline d4 operator*(d4 a, d4 b) {
   return {_mm256_mul_pd(a.v, b.v)};
 }

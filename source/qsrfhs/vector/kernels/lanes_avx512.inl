@@ -200,6 +200,9 @@ static inline void store(float *p, d8 a) {
 static inline d8 operator+(d8 a, d8 b) {
   return {_mm512_add_pd(a.v, b.v)};
 }
+static inline d8 operator-(d8 a, d8 b) {
+  return {_mm512_sub_pd(a.v, b.v)};
+}
 static inline d8 operator*(d8 a, d8 b) {
   return {_mm512_mul_pd(a.v, b.v)};
 }

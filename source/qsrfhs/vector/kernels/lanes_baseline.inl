@@ -237,6 +237,9 @@ static inline void store(double *p, d4 a) {
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm_add_pd(a.low, b.low), _mm_add_pd(a.high, b.high)};
 }
+static inline d4 operator-(d4 a, d4 b) {
+  return {_mm_sub_pd(a.low, b.low), _mm_sub_pd(a.high, b.high)};
+}
 static inline d4 operator*(d4 a, d4 b) {
   return {_mm_mul_pd(a.low, b.low), _mm_mul_pd(a.high, b.high)};
 }

@@ -1,0 +1,82 @@
+// The first pass of long transforms: all builds follow the definition, and those that round alike give the same bits.
+// SPDX-License-Identifier: MIT
+#include <gtest/gtest.h>
+
+#include <complex>
+#include <cstddef>
+#include <cstring>
+#include <limits>
+#include <numbers>
+#include <string>
+#include <vector>
+
+#include "qsrfhs/vector/kernels/kernels.hpp"
+#include "support/guarded.hpp"
+#include "support/signals.hpp"
+
+namespace {
+
+using namespace qsrfhs::kernels;
+
+constexpr std::size_t row = 3 * radix_group, gap = 8, stride = row + gap, length = 2 * (radix * stride - gap);
+
+template <class Real>
+std::vector<std::complex<double>> expected(const std::vector<Real> &x, const radix_plan<Real> &plan) {
+  std::vector<std::complex<double>> out(radix * row);
+  for (std::size_t k = 0; k < radix; ++k) {
+    for (std::size_t n = 0; n < row; ++n) {
+      const std::size_t group = n / radix_group, i = n % radix_group;
+      std::complex<double> sum;
+      for (std::size_t r = 0; r < radix; ++r) {
+        const std::complex<double> sample(x[2 * (r * row + n)], x[2 * (r * row + n) + 1]);
+        const double w = plan.window[(group * radix + r) * radix_group + i];
+        sum += sample * w * std::polar(1.0, -2 * std::numbers::pi * static_cast<double>(k * r % 16) / 16);
+      }
+      const Real *const near = plan.columns + 2 * k * radix_group, *const far = plan.blocks + 2 * (group * radix + k);
+      out[k * row + n] = sum;
+      if (k != 0)  // the factors of row 0 are 1
+        out[k * row + n] *= std::complex<double>(near[i], near[radix_group + i]) * std::complex<double>(far[0], far[1]);
+    }
+  }
+  return out;
+}
+
+template <class Real>
+void expect_radix(void (*kernel_table::*kernel)(const Real *, const radix_plan<Real> &, Real *)) {
+  const auto x = tests::noise_of<Real>(2 * radix * row, 1);
+  for (const auto at : {tests::edge::front, tests::edge::back}) {
+    const tests::guarded samples(x, at), window(tests::noise_of<Real>(radix * row, 2), at);
+    const tests::guarded columns(tests::noise_of<Real>(2 * radix * radix_group, 3), at);
+    const tests::guarded blocks(tests::noise_of<Real>(2 * row, 4), at);
+    const radix_plan<Real> plan{row, stride, window.as<Real>(), columns.as<Real>(), blocks.as<Real>()};
+    const auto values = expected(x, plan);
+    std::vector<Real> first[2];
+    for (const build &b : builds()) {
+      for (const bool fused : {false, true}) {
+        if (fused && b.fused == b.exact) continue;
+        const std::string what = b.name + std::string(fused ? " fused" : "");
+        const tests::guarded out(std::vector<Real>(length, 7), at);
+        ((fused ? b.fused : b.exact)->*kernel)(samples.as<Real>(), plan, out.as<Real>());
+        const std::vector<Real> got(out.as<Real>(), out.as<Real>() + length);
+        for (std::size_t i = 0; i < length / 2; ++i) {
+          const std::size_t k = i / stride, n = i % stride;
+          const std::complex<double> actual(got[2 * i], got[2 * i + 1]);
+          if (n >= row)
+            EXPECT_EQ(actual, std::complex<double>(7, 7)) << what;
+          else
+            EXPECT_LT(std::abs(actual - values[k * row + n]), 100 * std::numeric_limits<Real>::epsilon())
+                << what << ' ' << k << ' ' << n;
+        }
+        if (first[fused].empty()) first[fused] = got;
+        EXPECT_EQ(0, std::memcmp(got.data(), first[fused].data(), length * sizeof(Real))) << what;
+      }
+    }
+  }
+}
+
+TEST(RadixKernels, FollowTheirDefinition) {
+  expect_radix<float>(&kernel_table::windowed_radix_16);
+  expect_radix<double>(&kernel_table::windowed_radix_16_double);
+}
+
+}  // namespace
