@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include "signal/segment_power.hpp"
 
+#include <algorithm>
+#include <type_traits>
+
 #include "qsrfhs/vector/kernels/kernels.hpp"
-#include "signal/weighting.hpp"
 
 namespace dsp {
 namespace {
@@ -30,45 +32,41 @@ void write_power(const std::complex<Real> *x, Real *power, row_goes how, std::si
 }  // namespace
 
 template <class Sample>
-segment_power<Sample>::segment_power(std::span<const real> window)
-    : window_(window),
-      work_(window.size()),
-      spectrum_(is_complex<Sample> ? 0 : bins(window.size())),
+segment_power<Sample>::segment_power(const segment_plan<Sample> &plan)
+    : plan_(plan),
+      work_(plan.rows() * plan.stride()),
+      spectrum_(is_complex<Sample> ? 0 : segment_plan<Sample>::bins(plan.points())),
       transform_(dfti_settings{.precision = sizeof(real) == sizeof(double) ? DFTI_DOUBLE : DFTI_SINGLE,
                                .domain = is_complex<Sample> ? DFTI_COMPLEX : DFTI_REAL,
-                               .lengths = {static_cast<MKL_LONG>(window.size()), 0},
+                               .lengths = {static_cast<MKL_LONG>(plan.row()), 0},
                                .in_place = is_complex<Sample>}) {}
-
-template <class Sample>
-void segment_power<Sample>::begin(const Sample *x) noexcept {
-  weigh(x, window_.data(), work_.data(), window_.size());
-}
 
 template <class Sample>
 void segment_power<Sample>::finish(real *power, row_goes how, const Sample *next, std::size_t ahead,
                                    const qsrfhs::mkl_section &around) {
-  const std::size_t n = window_.size();
-  if constexpr (std::is_same_v<Sample, cf32>) {
-    transform_.forward(work_.data(), around);
-    const auto &kernels = qsrfhs::kernels::exact();
-    float *const work = floats(work_.data());
-    if (!next) return write_power(work_.data(), power, how, n);
-    (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window : kernels.store_power_then_apply_window)(
-        work, power, floats(next), window_.data(), floats(next + n), ahead, n);
-  } else if constexpr (is_complex<Sample>) {
-    transform_.forward(work_.data(), around);
-    write_power(work_.data(), power, how, n);
-    if (next) begin(next);
-  } else {
+  if constexpr (!is_complex<Sample>) {
     transform_.forward(work_.data(), spectrum_.data(), around);
     write_power(spectrum_.data(), power, how, spectrum_.size());
-    if (next) begin(next);
+  } else {
+    const std::size_t n = plan_.row();
+    if constexpr (std::is_same_v<Sample, cf32>) {
+      if (next && plan_.rows() == 1) {
+        // In one pass, so that neither goes through the caches twice.
+        transform_.forward(work_.data(), around);
+        const auto &kernels = qsrfhs::kernels::exact();
+        return (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window
+                                        : kernels.store_power_then_apply_window)(
+            floats(work_.data()), power, floats(next), plan_.window(), floats(next + n), ahead, n);
+      }
+    }
+    // Powers while the row is in the first-level cache.
+    for (std::size_t r = 0; r < plan_.rows(); ++r) {
+      Sample *const row = work_.data() + r * plan_.stride();
+      transform_.forward(row, around);
+      write_power(row, power + r * n, how, n);
+    }
   }
-}
-
-template <class Sample>
-void segment_power<Sample>::order(std::span<real> power) noexcept {
-  if constexpr (std::is_same_v<real, float>) qsrfhs::kernels::exact().order_power(power.data(), power.size());
+  if (next) begin(next);
 }
 
 template class segment_power<float>;

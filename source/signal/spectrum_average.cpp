@@ -35,7 +35,7 @@ void lower(std::span<const Real> x, std::span<Real> minimum) noexcept {
 
 template <class Sample>
 spectrum_average<Sample>::lane::lane(const spectrum_average &owner)
-    : power(owner.window_.elements()), forest(owner.bins(), owner.settings_.step, owner.settings_.start) {
+    : power(owner.plan_), forest(owner.bins(), owner.settings_.step, owner.settings_.start) {
   if (owner.settings_.hold == extremes::forgotten) return;
   leaf = qsrfhs::aligned_buffer<real>(owner.bins());
   maximum = qsrfhs::aligned_buffer<real>(owner.bins());
@@ -45,26 +45,32 @@ spectrum_average<Sample>::lane::lane(const spectrum_average &owner)
 template <class Sample>
 spectrum_average<Sample>::spectrum_average(const spectrum_settings &settings)
     : settings_(settings),
-      window_(settings.points),
+      plan_(make_plan()),
       scratch_(bins()),
+      ordered_(bins()),
       origin_(settings.origin),
       position_(settings.start),
       tail_(2 * settings.points) {
-  make_window(settings.window, window_span::periodic, window_.elements());
-  double sum = 0, squares = 0;
-  for (const real w : window_.elements()) {
-    sum += static_cast<double>(w);
-    squares += static_cast<double>(w) * static_cast<double>(w);
-  }
-  noise_bandwidth_ = static_cast<double>(settings.points) * squares / (sum * sum);
-  for (real &w : window_.elements()) w = static_cast<real>(static_cast<double>(w) / sum);
-
   const std::uint64_t done = (settings.start - settings.origin + settings.step - 1) / settings.step;
   next_ = settings.origin + done * settings.step;
   head_.reserve(head_size());
   head_grows_ = head_size() != 0;
   const qsrfhs::mkl_runtime::use in_use;
   lanes_.push_back(std::make_unique<lane>(*this));
+}
+
+template <class Sample>
+segment_plan<Sample> spectrum_average<Sample>::make_plan() {
+  qsrfhs::aligned_buffer<real> window(settings_.points);
+  make_window(settings_.window, window_span::periodic, window.elements());
+  double sum = 0, squares = 0;
+  for (const real w : window.elements()) {
+    sum += static_cast<double>(w);
+    squares += static_cast<double>(w) * static_cast<double>(w);
+  }
+  noise_bandwidth_ = static_cast<double>(settings_.points) * squares / (sum * sum);
+  for (real &w : window.elements()) w = static_cast<real>(static_cast<double>(w) / sum);
+  return segment_plan<Sample>(std::move(window));
 }
 
 /// Samples from the start on that segments need which begin in front of it.
@@ -254,9 +260,8 @@ void spectrum_average<Sample>::clear() {
 
 template <class Sample>
 void spectrum_average<Sample>::order(std::span<const real> power, double scale, std::span<double> out) const {
-  std::copy(power.begin(), power.end(), scratch_.data());
-  segment_power<Sample>::order(scratch_.elements());
-  const std::span<const real> row = scratch_.elements();
+  plan_.to_bins(power, ordered_.elements());
+  const std::span<const real> row = ordered_.elements();
   const std::size_t points = settings_.points;
   if constexpr (is_complex<Sample>) {
     const std::size_t positive = points - points / 2;  // bins from 0 on

@@ -10,6 +10,7 @@
 
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "signal/power_forest.hpp"
+#include "signal/segment_plan.hpp"
 #include "signal/segment_power.hpp"
 #include "signal/window.hpp"
 
@@ -44,7 +45,7 @@ class spectrum_average {
   explicit spectrum_average(const spectrum_settings &settings);
 
   [[nodiscard]] const spectrum_settings &settings() const noexcept { return settings_; }
-  [[nodiscard]] std::size_t bins() const noexcept { return segment_power<Sample>::bins(settings_.points); }
+  [[nodiscard]] std::size_t bins() const noexcept { return segment_plan<Sample>::bins(settings_.points); }
   [[nodiscard]] double noise_bandwidth() const noexcept { return noise_bandwidth_; }  // in bins
   [[nodiscard]] std::uint64_t start() const noexcept { return settings_.start; }
   [[nodiscard]] std::uint64_t first_origin() const noexcept { return settings_.origin; }
@@ -83,6 +84,7 @@ class spectrum_average {
     bool has_extremes = false;
   };
 
+  segment_plan<Sample> make_plan();
   [[nodiscard]] std::size_t head_size() const noexcept;
   void require_lanes(std::uint64_t segments);
   [[nodiscard]] std::size_t lanes_for(std::uint64_t segments) const noexcept;
@@ -93,10 +95,11 @@ class spectrum_average {
   void order(std::span<const real> power, double scale, std::span<double> out) const;
 
   spectrum_settings settings_;
-  qsrfhs::aligned_buffer<real> window_;
   double noise_bandwidth_;
+  segment_plan<Sample> plan_;
   std::vector<std::unique_ptr<lane>> lanes_;  // the first is the caller's, with what all have gathered
-  qsrfhs::aligned_buffer<real> scratch_;      // a row
+  qsrfhs::aligned_buffer<real> scratch_;      // a row of powers
+  qsrfhs::aligned_buffer<real> ordered_;      // one in the order of the bins
   std::uint64_t origin_, position_, next_;    // next_: where the next segment begins
   std::uint64_t segments_ = 0;
   std::vector<Sample> head_;
@@ -117,11 +120,8 @@ void spectrum_average<Sample>::save(Writer &to) const {
   to.add_all(std::span<const Sample>(head_));
   to.add_all(std::span<const Sample>(tail_.data(), tail_count_));
   const auto add_row = [&](std::span<const real> row) {
-    if (!to.only_counts()) {
-      std::copy(row.begin(), row.end(), scratch_.data());
-      segment_power<Sample>::order(scratch_.elements());
-    }
-    to.add_all(std::span<const real>(scratch_.elements()));
+    if (!to.only_counts()) plan_.to_bins(row, ordered_.elements());
+    to.add_all(std::span<const real>(ordered_.elements()));
   };
   for (const auto &tree : all.forest.trees()) {
     to.add(tree.first);
@@ -153,8 +153,8 @@ bool spectrum_average<Sample>::load(Reader &from) {
   from.take_all(std::span<Sample>(head_));
   from.take_all(std::span<Sample>(tail_.data(), static_cast<std::size_t>(tail)));
   const auto take_row = [&] {
-    from.take_all(scratch_.elements());
-    segment_power<Sample>::order(scratch_.elements());
+    from.take_all(ordered_.elements());
+    plan_.from_bins(ordered_.elements(), scratch_.elements());
   };
   std::uint64_t behind = settings_.start;
   for (std::uint64_t k = 0; k < trees; ++k) {
