@@ -17,7 +17,7 @@ constexpr std::size_t radix = qsrfhs::kernels::radix, group = qsrfhs::kernels::r
 
 /// From here on the pass gains: it costs less than what transforms of all points lose to the second-level cache.
 template <class Real>
-constexpr std::size_t least_split = std::is_same_v<Real, float> ? 8192 : 4096;
+constexpr std::size_t least_split = std::is_same_v<Real, float> ? 8192 : 2048;
 
 template <class Sample>
 std::size_t rows_for(std::size_t points) noexcept {
