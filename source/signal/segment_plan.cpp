@@ -2,32 +2,32 @@
 #include "signal/segment_plan.hpp"
 
 #include <algorithm>
-#include <complex>
 #include <type_traits>
 #include <utility>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
 #include "signal/rotation.hpp"
-#include "signal/weighting.hpp"
 
 namespace dsp {
 namespace {
 
 constexpr std::size_t radix = qsrfhs::kernels::radix, group = qsrfhs::kernels::radix_group;
 
-/// From here on the pass gains: it costs less than what transforms of all points lose to the second-level cache.
-template <class Real>
-constexpr std::size_t least_split = std::is_same_v<Real, float> ? 8192 : 2048;
+/// From here on the first pass costs less than what transforms of all points lose to the second-level cache.
+template <class Sample>
+constexpr std::size_t least_split = std::is_same_v<Sample, std::complex<double>> ? 2048 : 8192;
 
+/// Rows are whole groups, those of real samples up to half the rate, too.
 template <class Sample>
 std::size_t rows_for(std::size_t points) noexcept {
-  if (!is_complex<Sample> || points < least_split<real_of<Sample>> || points % (radix * group) != 0) return 1;
-  return radix;
+  constexpr std::size_t multiple = radix * group * (is_complex<Sample> ? 1 : 2);
+  if (points < least_split<Sample> || points % multiple != 0) return 1;
+  return is_complex<Sample> ? radix : radix / 2 + 1;
 }
 
 /// A line of the caches between rows, which would lie in the same few lines of a cache otherwise.
-template <class Sample>
-constexpr std::size_t line = 64 / sizeof(Sample);
+template <class Bin>
+constexpr std::size_t gap = 64 / sizeof(Bin);
 
 /// Into the order of the kernels' powers, or out of it.
 template <class Real>
@@ -40,77 +40,110 @@ void order(Real *power, std::size_t n) noexcept {
 template <class Sample>
 segment_plan<Sample>::segment_plan(qsrfhs::aligned_buffer<real> window)
     : rows_(rows_for<Sample>(window.size())),
-      row_(window.size() / rows_),
-      stride_(rows_ == 1 ? row_ : row_ + line<Sample>),
+      row_(is_split() ? window.size() / radix : window.size()),
+      stride_(is_split() ? row_ + gap<bin> : row_),
       window_(std::move(window)) {
-  if (rows_ == 1) return;
+  if (!is_split()) return;
   const qsrfhs::aligned_buffer<real> natural = std::exchange(window_, qsrfhs::aligned_buffer<real>(points()));
   for (std::size_t n = 0; n < row_; n += group)
     for (std::size_t r = 0; r < radix; ++r)
       std::copy_n(natural.data() + r * row_ + n, group, window_.data() + n * radix + r * group);
 
-  const auto cycle = [&](std::size_t k, std::size_t n) {
-    return on_circle(-static_cast<double>(k * n % points()) / static_cast<double>(points()));
+  const auto factor = [&](std::size_t k, std::size_t n) {
+    return bin(on_circle(-static_cast<double>(k * n % points()) / static_cast<double>(points())));
   };
-  columns_ = qsrfhs::aligned_buffer<real>(2 * radix * group);
-  blocks_ = qsrfhs::aligned_buffer<real>(2 * row_);
+  near_ = qsrfhs::aligned_buffer<real>(2 * radix * group);
+  far_ = qsrfhs::aligned_buffer<real>(2 * row_);
   for (std::size_t k = 0; k < radix; ++k) {
+    real *const near = near_.data() + 2 * k * group;
     for (std::size_t n = 0; n < group; ++n) {
-      const std::complex<double> turn = cycle(k, n);
-      columns_.data()[2 * k * group + n] = static_cast<real>(turn.real());
-      columns_.data()[2 * k * group + group + n] = static_cast<real>(turn.imag());
+      near[n] = factor(k, n).real();
+      near[group + n] = factor(k, n).imag();
     }
     for (std::size_t n = 0; n < row_; n += group) {
-      const std::complex<double> turn = cycle(k, n);
-      blocks_.data()[2 * n + 2 * k] = static_cast<real>(turn.real());
-      blocks_.data()[2 * n + 2 * k + 1] = static_cast<real>(turn.imag());
+      const bin turn = factor(k, n);
+      far_.data()[2 * (n + k)] = turn.real();
+      far_.data()[2 * (n + k) + 1] = turn.imag();
     }
   }
 }
 
 template <class Sample>
-void segment_plan<Sample>::split(const Sample *x, Sample *rows) const noexcept {
-  if (rows_ == 1) return weigh(x, window_.data(), rows, points());
-  if constexpr (is_complex<Sample>) {
-    const qsrfhs::kernels::radix_plan<real> plan{row_, stride_, window_.data(), columns_.data(), blocks_.data()};
-    const auto *const from = reinterpret_cast<const real *>(x);
-    auto *const to = reinterpret_cast<real *>(rows);
-    const auto &kernels = qsrfhs::kernels::fused();
-    if constexpr (std::is_same_v<real, float>)
-      kernels.windowed_radix_16(from, plan, to);
-    else
-      kernels.windowed_radix_16_double(from, plan, to);
-  }
+void segment_plan<Sample>::split(const Sample *x, bin *rows) const noexcept {
+  const qsrfhs::kernels::radix_plan<real> plan{row_, stride_, window_.data(), near_.data(), far_.data()};
+  const auto *const from = reinterpret_cast<const real *>(x);
+  auto *const to = reinterpret_cast<real *>(rows);
+  const auto &kernels = qsrfhs::kernels::fused();
+  if constexpr (std::is_same_v<Sample, float>)
+    kernels.windowed_real_radix_16(from, plan, to);
+  else if constexpr (std::is_same_v<Sample, double>)
+    kernels.windowed_real_radix_16_double(from, plan, to);
+  else if constexpr (std::is_same_v<real, float>)
+    kernels.windowed_radix_16(from, plan, to);
+  else
+    kernels.windowed_radix_16_double(from, plan, to);
+}
+
+/// Rows 0 and 8 of real samples have bins up to half the rate alone. They come last: the one bin more that row 0 has
+/// leaves all others in whole groups.
+template <class Sample>
+auto segment_plan<Sample>::powers_of(std::size_t row) const noexcept -> range {
+  if (!is_split()) return {0, bins(points())};
+  if (is_complex<Sample>) return {row * row_, row_};
+  const std::size_t half = row_ / 2;
+  if (row == 0) return {15 * half, half + 1};
+  return {(row - 1) * row_, row == 8 ? half : row_};
+}
+
+/// Groups of all bins r + 16 n with n below this are all bins, but for the one at half the rate.
+template <class Sample>
+std::size_t segment_plan<Sample>::columns() const noexcept {
+  return is_complex<Sample> ? row_ : row_ / 2;
+}
+
+/// The powers of bins r + 16 n, r + 16 (n + 1) and so on.
+template <class Sample>
+auto segment_plan<Sample>::group_of(std::size_t r, std::size_t n) const noexcept -> group_place {
+  if (r < rows_) return {powers_of(r).first + n, false};
+  return {powers_of(radix - r).first + row_ - group - n, true};
 }
 
 template <class Sample>
 void segment_plan<Sample>::to_bins(std::span<const real> power, std::span<real> bins) const noexcept {
-  if (rows_ == 1) {
+  if (!is_split()) {
     std::copy(power.begin(), power.end(), bins.begin());
     return order(bins.data(), bins.size());
   }
-  real tile[radix * group];
-  for (std::size_t n = 0; n < row_; n += group) {
-    for (std::size_t r = 0; r < radix; ++r) std::copy_n(power.data() + r * row_ + n, group, tile + r * group);
-    order(tile, std::size(tile));
+  real tile[radix][group];
+  for (std::size_t n = 0; n < columns(); n += group) {
+    for (std::size_t r = 0; r < radix; ++r) {
+      const group_place from = group_of(r, n);
+      std::copy_n(power.data() + from.first, group, tile[r]);
+      order(tile[r], group);
+      if (from.reversed) std::reverse(tile[r], tile[r] + group);
+    }
     for (std::size_t i = 0; i < group; ++i)
-      for (std::size_t r = 0; r < radix; ++r) bins[(n + i) * radix + r] = tile[r * group + i];
+      for (std::size_t r = 0; r < radix; ++r) bins[(n + i) * radix + r] = tile[r][i];
   }
+  if constexpr (!is_complex<Sample>) bins.back() = power.back();
 }
 
 template <class Sample>
 void segment_plan<Sample>::from_bins(std::span<const real> bins, std::span<real> power) const noexcept {
-  if (rows_ == 1) {
+  if (!is_split()) {
     std::copy(bins.begin(), bins.end(), power.begin());
     return order(power.data(), power.size());
   }
-  real tile[radix * group];
-  for (std::size_t n = 0; n < row_; n += group) {
-    for (std::size_t i = 0; i < group; ++i)
-      for (std::size_t r = 0; r < radix; ++r) tile[r * group + i] = bins[(n + i) * radix + r];
-    order(tile, std::size(tile));
-    for (std::size_t r = 0; r < radix; ++r) std::copy_n(tile + r * group, group, power.data() + r * row_ + n);
+  for (std::size_t n = 0; n < columns(); n += group) {
+    for (std::size_t r = 0; r < radix; ++r) {
+      const group_place place = group_of(r, n);
+      real *const to = power.data() + place.first;
+      for (std::size_t i = 0; i < group; ++i) to[i] = bins[(n + i) * radix + r];
+      if (place.reversed) std::reverse(to, to + group);
+      order(to, group);
+    }
   }
+  if constexpr (!is_complex<Sample>) power.back() = bins.back();
 }
 
 template class segment_plan<float>;

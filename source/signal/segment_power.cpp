@@ -5,6 +5,7 @@
 #include <type_traits>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/weighting.hpp"
 
 namespace dsp {
 namespace {
@@ -34,37 +35,45 @@ void write_power(const std::complex<Real> *x, Real *power, row_goes how, std::si
 template <class Sample>
 segment_power<Sample>::segment_power(const segment_plan<Sample> &plan)
     : plan_(plan),
-      work_(plan.rows() * plan.stride()),
-      spectrum_(is_complex<Sample> ? 0 : segment_plan<Sample>::bins(plan.points())),
+      real_(has_real_transform() ? plan.points() : 0),
+      rows_(has_real_transform() ? segment_plan<Sample>::bins(plan.points()) : plan.rows() * plan.stride()),
       transform_(dfti_settings{.precision = sizeof(real) == sizeof(double) ? DFTI_DOUBLE : DFTI_SINGLE,
-                               .domain = is_complex<Sample> ? DFTI_COMPLEX : DFTI_REAL,
+                               .domain = has_real_transform() ? DFTI_REAL : DFTI_COMPLEX,
                                .lengths = {static_cast<MKL_LONG>(plan.row()), 0},
-                               .in_place = is_complex<Sample>}) {}
+                               .in_place = !has_real_transform()}) {}
+
+template <class Sample>
+void segment_power<Sample>::begin(const Sample *x) noexcept {
+  if (plan_.is_split()) return plan_.split(x, rows_.data());
+  if constexpr (is_complex<Sample>)
+    weigh(x, plan_.window(), rows_.data(), plan_.points());
+  else
+    weigh(x, plan_.window(), real_.data(), plan_.points());
+}
 
 template <class Sample>
 void segment_power<Sample>::finish(real *power, row_goes how, const Sample *next, std::size_t ahead,
                                    const qsrfhs::mkl_section &around) {
-  if constexpr (!is_complex<Sample>) {
-    transform_.forward(work_.data(), spectrum_.data(), around);
-    write_power(spectrum_.data(), power, how, spectrum_.size());
-  } else {
-    const std::size_t n = plan_.row();
-    if constexpr (std::is_same_v<Sample, cf32>) {
-      if (next && plan_.rows() == 1) {
-        // In one pass, so that neither goes through the caches twice.
-        transform_.forward(work_.data(), around);
-        const auto &kernels = qsrfhs::kernels::exact();
-        return (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window
-                                        : kernels.store_power_then_apply_window)(
-            floats(work_.data()), power, floats(next), plan_.window(), floats(next + n), ahead, n);
-      }
+  if constexpr (std::is_same_v<Sample, cf32>) {
+    if (next && !plan_.is_split()) {
+      // Powers and window in one pass: the segment goes through the caches once.
+      transform_.forward(rows_.data(), around);
+      const auto &kernels = qsrfhs::kernels::exact();
+      const std::size_t n = plan_.points();
+      return (how == row_goes::on_top ? kernels.accumulate_power_then_apply_window
+                                      : kernels.store_power_then_apply_window)(
+          floats(rows_.data()), power, floats(next), plan_.window(), floats(next + n), ahead, n);
     }
-    // Powers while the row is in the first-level cache.
-    for (std::size_t r = 0; r < plan_.rows(); ++r) {
-      Sample *const row = work_.data() + r * plan_.stride();
+  }
+  // Powers of a row while it is in the first-level cache.
+  for (std::size_t r = 0; r < plan_.rows(); ++r) {
+    std::complex<real> *const row = rows_.data() + r * plan_.stride();
+    if (has_real_transform())
+      transform_.forward(real_.data(), row, around);
+    else
       transform_.forward(row, around);
-      write_power(row, power + r * n, how, n);
-    }
+    const auto powers = plan_.powers_of(r);
+    write_power(row, power + powers.first, how, powers.count);
   }
   if (next) begin(next);
 }

@@ -22,16 +22,18 @@ class segment_power {
   explicit segment_power(const segment_plan<Sample> &plan);
 
   /// The first segment of a run.
-  void begin(const Sample *x) noexcept { plan_.split(x, work_.data()); }
+  void begin(const Sample *x) noexcept;
   /// Writes the powers of the segment that was begun, or adds them, and begins the next one, unless that is null.
   /// `ahead` is how many of its samples behind the next segment the caches are asked for. To be called inside of the
   /// section.
   void finish(real *power, row_goes how, const Sample *next, std::size_t ahead, const qsrfhs::mkl_section &around);
 
  private:
+  [[nodiscard]] bool has_real_transform() const noexcept { return !is_complex<Sample> && !plan_.is_split(); }
+
   const segment_plan<Sample> &plan_;
-  qsrfhs::aligned_buffer<Sample> work_;
-  qsrfhs::aligned_buffer<std::complex<real>> spectrum_;  // of real samples
+  qsrfhs::aligned_buffer<Sample> real_;  // the windowed segment, where its transform is one of real samples
+  qsrfhs::aligned_buffer<std::complex<real>> rows_;
   dfti_descriptor transform_;
 };
 

@@ -18,21 +18,23 @@ namespace {
 
 using namespace qsrfhs::kernels;
 
-constexpr std::size_t row = 3 * radix_group, gap = 8, stride = row + gap, length = 2 * (radix * stride - gap);
+constexpr std::size_t row = 3 * radix_group, gap = 8, stride = row + gap;
+
+enum class samples_are { complex, real };
 
 template <class Real>
-std::vector<std::complex<double>> expected(const std::vector<Real> &x, const radix_plan<Real> &plan) {
-  std::vector<std::complex<double>> out(radix * row);
-  for (std::size_t k = 0; k < radix; ++k) {
+std::vector<std::complex<double>> expected(const std::vector<std::complex<double>> &x, std::size_t rows,
+                                           const radix_plan<Real> &plan) {
+  std::vector<std::complex<double>> out(rows * row);
+  for (std::size_t k = 0; k < rows; ++k) {
     for (std::size_t n = 0; n < row; ++n) {
       const std::size_t group = n / radix_group, i = n % radix_group;
       std::complex<double> sum;
       for (std::size_t r = 0; r < radix; ++r) {
-        const std::complex<double> sample(x[2 * (r * row + n)], x[2 * (r * row + n) + 1]);
         const double w = plan.window[(group * radix + r) * radix_group + i];
-        sum += sample * w * std::polar(1.0, -2 * std::numbers::pi * static_cast<double>(k * r % 16) / 16);
+        sum += x[r * row + n] * w * std::polar(1.0, -2 * std::numbers::pi * static_cast<double>(k * r % 16) / 16);
       }
-      const Real *const near = plan.columns + 2 * k * radix_group, *const far = plan.blocks + 2 * (group * radix + k);
+      const Real *const near = plan.near + 2 * k * radix_group, *const far = plan.far + 2 * (group * radix + k);
       out[k * row + n] = sum;
       if (k != 0)  // the factors of row 0 are 1
         out[k * row + n] *= std::complex<double>(near[i], near[radix_group + i]) * std::complex<double>(far[0], far[1]);
@@ -42,14 +44,19 @@ std::vector<std::complex<double>> expected(const std::vector<Real> &x, const rad
 }
 
 template <class Real>
-void expect_radix(void (*kernel_table::*kernel)(const Real *, const radix_plan<Real> &, Real *)) {
-  const auto x = tests::noise_of<Real>(2 * radix * row, 1);
+void expect_radix(samples_are kind, void (*kernel_table::*kernel)(const Real *, const radix_plan<Real> &, Real *)) {
+  const bool complex = kind == samples_are::complex;
+  const auto x = tests::noise_of<Real>((complex ? 2 : 1) * radix * row, 1);
+  std::vector<std::complex<double>> wide(radix * row);
+  for (std::size_t i = 0; i < wide.size(); ++i)
+    wide[i] = complex ? std::complex<double>(x[2 * i], x[2 * i + 1]) : std::complex<double>(x[i]);
+  const std::size_t rows = complex ? radix : radix / 2 + 1, length = 2 * (rows * stride - gap);
   for (const auto at : {tests::edge::front, tests::edge::back}) {
     const tests::guarded samples(x, at), window(tests::noise_of<Real>(radix * row, 2), at);
-    const tests::guarded columns(tests::noise_of<Real>(2 * radix * radix_group, 3), at);
-    const tests::guarded blocks(tests::noise_of<Real>(2 * row, 4), at);
-    const radix_plan<Real> plan{row, stride, window.as<Real>(), columns.as<Real>(), blocks.as<Real>()};
-    const auto values = expected(x, plan);
+    const tests::guarded near(tests::noise_of<Real>(2 * radix * radix_group, 3), at);
+    const tests::guarded far(tests::noise_of<Real>(2 * row, 4), at);
+    const radix_plan<Real> plan{row, stride, window.as<Real>(), near.as<Real>(), far.as<Real>()};
+    const auto values = expected(wide, rows, plan);
     std::vector<Real> first[2];
     for (const build &b : builds()) {
       for (const bool fused : {false, true}) {
@@ -75,8 +82,10 @@ void expect_radix(void (*kernel_table::*kernel)(const Real *, const radix_plan<R
 }
 
 TEST(RadixKernels, FollowTheirDefinition) {
-  expect_radix<float>(&kernel_table::windowed_radix_16);
-  expect_radix<double>(&kernel_table::windowed_radix_16_double);
+  expect_radix<float>(samples_are::complex, &kernel_table::windowed_radix_16);
+  expect_radix<double>(samples_are::complex, &kernel_table::windowed_radix_16_double);
+  expect_radix<float>(samples_are::real, &kernel_table::windowed_real_radix_16);
+  expect_radix<double>(samples_are::real, &kernel_table::windowed_real_radix_16_double);
 }
 
 }  // namespace

@@ -81,8 +81,8 @@ struct radix_plan {
   std::size_t row, stride;  // samples in a row, a multiple of radix_group, and from a row to the next of the results
   const Real *window;       // for each group of columns n, the values for row 0, then for row 1, and so on
   // Factors whose products are the twiddle factors exp(-2 pi j k n / (radix row)), 1 for k = 0:
-  const Real *columns;  // for each k, those of the first group: real parts, then imaginary ones
-  const Real *blocks;   // for each group, those of its first column, for each k: complex
+  const Real *near;  // for each k, those of the first group: real parts, then imaginary ones
+  const Real *far;   // for each group, those of its first column, for each k: complex
 };
 inline constexpr std::size_t radix = 16, radix_group = 16;
 
@@ -108,6 +108,9 @@ struct kernel_table {
   /// `row` points of the rows k then have bins k, k + 16, k + 32 and so on of the transform of all.
   void (*windowed_radix_16)(const float *x, const radix_plan<float> &plan, float *out);
   void (*windowed_radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
+  /// The same with real x, for k from 0 to 8: bins of k above 8 are conjugates of those of 16 - k.
+  void (*windowed_real_radix_16)(const float *x, const radix_plan<float> &plan, float *out);
+  void (*windowed_real_radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
   /// sum[k] += x[k], n real.
   void (*add)(const float *x, float *sum, std::size_t n);
 

@@ -75,6 +75,13 @@ static inline planes_of<Lanes> turn(planes_of<Lanes> a) {
   return a;
 }
 
+/// The window's values for row 0 from column n on.
+template <class Real>
+static inline const Real *window_of(const radix_plan<Real> &plan, std::size_t n) {
+  const std::size_t in_group = n % radix_group;
+  return plan.window + (n - in_group) * radix + in_group;
+}
+
 /// Points b, b + 4, b + 8 and b + 12 of the radix, to point b of each of four transforms p.
 template <int b, class Lanes, class Real>
 static inline void first_four(const Real *x, std::size_t row, const Real *w, planes_of<Lanes> (*between)[4]) {
@@ -92,42 +99,110 @@ static inline void first_four(const Real *x, std::size_t row, const Real *w, pla
   between[3][b] = turn<3, b, Real>(out[3]);
 }
 
-/// Points p, p + 4, p + 8 and p + 12 of the results, times their twiddle factors.
+/// Where the results of some columns go, and their twiddle factors.
+template <class Real>
+struct radix_columns {
+  const Real *near, *far;
+  Real *out;
+  std::size_t stride;
+
+  radix_columns(const radix_plan<Real> &plan, std::size_t n, Real *all)
+      : near(plan.near + n % radix_group),
+        far(plan.far + 2 * (n - n % radix_group)),
+        out(all + 2 * n),
+        stride(plan.stride) {}
+
+  /// Point k of the results, times its factors.
+  template <class Lanes>
+  inline void put(std::size_t k, planes_of<Lanes> a) const {
+    const Real *const column = near + 2 * k * radix_group;
+    const planes_of<Lanes> first{Lanes::load(column), Lanes::load(column + radix_group)};
+    const planes_of<Lanes> rest{Lanes::broadcast(far[2 * k]), Lanes::broadcast(far[2 * k + 1])};
+    store_planes(out + 2 * k * stride, a * (first * rest));
+  }
+};
+
+/// Points p, p + 4, p + 8 and p + 12 of the results.
 template <int p, class Lanes, class Real>
-static inline void second_four(const planes_of<Lanes> *x, const Real *columns, const Real *block, Real *out,
-                               std::size_t stride) {
+static inline void second_four(const planes_of<Lanes> *x, const radix_columns<Real> &columns) {
   planes_of<Lanes> y[4];
   if constexpr (p == 2)
     four_points(subtract_turned(x[0], x[2]), add_turned(x[0], x[2]), x[1] + x[3], x[1] - x[3], y);
   else
     four_points(x[0] + x[2], x[0] - x[2], x[1] + x[3], x[1] - x[3], y);
-  for (std::size_t q = 0; q < 4; ++q) {
-    const std::size_t k = p + 4 * q;
-    if (k != 0) {
-      const Real *const column = columns + 2 * k * radix_group;
-      const planes_of<Lanes> near{Lanes::load(column), Lanes::load(column + radix_group)};
-      const planes_of<Lanes> far{Lanes::broadcast(block[2 * k]), Lanes::broadcast(block[2 * k + 1])};
-      y[q] = y[q] * (near * far);
-    }
-    store_planes(out + 2 * k * stride, y[q]);
-  }
+  if constexpr (p == 0)
+    store_planes(columns.out, y[0]);
+  else
+    columns.put(p, y[0]);
+  for (std::size_t q = 1; q < 4; ++q) columns.put(p + 4 * q, y[q]);
 }
 
 template <class Lanes, class Real>
 static inline void windowed_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
   for (std::size_t n = 0; n < plan.row; n += Lanes::lanes) {
-    const std::size_t in_group = n % radix_group, group = n - in_group;
-    const Real *const w = plan.window + group * radix + in_group;
+    const Real *const w = window_of(plan, n);
     planes_of<Lanes> between[4][4];
     first_four<0>(x + 2 * n, plan.row, w, between);
     first_four<1>(x + 2 * n, plan.row, w, between);
     first_four<2>(x + 2 * n, plan.row, w, between);
     first_four<3>(x + 2 * n, plan.row, w, between);
-    const Real *const columns = plan.columns + in_group, *const block = plan.blocks + 2 * group;
-    second_four<0>(between[0], columns, block, out + 2 * n, plan.stride);
-    second_four<1>(between[1], columns, block, out + 2 * n, plan.stride);
-    second_four<2>(between[2], columns, block, out + 2 * n, plan.stride);
-    second_four<3>(between[3], columns, block, out + 2 * n, plan.stride);
+    const radix_columns<Real> columns(plan, n, out);
+    second_four<0>(between[0], columns);
+    second_four<1>(between[1], columns);
+    second_four<2>(between[2], columns);
+    second_four<3>(between[3], columns);
+  }
+}
+
+/// The same of real samples: p = 3 has the conjugates of what p = 1 has.
+template <class Lanes>
+struct real_fours {
+  Lanes even[4], odd[4];  // p = 0 and 2
+  planes_of<Lanes> turned[4];
+};
+
+template <int b, class Lanes, class Real>
+static inline void first_real_four(const Real *x, std::size_t row, const Real *w, real_fours<Lanes> &between) {
+  const auto weighted = [&](std::size_t r) { return Lanes::load(x + r * row) * Lanes::load(w + r * radix_group); };
+  const Lanes x0 = weighted(b), x1 = weighted(b + 4), x2 = weighted(b + 8), x3 = weighted(b + 12);
+  const Lanes x02 = x0 + x2, x13 = x1 + x3;
+  between.even[b] = x02 + x13;
+  between.odd[b] = x02 - x13;
+  between.turned[b] = turn<1, b, Real>(planes_of<Lanes>{x0 - x2, x3 - x1});
+}
+
+template <class Lanes, class Real>
+static inline void second_real_fours(const real_fours<Lanes> &x, const radix_columns<Real> &columns) {
+  const Lanes none = Lanes::broadcast(0);
+  const Lanes e02 = x.even[0] + x.even[2], e13 = x.even[1] + x.even[3];
+  store_planes(columns.out, planes_of<Lanes>{e02 + e13, none});
+  columns.put(4, planes_of<Lanes>{x.even[0] - x.even[2], x.even[3] - x.even[1]});
+  columns.put(8, planes_of<Lanes>{e02 - e13, none});
+
+  const Lanes diagonal = Lanes::broadcast(static_cast<Real>(0.70710678118654752));
+  const Lanes re = (x.odd[1] - x.odd[3]) * diagonal, im = (x.odd[1] + x.odd[3]) * diagonal;
+  columns.put(2, planes_of<Lanes>{x.odd[0] + re, none - (x.odd[2] + im)});
+  columns.put(6, planes_of<Lanes>{x.odd[0] - re, x.odd[2] - im});
+
+  planes_of<Lanes> y[4];
+  const planes_of<Lanes> *const t = x.turned;
+  four_points(t[0] + t[2], t[0] - t[2], t[1] + t[3], t[1] - t[3], y);
+  columns.put(1, y[0]);
+  columns.put(5, y[1]);
+  columns.put(7, planes_of<Lanes>{y[2].re, none - y[2].im});
+  columns.put(3, planes_of<Lanes>{y[3].re, none - y[3].im});
+}
+
+template <class Lanes, class Real>
+static inline void windowed_real_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
+  for (std::size_t n = 0; n < plan.row; n += Lanes::lanes) {
+    const Real *const w = window_of(plan, n);
+    real_fours<Lanes> between;
+    first_real_four<0>(x + n, plan.row, w, between);
+    first_real_four<1>(x + n, plan.row, w, between);
+    first_real_four<2>(x + n, plan.row, w, between);
+    first_real_four<3>(x + n, plan.row, w, between);
+    second_real_fours(between, radix_columns<Real>(plan, n, out));
   }
 }
 
@@ -136,4 +211,10 @@ static void windowed_radix_16(const float *x, const radix_plan<float> &plan, flo
 }
 static void windowed_radix_16_double(const double *x, const radix_plan<double> &plan, double *out) {
   windowed_radix<wide_double>(x, plan, out);
+}
+static void windowed_real_radix_16(const float *x, const radix_plan<float> &plan, float *out) {
+  windowed_real_radix<wide>(x, plan, out);
+}
+static void windowed_real_radix_16_double(const double *x, const radix_plan<double> &plan, double *out) {
+  windowed_real_radix<wide_double>(x, plan, out);
 }
