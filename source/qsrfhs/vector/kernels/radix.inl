@@ -51,17 +51,17 @@ static inline void store_planes(double *p, planes_of<wide_double> a) {
   store(p + wide_double::lanes, second);
 }
 
-/// Four points, from a + c, a - c, b + d and b - d.
+/// A transform of four points, from sums and differences of points 0 and 2, and of points 1 and 3.
 template <class Lanes>
-static inline void four_points(planes_of<Lanes> ac, planes_of<Lanes> a_c, planes_of<Lanes> bd, planes_of<Lanes> b_d,
-                               planes_of<Lanes> *out) {
-  out[0] = ac + bd;
-  out[1] = subtract_turned(a_c, b_d);
-  out[2] = ac - bd;
-  out[3] = add_turned(a_c, b_d);
+static inline void four_points(planes_of<Lanes> sum_02, planes_of<Lanes> difference_02, planes_of<Lanes> sum_13,
+                               planes_of<Lanes> difference_13, planes_of<Lanes> *out) {
+  out[0] = sum_02 + sum_13;
+  out[1] = subtract_turned(difference_02, difference_13);
+  out[2] = sum_02 - sum_13;
+  out[3] = add_turned(difference_02, difference_13);
 }
 
-/// exp(-2 pi j p b / 16) a; but for p = b = 2, whose quarter of a turn is left to what takes it.
+/// exp(-2 pi j p b / 16) a. For p = b = 2 it is a: second_four turns that by its quarter when it adds it.
 template <int p, int b, class Real, class Lanes>
 static inline planes_of<Lanes> turn(planes_of<Lanes> a) {
   constexpr double diagonal = 0.70710678118654752, cosine = 0.92387953251128676, sine = 0.38268343236508977;
