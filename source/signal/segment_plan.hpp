@@ -10,9 +10,9 @@
 
 namespace dsp {
 
-/// The window and the shape of the transforms of segments, for all threads: nothing changes it. Long segments are split:
-/// a first pass of radix 16, which takes the window along, leaves rows that fit the caches, whose transforms are the
-/// rest. Row r has bins r, r + 16, r + 32 and so on. Of real samples there are rows 0 to 8, where the negative
+/// The window and the shape of the transforms of segments, for all threads: nothing changes it. Long segments are
+/// split: a first pass of radix 16, which takes the window along, leaves rows that fit the caches, whose transforms are
+/// the rest. Row r has bins r, r + 16, r + 32 and so on. Of real samples there are rows 0 to 8, where the negative
 /// frequencies are the conjugates of what rows 15 to 9 would have.
 template <class Sample>
 class segment_plan {

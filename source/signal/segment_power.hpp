@@ -11,8 +11,8 @@
 
 namespace dsp {
 
-/// The powers |X[k]|^2 of segments times a window, one after the other, in the plan's order, those of real samples up to
-/// half the rate. One thread at a time, which holds mkl_runtime::use. Throws dfti_failure.
+/// The powers |X[k]|^2 of segments times a window, one after the other, in the plan's order, those of real samples up
+/// to half the rate. One thread at a time, which holds mkl_runtime::use. Throws dfti_failure.
 template <class Sample>
 class segment_power {
  public:
