@@ -9,6 +9,7 @@
 #include <complex>
 #include <initializer_list>
 #include <random>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -19,35 +20,23 @@
 
 namespace {
 
-/// The samples of one precision.
-template <class Real, class Complex>
-struct arrays {
-  explicit arrays(std::size_t n) : x(n), y(n), z(n), keys(n), real(n), table(1024), coefficients(9) {
-    std::mt19937 random(1);
-    std::uniform_real_distribution<Real> uniform(Real(0.5), Real(2.0));
-    for (auto *values : {&x, &y, &table})
-      for (Complex &v : *values) v = {uniform(random), uniform(random)};
-    for (Real &key : keys) key = (uniform(random) - Real(0.5)) / Real(1.5) * 1024;
-    for (Real &c : coefficients) c = uniform(random);
-  }
-  std::vector<Complex> x, y, z;
-  std::vector<Real> keys, real;
-  std::vector<Complex> table;
-  std::vector<Real> coefficients;
-};
-using single_arrays = arrays<float, lumra_cf32>;
-using double_arrays = arrays<double, lumra_cf64>;
+constexpr std::size_t in_cache = 4096, in_memory = std::size_t{4} << 20;  // elements
+constexpr std::size_t gains = 1024;
 
-/// The same values in arrays of the older functions.
+template <class Real>
+std::uniform_real_distribution<Real> values() {
+  return std::uniform_real_distribution<Real>(Real(0.5), Real(2.0));
+}
+
+/// In arrays of the older functions.
 struct host_arrays {
-  explicit host_arrays(std::size_t n) : x(n), y(n), z(n), keys(n), real(n), table(2048), coefficients(9) {
-    const single_arrays values(n);
-    for (std::size_t i = 0; i < n; ++i) {
-      x.elements()[i] = {values.x[i].re, values.x[i].im};
-      y.elements()[i] = {values.y[i].re, values.y[i].im};
-      keys.elements()[i] = values.keys[i];
-    }
-    std::copy(values.coefficients.begin(), values.coefficients.end(), coefficients.elements().begin());
+  explicit host_arrays(std::size_t n) : x(n), y(n), z(n), keys(n), real(n), table(2 * gains), coefficients(9) {
+    std::mt19937 random(1);
+    auto uniform = values<float>();
+    for (auto *array : {&x, &y})
+      for (auto &v : array->elements()) v = {uniform(random), uniform(random)};
+    for (float &key : keys.elements()) key = (uniform(random) - 0.5F) / 1.5F * gains;
+    for (float &c : coefficients.elements()) c = uniform(random);
   }
   lumra::host_array<std::complex<float>> x, y, z;
   lumra::host_array<float> keys, real;
@@ -55,7 +44,34 @@ struct host_arrays {
   lumra::host_array<float> coefficients;
 };
 
-constexpr std::size_t in_cache = 4096, in_memory = std::size_t{4} << 20;
+/// The same memory: where arrays lie counts more than through which function they are reached.
+struct single_arrays {
+  explicit single_arrays(std::size_t n) : from(bench::kept<host_arrays>(n)), table(gains, lumra_cf32{1, 1}) {}
+  static std::span<lumra_cf32> plain(lumra::host_array<std::complex<float>> &array) {
+    return {reinterpret_cast<lumra_cf32 *>(array.elements().data()), array.size()};
+  }
+
+  host_arrays &from;
+  std::span<lumra_cf32> x = plain(from.x), y = plain(from.y), z = plain(from.z);
+  std::span<float> keys = from.keys.elements(), real = from.real.elements();
+  std::vector<lumra_cf32> table;
+  std::span<float> coefficients = from.coefficients.elements();
+};
+
+struct double_arrays {
+  explicit double_arrays(std::size_t n) : x(n), y(n), z(n), keys(n), real(n), table(gains), coefficients(9) {
+    std::mt19937 random(1);
+    auto uniform = values<double>();
+    for (auto *array : {&x, &y, &table})
+      for (lumra_cf64 &v : *array) v = {uniform(random), uniform(random)};
+    for (double &key : keys) key = (uniform(random) - 0.5) / 1.5 * gains;
+    for (double &c : coefficients) c = uniform(random);
+  }
+  std::vector<lumra_cf64> x, y, z;
+  std::vector<double> keys, real;
+  std::vector<lumra_cf64> table;
+  std::vector<double> coefficients;
+};
 
 template <class Arrays, class Work>
 void add(const std::string &name, Work work, std::initializer_list<std::size_t> lengths = {in_cache, in_memory}) {
