@@ -37,12 +37,17 @@ inline constexpr std::uint32_t frame_version = 1;
 inline std::uint64_t checksum(std::span<const std::byte> bytes) noexcept {
   constexpr std::uint64_t basis = 0xcbf29ce484222325U, prime = 0x100000001b3U;
   std::array<std::uint64_t, 4> sums{basis, basis, basis, basis}, words;
-  while (!bytes.empty()) {
-    const auto part = bytes.first(std::min(bytes.size(), sizeof words));
-    words = {};
-    std::memcpy(words.data(), part.data(), part.size());
+  const auto add_words = [&] {
     for (std::size_t k = 0; k < sums.size(); ++k) sums[k] = (sums[k] ^ words[k]) * prime;
-    bytes = bytes.subspan(part.size());
+  };
+  for (; bytes.size() >= sizeof words; bytes = bytes.subspan(sizeof words)) {
+    std::memcpy(words.data(), bytes.data(), sizeof words);
+    add_words();
+  }
+  if (!bytes.empty()) {
+    words = {};
+    std::memcpy(words.data(), bytes.data(), bytes.size());
+    add_words();
   }
   std::uint64_t sum = basis;
   for (const std::uint64_t each : sums) sum = (sum ^ each) * prime;
