@@ -15,6 +15,7 @@
 #include <set>
 #include <span>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -436,6 +437,15 @@ TEST(VectorKernels, LongArraysComeOutTheSame) {
     for (const place at : {place::back, place::odd})
       check(in, products::separate, op, floats / (op.x_width + op.y_width + op.out_width) + 1003, at);
   }
+}
+
+// Powers with a mirror image, in pieces.
+TEST(VectorKernels, LongPowersComeOutTheSame) {
+  constexpr std::size_t n = 6007;
+  const rooms in(2 * n);
+  for (const operation &op : operations(products::separate))
+    if (std::string_view(op.name).ends_with("scaled_power"))
+      for (const place at : places) check(in, products::separate, op, n, at);
 }
 
 TEST(VectorKernels, LookupIndicesBeyondTheExactFloats) {

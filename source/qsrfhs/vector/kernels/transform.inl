@@ -1,8 +1,20 @@
 // The loops around the toolkit's transforms. SPDX-License-Identifier: MIT
 
-/// Stores that straddle cache lines cost most here, so loops begin one by one until their output lies on a boundary.
-static inline bool is_aligned(const float *p) {
-  return reinterpret_cast<std::size_t>(p) % sizeof(wide) == 0;
+// Stores that straddle cache lines cost most here, so groups begin on boundaries of their output.
+
+/// Values between the boundary in front of p and p.
+static inline std::size_t behind_boundary(const float *p) {
+  return reinterpret_cast<std::size_t>(p) % sizeof(wide) / sizeof(float);
+}
+
+/// Calls put(k) for groups that begin at k, on a boundary of `out` but for the first and the last one. These overlap with
+/// their neighbours: what is written twice is the same. At least a group.
+template <class Put>
+static inline void put_groups(const float *out, std::size_t k, std::size_t end, const Put &put) {
+  put(k);
+  k += wide::lanes - behind_boundary(out + k);
+  for (; k + wide::lanes <= end; k += wide::lanes) put(k);
+  if (k < end) put(end - wide::lanes);
 }
 
 static inline void reverse_conjugate_1(const float *x, float *out) {
@@ -12,35 +24,77 @@ static inline void reverse_conjugate_1(const float *x, float *out) {
 
 static void reverse_conjugate(const float *x, float *out, std::size_t n) {
   std::size_t k = 0;
-  for (; k < n && !is_aligned(out + 2 * k); ++k) reverse_conjugate_1(x + 2 * (n - 1 - k), out + 2 * k);
+  for (; k < n && behind_boundary(out + 2 * k) != 0; ++k) reverse_conjugate_1(x + 2 * (n - 1 - k), out + 2 * k);
   constexpr std::size_t pairs = wide::lanes / 2;
   for (; k + pairs <= n; k += pairs) store(out + 2 * k, conjugate(reverse_pairs(wide::load(x + 2 * (n - k - pairs)))));
   for (; k < n; ++k) reverse_conjugate_1(x + 2 * (n - 1 - k), out + 2 * k);
 }
 
-static inline void scaled_power_1(const float *x, float *out, float *mirror, double factor) {
-  const float power = x[0] * x[0] + x[1] * x[1];
-  *out = static_cast<float>(static_cast<double>(power) * factor);
-  if (mirror) *mirror = *out;
+/// The factor of powers, which is applied in double precision. One that is a power of two gives the same bits in single
+/// precision, at half the work.
+struct power_factor {
+  double factor;
+  wide narrow;
+  bool exact;
+  explicit power_factor(double of) : factor(of) {
+    const auto rounded = static_cast<float>(of);
+    unsigned bits = 0;
+    __builtin_memcpy(&bits, &rounded, sizeof bits);
+    exact = rounded == of && (bits & 0x007fffffU) == 0;
+    narrow = wide::broadcast(rounded);
+  }
+  [[nodiscard]] float of_bin(const float *x) const {
+    return static_cast<float>(static_cast<double>(x[0] * x[0] + x[1] * x[1]) * factor);
+  }
+  [[nodiscard]] wide of_bins(const float *x) const {
+    const wide power = power_of(x);
+    return exact ? power * narrow : multiply_in_double(power, factor);
+  }
+};
+
+/// The same in reverse: bin k goes to end_of[-1 - k]. Where it ended: on a boundary, or behind the last bin of all.
+static inline std::size_t mirrored_up_to(const power_factor &of, const float *x, float *end_of, std::size_t k,
+                                         std::size_t end, bool is_last) {
+  const auto put = [&](std::size_t at) { store(end_of - at - wide::lanes, reverse(of.of_bins(x + 2 * at))); };
+  if (const std::size_t odd = behind_boundary(end_of - k)) {
+    put(k);
+    k += odd;
+  }
+  for (; k + wide::lanes <= end; k += wide::lanes) put(k);
+  if (is_last && k < end) {
+    put(end - wide::lanes);
+    k = end;
+  }
+  return k;
 }
 
 static void scaled_power(const float *x, float *out, float *mirror, double factor, std::size_t n) {
-  // A factor that is a power of two gives the same bits in single precision, at half the work.
-  const auto narrow = static_cast<float>(factor);
-  unsigned bits = 0;
-  __builtin_memcpy(&bits, &narrow, sizeof bits);
-  const bool exact = narrow == factor && (bits & 0x007fffffU) == 0;
-  const wide factors = wide::broadcast(narrow);
-  float *const last = mirror ? mirror + n - 1 : nullptr;
-  std::size_t k = 0;
-  for (; k < n && !is_aligned(out + k); ++k) scaled_power_1(x + 2 * k, out + k, last ? last - k : nullptr, factor);
-  for (; k + wide::lanes <= n; k += wide::lanes) {
-    const wide power = power_of(x + 2 * k);
-    const wide scaled = exact ? power * factors : multiply_in_double(power, factor);
-    store(out + k, scaled);
-    if (last) store(last - k - (wide::lanes - 1), reverse(scaled));
+  // From here on two lines of the second-level cache for each store into the mirror take longer than to compute powers
+  // twice, piece by piece, each time on boundaries of where they go.
+  constexpr std::size_t leaves_first_cache = 4096, piece = 1024;
+  const power_factor of(factor);
+  if (n < wide::lanes) {
+    for (std::size_t k = 0; k < n; ++k) {
+      out[k] = of.of_bin(x + 2 * k);
+      if (mirror) mirror[n - 1 - k] = out[k];
+    }
+    return;
   }
-  for (; k < n; ++k) scaled_power_1(x + 2 * k, out + k, last ? last - k : nullptr, factor);
+  const auto put = [&](std::size_t k) { store(out + k, of.of_bins(x + 2 * k)); };
+  if (!mirror) return put_groups(out, 0, n, put);
+  if (n < leaves_first_cache)
+    return put_groups(out, 0, n, [&](std::size_t k) {
+      const wide powers = of.of_bins(x + 2 * k);
+      store(out + k, powers);
+      store(mirror + n - k - wide::lanes, reverse(powers));
+    });
+  for (std::size_t begin = 0, mirrored = 0; begin < n;) {
+    const bool is_last = n - begin < 2 * piece;
+    const std::size_t end = is_last ? n : begin + piece - behind_boundary(out + begin);
+    put_groups(out, begin, end, put);
+    mirrored = mirrored_up_to(of, x, mirror + n, mirrored, end, is_last);
+    begin = end;
+  }
 }
 
 struct multiply_step {
