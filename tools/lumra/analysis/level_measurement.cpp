@@ -22,6 +22,20 @@ class envelope {
   explicit envelope(std::uint64_t samples)
       : cell_(samples == recording::endless ? 1024 : (samples + most_cells - 1) / most_cells) {}
 
+  void add(const sample_block &block, bool is_real) {
+    if (is_real)
+      add(static_cast<const float *>(block.samples), block.count);
+    else
+      add(static_cast<const std::complex<float> *>(block.samples), block.count);
+  }
+
+  [[nodiscard]] std::uint64_t cell() const noexcept { return cell_; }
+  [[nodiscard]] std::vector<envelope_cell> take() {
+    for (envelope_cell &each : cells_) each.power /= static_cast<double>(each.samples);
+    return std::move(cells_);
+  }
+
+ private:
   template <class T>
   void add(const T *x, std::size_t count) {
     for (std::size_t i = 0; i < count;) {
@@ -41,13 +55,6 @@ class envelope {
     }
   }
 
-  [[nodiscard]] std::uint64_t cell() const noexcept { return cell_; }
-  [[nodiscard]] std::vector<envelope_cell> take() {
-    for (envelope_cell &each : cells_) each.power /= static_cast<double>(each.samples);
-    return std::move(cells_);
-  }
-
- private:
   static double power_of(float x) { return static_cast<double>(x) * static_cast<double>(x); }
   static double power_of(std::complex<float> x) { return power_of(x.real()) + power_of(x.imag()); }
 
@@ -73,7 +80,7 @@ struct freed {
 
 }  // namespace
 
-measured_level measure_level(const recording::source &source, selection &chosen) {
+measured_level measure_level(const recording::source &source, selection &chosen, bool with_envelope) {
   sample_blocks blocks(source, chosen, sample_blocks::usual_size, true);
   lumra_level_options options = LUMRA_LEVEL_OPTIONS;
   options.type = blocks.is_real() ? LUMRA_TYPE_F32 : LUMRA_TYPE_CF32;
@@ -85,10 +92,7 @@ measured_level measure_level(const recording::source &source, selection &chosen)
   std::uint64_t done = 0;
   while (const auto block = blocks.next()) {
     lumra::check_open(lumra_level_add(level.get(), block->samples, block->count));
-    if (blocks.is_real())
-      cells.add(static_cast<const float *>(block->samples), block->count);
-    else
-      cells.add(static_cast<const std::complex<float> *>(block->samples), block->count);
+    if (with_envelope) cells.add(*block, blocks.is_real());
     done += block->count;
     bar.update(done, chosen.samples == recording::endless ? 0 : chosen.samples);
   }

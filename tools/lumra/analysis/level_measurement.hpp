@@ -21,11 +21,11 @@ struct measured_level {
   lumra_level_result levels{};
   std::uint64_t clipped = 0;                  // samples with a part at an end of their type
   std::vector<double> above_db, probability;  // down to the first power that no sample exceeds
-  std::vector<envelope_cell> envelope;        // of `cell` samples each, all but the last
+  std::vector<envelope_cell> envelope;        // of `cell` samples each, all but the last; empty unless asked for
   std::uint64_t cell = 0;
 };
 
 /// The selection's samples become those that there were. Throws failure where there are none.
-measured_level measure_level(const recording::source &source, selection &chosen);
+measured_level measure_level(const recording::source &source, selection &chosen, bool with_envelope);
 
 }  // namespace tool

@@ -115,7 +115,7 @@ results run(const level_command &command) {
   std::string settings;
   for (const recording::source &source : sources) {
     selection chosen = select_frequency(source);
-    const measured_level measured = measure_level(source, chosen);
+    const measured_level measured = measure_level(source, chosen, command.envelope);
     given.add_gap();
     add_recording_lines(given, source, chosen);
     summarise(given, command, source, measured);
@@ -127,8 +127,10 @@ results run(const level_command &command) {
           with_minus_signs(fmt::format("{} samples  ·  RMS {:.2f} {}  ·  crest factor {:.2f} dB",
                                        measured.levels.samples, measured.levels.rms_db + command.outputs.calibration_db,
                                        command.outputs.level_unit(), measured.levels.crest_db));
-    shares.push_back({source.name, measured.above_db, measured.probability, !source.format.is_complex});
-    envelopes.push_back(envelope_of(command, source, measured));
+    if (command.envelope)
+      envelopes.push_back(envelope_of(command, source, measured));
+    else
+      shares.push_back({source.name, measured.above_db, measured.probability, !source.format.is_complex});
   }
   if (sources.size() > 1) settings.clear();
   if (files.plot)
