@@ -25,22 +25,23 @@ class _Model:
 
 
 class Streams:
-    """Reference and measured samples, arrays or recordings, that are compared by the caller's thread."""
+    """Reference and measured samples, arrays or recordings, that are compared by so many threads."""
 
-    def __init__(self, reference, measured):
+    def __init__(self, reference, measured, threads):
+        self._threads = threads
         self._streams = [as_stream("reference", reference), as_stream("measured", measured)]
         self.samples = len(self._streams[0])
         require_equal(*map(len, self._streams))
 
     def figures(self, first, count, align, sample_rate):
         """Of a part that is held in memory."""
-        return _lumra.evm(*[stream.read(first, count) for stream in self._streams], align, sample_rate)
+        return _lumra.evm(*[stream.read(first, count) for stream in self._streams], align, sample_rate, self._threads)
 
     def of_reference(self, rows, begin, finish):
-        return accumulate_all(self._streams[:1], rows, begin, finish)
+        return accumulate_all(self._streams[:1], rows, begin, finish, self._threads)
 
     def of_both(self, rows, begin, finish):
-        return accumulate_all(self._streams, rows, begin, finish)
+        return accumulate_all(self._streams, rows, begin, finish, self._threads)
 
 
 def as_stream(name, x):
@@ -59,7 +60,7 @@ def require_equal(reference, measured):
 
 
 def _begin_level(start, origin):
-    return LevelMeter(start)
+    return LevelMeter(start, threads=1)
 
 
 def _rms(meter):

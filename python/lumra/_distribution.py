@@ -1,6 +1,5 @@
 # SPDX-License-Identifier: MIT
 """Analyses by Dask: accumulators of chunks, made where the samples are, and merged in a tree."""
-import bisect
 import functools
 import math
 import os
@@ -9,7 +8,7 @@ import uuid
 import numpy as np
 
 from lumra import _lumra
-from lumra._accumulation import Block, accumulate, merge, parts_of
+from lumra._accumulation import Block, accumulate, cut, merge, parts_of
 from lumra._comparison import as_stream, measure, require_equal
 from lumra._levels import Evm, LevelMeter
 from lumra._recordings import Recording, _open
@@ -53,28 +52,12 @@ class _Chunks:
 
     def reduce(self, rows, begin, finish, streams=None):
         """A Dask object for the pieces of all rows, complete and in order; of the first so many streams."""
-        parts = parts_of(rows)
-        ends = [first + count for _, _, first, count, _ in parts]
-        tasks = []
-        for chunk, (first, end) in enumerate(zip(self.borders, self.borders[1:])):
-            here = _cut(parts, bisect.bisect_right(ends, first), first, end)
-            if here:
-                tasks.append(self._accumulated(chunk, streams, parts=here, begin=begin, finish=finish))
+        tasks = [self._accumulated(chunk, streams, parts=here, begin=begin, finish=finish)
+                 for chunk, here in enumerate(cut(parts_of(rows), self.borders)) if here]  # fmt: skip
         join = dask.delayed(functools.partial(merge, finish=finish))
         while len(tasks) > 1:
             tasks = [join(tasks[k : k + _MERGED_AT_ONCE]) for k in range(0, len(tasks), _MERGED_AT_ONCE)]
         return tasks[0]
-
-
-def _cut(parts, at, begin, end):
-    """The parts within begin to end, from one of them on."""
-    here = []
-    while at < len(parts) and parts[at][2] < end:
-        row, samples, first, count, origin = parts[at]
-        inside = max(first, begin)
-        here.append((row, samples, inside, min(first + count, end) - inside, origin))
-        at += 1
-    return here
 
 
 class _Arrays(_Chunks):
@@ -94,7 +77,7 @@ class _Arrays(_Chunks):
 
 
 def _compare_held(*records_and_options):
-    return _lumra.evm(*records_and_options)
+    return _lumra.evm(*records_and_options, 1)
 
 
 def _accumulate_blocks(*blocks, first, count, **how):
@@ -125,7 +108,7 @@ def _accumulate_read(opened, **how):
 
 
 def _compare_read(opened, first, count, align, sample_rate):
-    return _lumra.evm(*[_read(each, first, count) for each in opened], align, sample_rate)
+    return _lumra.evm(*[_read(each, first, count) for each in opened], align, sample_rate, 1)
 
 
 def _require_client(client):
@@ -221,11 +204,12 @@ def _least_chunk(nfft):
 
 
 def _begin_level(start, origin):
-    return LevelMeter(start)
+    return LevelMeter(start, threads=1)
 
 
-def level(x, client, compute):
+def level(x, threads, client, compute):
     stream = _Stream(x, client)
+    _lumra.number_of_threads(threads)  # refuses a wrong one now
     n = stream.chunks.samples
     if not n:
         raise ValueError("x is empty; give one sample or more")

@@ -8,6 +8,7 @@ import numpy as np
 from lumra import _lumra
 from lumra._accumulator import Accumulator, one_dimension
 from lumra._recordings import Recording, _finite
+from lumra._sharing import useful_threads
 from lumra._spectra import _is_distributed
 
 
@@ -50,6 +51,8 @@ class LevelMeter(Accumulator):
     ----------
     start : int, optional
         Position in the stream of the first sample that is added.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay. The result has the same bits.
 
     Examples
     --------
@@ -59,10 +62,11 @@ class LevelMeter(Accumulator):
     2
     """
 
-    __slots__ = ()
+    __slots__ = ("_threads",)
 
-    def __init__(self, start=0):
-        self._of = _lumra.Meter(start)
+    def __init__(self, start=0, *, threads=None):
+        self._of = _lumra.Meter(start, threads)
+        self._threads = threads
 
     def result(self):
         """The levels of the samples so far.
@@ -74,27 +78,28 @@ class LevelMeter(Accumulator):
         return Level(*self._of.read())
 
     def __getstate__(self):
-        return (self._of.save(),)
+        return self._threads, self._of.save()
 
     def __setstate__(self, state):
-        self.__init__()
-        self._of.load(*state)
+        threads, saved = state
+        self.__init__(threads=threads)
+        self._of.load(saved)
 
     def __repr__(self):
         start, samples = self._of.where()
         return f"<lumra.LevelMeter: {samples} samples from {start} on>"
 
 
-def _metered(x):
+def _metered(x, threads):
     of = one_dimension(x)
-    meter = LevelMeter()
+    meter = LevelMeter(threads=threads)
     meter._add_from(of, 0, len(of))
     if not meter.samples:
         raise ValueError("x is empty; give one sample or more")
     return meter
 
 
-def level(x, client=None, compute=True):
+def level(x, client=None, compute=True, *, threads=None):
     """The levels of a record in one pass.
 
     Parameters
@@ -105,6 +110,8 @@ def level(x, client=None, compute=True):
         Who works on a recording or a Dask array.
     compute : bool, optional
         False for a Dask object whose `compute()` gives the result; for Dask arrays, or with `client`.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay. The result has the same bits.
 
     Returns
     -------
@@ -120,11 +127,11 @@ def level(x, client=None, compute=True):
     if _is_distributed(client, compute, x=x):
         from lumra import _distribution
 
-        return _distribution.level(x, client, compute)
-    return _metered(x).result()
+        return _distribution.level(x, threads, client, compute)
+    return _metered(x, threads).result()
 
 
-def ccdf(x, above_db):
+def ccdf(x, above_db, *, threads=None):
     """Power statistics: the share of samples whose power is more than so many dB above the mean.
 
     Parameters
@@ -134,6 +141,8 @@ def ccdf(x, above_db):
         and below.
     above_db : array_like
         Levels above the mean power in dB.
+    threads : int, optional
+        Of a recording, 1: the caller's alone; None: as many as pay. The result has the same bits.
 
     Returns
     -------
@@ -147,7 +156,8 @@ def ccdf(x, above_db):
     array([0.25, 0.25, 0.25, 0.  ])
     """
     if isinstance(x, Recording):
-        return _metered(x)._of.ccdf(above_db)
+        return _metered(x, threads)._of.ccdf(above_db)
+    _lumra.number_of_threads(threads)  # refuses a wrong one here, too
     return _lumra.ccdf(x, above_db)
 
 
@@ -208,7 +218,7 @@ def _alignment(align):
     return wanted
 
 
-def evm(reference, measured, *, align=(), sample_rate=1.0, client=None, compute=True):
+def evm(reference, measured, *, align=(), sample_rate=1.0, threads=None, client=None, compute=True):
     """Compares a record with its reference sample by sample.
 
     measured(n) = gain * reference(n - delay) * exp(2j * pi * frequency * n / sample_rate) + dc + errors; errors are fractions
@@ -222,6 +232,8 @@ def evm(reference, measured, *, align=(), sample_rate=1.0, client=None, compute=
         What is found and taken out before errors are measured. Delays are found up to 500 samples.
     sample_rate : float, optional
         In hertz; that of the reference where it is a recording.
+    threads : int, optional
+        1: the caller's alone; None: as many as pay. The result has the same bits.
     client : distributed.Client, optional
         Who works on recordings or Dask arrays.
     compute : bool, optional
@@ -241,7 +253,7 @@ def evm(reference, measured, *, align=(), sample_rate=1.0, client=None, compute=
     """
     from lumra import _comparison
 
-    wanted = _alignment(align)
+    wanted, threads = _alignment(align), useful_threads(threads)
     if isinstance(reference, Recording):
         sample_rate = reference.sample_rate
     rate = _finite("sample_rate", sample_rate)
@@ -251,4 +263,4 @@ def evm(reference, measured, *, align=(), sample_rate=1.0, client=None, compute=
         from lumra import _distribution
 
         return _distribution.evm(reference, measured, wanted, rate, client, compute)
-    return Evm(*_comparison.measure(_comparison.Streams(reference, measured), wanted, rate))
+    return Evm(*_comparison.measure(_comparison.Streams(reference, measured, threads), wanted, rate))

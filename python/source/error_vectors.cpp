@@ -22,7 +22,8 @@ py::tuple figures(const lumra_evm_result &found) {
 }
 
 /// The figures of whole records.
-py::tuple evm(py::handle reference_given, py::handle measured_given, std::uint32_t align, py::handle sample_rate) {
+py::tuple evm(py::handle reference_given, py::handle measured_given, std::uint32_t align, py::handle sample_rate,
+              std::uint32_t threads) {
   const numbers reference(reference_given, "reference"), measured(measured_given, "measured");
   const double rate = number(sample_rate, "sample_rate");
   const element type = type_of(reference, measured);
@@ -37,7 +38,7 @@ py::tuple evm(py::handle reference_given, py::handle measured_given, std::uint32
     if constexpr (!std::is_floating_point_v<T>) {
       const py::gil_scoped_release released;
       found = lumra::measure_evm<T>({r.first<T>(), r.size()}, {m.first<T>(), m.size()},
-                                    static_cast<lumra::align>(align), rate);
+                                    static_cast<lumra::align>(align), rate, {}, threads);
     }
   });
   return figures(found);

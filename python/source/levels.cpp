@@ -33,18 +33,25 @@ struct levelling {
   [[nodiscard]] static element usual() noexcept { return element::f32; }
   [[nodiscard]] static element type_for(element block) noexcept { return block; }
   [[nodiscard]] static std::size_t piece() noexcept { return std::size_t{1} << 20; }
-  [[nodiscard]] static owned make(element type, std::uint64_t first, std::uint64_t) {
+  [[nodiscard]] owned make(element type, std::uint64_t first, std::uint64_t) const {
     lumra_level_options how = LUMRA_LEVEL_OPTIONS;
     how.type = static_cast<std::int32_t>(type);
     how.start = first;
+    how.threads = threads;
     return lumra::detail::make<owned>([&](object **out) { return lumra_level_create(&how, out); });
   }
-  [[nodiscard]] static owned load(std::string_view bytes) {
-    return lumra::detail::make<owned>([&](object **out) { return lumra_level_load(bytes.data(), bytes.size(), out); });
+  [[nodiscard]] owned load(std::string_view bytes) const {
+    const auto saved =
+        lumra::detail::make<owned>([&](object **out) { return lumra_level_load(bytes.data(), bytes.size(), out); });
+    // What is saved says nothing of threads: its neighbour, which has no samples yet, has as many as this kind.
+    auto loaded = make(type_of(saved.get()), where(saved.get()).start, 0);
+    lumra::check_open(merge(loaded.get(), saved.get()));
+    return loaded;
   }
   static void adopt(const object *) noexcept {}
 
   std::uint64_t start = 0, origin = 0;
+  std::uint32_t threads = 0;
 };
 
 using meter = accumulator<levelling>;
@@ -115,9 +122,10 @@ element checked_type(std::int32_t code) {
 
 void add_levels(py::module_ &module) {
   py::class_<meter>(module, "Meter")
-      .def(py::init([](py::handle start) {
+      .def(py::init([](py::handle start, py::handle threads) {
         levelling kind;
         kind.start = static_cast<std::uint64_t>(whole_number(start, "start", 0));
+        kind.threads = number_of_threads(threads);
         return std::make_unique<meter>(kind);
       }))
       .def("add", &meter::add)

@@ -19,4 +19,5 @@ PYBIND11_MODULE(_lumra, module) {
   binding::add_spectra(module);
   binding::add_transforms(module);
   binding::add_windows(module);
+  module.def("number_of_threads", &binding::number_of_threads);
 }

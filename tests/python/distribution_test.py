@@ -99,7 +99,7 @@ class Distribution(Test):
         for align in (), ("gain", "dc"), ("gain", "delay", "frequency", "dc"):
             with self.subTest(align=align):
                 self.same(lumra.evm, (reference, measured), (chunked(reference), other), align=align, sample_rate=1e6)
-        whole = lumra._lumra.evm(reference, measured, 15, 1e6)
+        whole = lumra._lumra.evm(reference, measured, 15, 1e6, 1)
         self.assertEqual(lumra.evm(reference, other, align=("gain", "delay", "frequency", "dc"), sample_rate=1e6), lumra.Evm(*whole))
         for name, x in ("reference", reference), ("measured", measured):
             lumra.write(self.folder / name, x, 1e6)
@@ -121,6 +121,7 @@ class Distribution(Test):
             (lumra.spectrum, ValueError, "nfft is 600001 & 600000", dict(x=lazy, nfft=600_001)),
             (lumra.waterfall, ValueError, "window is 'no such'", dict(x=lazy, window="no such")),
             (lumra.spectrum, ValueError, "threads", dict(x=recording, client=self.client, threads=0)),
+            (lumra.level, ValueError, "threads is 0", dict(x=recording, client=self.client, threads=0)),
             (lumra.evm, ValueError, "measured is of 3 samples & 600000", dict(reference=lazy, measured=[1, 2, 3])),
             (lumra.evm, ValueError, "sample_rate is 0.0", dict(reference=lazy, measured=lazy, sample_rate=0)),
         ]:

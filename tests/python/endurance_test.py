@@ -27,6 +27,7 @@ class Interrupts(Test):
             "spectrum": lambda: lumra.spectrum(endless, threads=1),
             "spectrum by threads": lambda: lumra.spectrum(endless, nfft=2**20, threads=2),
             "recording": lambda: lumra.level(recording),
+            "evm by threads": lambda: lumra.evm(endless, endless, threads=2),
             "waterfall": lambda: lumra.waterfall(recording, rows=10),
             "resample": lambda: lumra.resample(endless.real, 100_000, 1),
             "lfilter": lambda: lumra.lfilter(taps, [1], np.ones(2**20)),
@@ -108,6 +109,9 @@ class Sharing(Test):
             self.assertEqual(lumra.fft(x.reshape(64, -1), workers=workers).tobytes(), lumra.fft(x.reshape(64, -1)).tobytes())
         for one in (lambda n: lumra.spectrum(x, threads=n).power, lambda n: lumra.divide(x, x[::-1].copy(), threads=n)):
             self.assertEqual(one(2).tobytes(), one(1).tobytes())
+        for n in (100_000, 2**21):
+            for one, options in ((lumra.level, {}), (lumra.evm, dict(measured=0.5j * x[:n], align=["gain", "delay"]))):
+                self.assertEqual(one(x[:n], threads=2, **options), one(x[:n], threads=1, **options))
 
 
 class Memory(Test):

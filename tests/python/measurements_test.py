@@ -236,6 +236,8 @@ class Refusals(Test):
             (TypeError, "sample_rate is '1'", lumra.spectrum, [x, "1"], dict(nfft=16)),
             (ValueError, "overlap is 1", lumra.spectrum, [x], dict(nfft=16, overlap=1)),
             (ValueError, "threads is 0", lumra.spectrum, [x], dict(nfft=16, threads=0)),
+            (ValueError, "threads is 0", lumra.LevelMeter, [], dict(threads=0)),
+            (ValueError, "threads is 1025", lumra.evm, [x, x], dict(threads=1025)),
             (ValueError, "window is 'none such'", lumra.spectrum, [x], dict(nfft=16, window="none such")),
             (ValueError, "x is of shape (1, 100)", lumra.spectrum, [x[None]], dict(nfft=16)),
             (TypeError, "client", lumra.spectrum, [x], dict(client=3)),
