@@ -43,12 +43,21 @@ void apply_taps(const Sample *x, const Tap *taps, std::size_t count, Sample *out
 }
 inline constexpr std::size_t readable = 32;
 
-/// a[k] *= b[k].
-inline void multiply_bins(std::complex<float> *a, const std::complex<float> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b), n);
+/// out[k] = a[k] b[k]; out may be a.
+inline void multiply_bins(const std::complex<float> *a, const std::complex<float> *b, std::complex<float> *out,
+                          std::size_t n) noexcept {
+  qsrfhs::kernels::exact().multiply(reinterpret_cast<const float *>(a), reinterpret_cast<const float *>(b),
+                                    reinterpret_cast<float *>(out), n);
 }
-inline void multiply_bins(std::complex<double> *a, const std::complex<double> *b, std::size_t n) noexcept {
-  qsrfhs::kernels::exact().multiply_double(reinterpret_cast<double *>(a), reinterpret_cast<const double *>(b), n);
+inline void multiply_bins(const std::complex<double> *a, const std::complex<double> *b, std::complex<double> *out,
+                          std::size_t n) noexcept {
+  qsrfhs::kernels::exact().multiply_double(reinterpret_cast<const double *>(a), reinterpret_cast<const double *>(b),
+                                           reinterpret_cast<double *>(out), n);
+}
+/// a[k] *= b[k].
+template <class Bin>
+void multiply_bins(Bin *a, const Bin *b, std::size_t n) noexcept {
+  multiply_bins(a, b, a, n);
 }
 
 // Costs in multiply-adds of real taps and samples in single precision, which are done eight at a time. The constants

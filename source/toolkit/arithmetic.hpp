@@ -75,8 +75,8 @@ void reverse_conjugate(const T *x, T *out, std::int64_t n) noexcept {
 
 /// a[k] *= b[k]; a and b may be the same.
 inline void multiply(std::complex<float> *a, const std::complex<float> *b, std::int64_t n) noexcept {
-  qsrfhs::kernels::exact().multiply(reinterpret_cast<float *>(a), reinterpret_cast<const float *>(b),
-                                    static_cast<std::size_t>(n));
+  qsrfhs::kernels::exact().multiply(reinterpret_cast<const float *>(a), reinterpret_cast<const float *>(b),
+                                    reinterpret_cast<float *>(a), static_cast<std::size_t>(n));
 }
 inline void multiply(std::complex<double> *a, const std::complex<double> *b, std::int64_t n) noexcept {
   for (std::int64_t k = 0; k < n; ++k) a[k] = product(a[k], b[k]);

@@ -82,8 +82,8 @@ TEST(FirKernels, ProductsOfSpectra) {
   for (const std::size_t n : std::initializer_list<std::size_t>{0, 1, 2, 5, 16, 33}) {
     const auto a = tests::noise_of<double>(2 * n, 1), b = tests::noise_of<double>(2 * n, 2);
     for_each_table([&](const kernel_table &table, products how) {
-      auto got = a;
-      table.multiply_double(got.data(), b.data(), n);
+      std::vector<double> got(2 * n);
+      table.multiply_double(a.data(), b.data(), got.data(), n);
       for (std::size_t k = 0; k < 2 * n; k += 2) {
         EXPECT_EQ(multiply_add(how, a[k], b[k], -(a[k + 1] * b[k + 1])), got[k]);
         EXPECT_EQ(multiply_add(how, a[k + 1], b[k], a[k] * b[k + 1]), got[k + 1]);

@@ -1,13 +1,16 @@
 // The first pass of long transforms: all builds follow the definition, and those that round alike give the same bits.
+// And the bins that are taken out of rows.
 // SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
 #include <complex>
 #include <cstddef>
 #include <cstring>
+#include <initializer_list>
 #include <limits>
 #include <numbers>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
@@ -20,7 +23,7 @@ using namespace qsrfhs::kernels;
 
 constexpr std::size_t row = 3 * radix_group, gap = 8, stride = row + gap;
 
-enum class samples_are { complex, real };
+enum class samples_are { complex, complex_without_window, real };
 
 template <class Real>
 std::vector<std::complex<double>> expected(const std::vector<std::complex<double>> &x, std::size_t rows,
@@ -31,7 +34,7 @@ std::vector<std::complex<double>> expected(const std::vector<std::complex<double
       const std::size_t group = n / radix_group, i = n % radix_group;
       std::complex<double> sum;
       for (std::size_t r = 0; r < radix; ++r) {
-        const double w = plan.window[(group * radix + r) * radix_group + i];
+        const double w = plan.window ? plan.window[(group * radix + r) * radix_group + i] : 1;
         sum += x[r * row + n] * w * std::polar(1.0, -2 * std::numbers::pi * static_cast<double>(k * r % 16) / 16);
       }
       const Real *const near = plan.near + 2 * k * radix_group, *const far = plan.far + 2 * (group * radix + k);
@@ -45,7 +48,7 @@ std::vector<std::complex<double>> expected(const std::vector<std::complex<double
 
 template <class Real>
 void expect_radix(samples_are kind, void (*kernel_table::*kernel)(const Real *, const radix_plan<Real> &, Real *)) {
-  const bool complex = kind == samples_are::complex;
+  const bool complex = kind != samples_are::real, windowed = kind != samples_are::complex_without_window;
   const auto x = tests::noise_of<Real>((complex ? 2 : 1) * radix * row, 1);
   std::vector<std::complex<double>> wide(radix * row);
   for (std::size_t i = 0; i < wide.size(); ++i)
@@ -55,7 +58,7 @@ void expect_radix(samples_are kind, void (*kernel_table::*kernel)(const Real *, 
     const tests::guarded samples(x, at), window(tests::noise_of<Real>(radix * row, 2), at);
     const tests::guarded near(tests::noise_of<Real>(2 * radix * radix_group, 3), at);
     const tests::guarded far(tests::noise_of<Real>(2 * row, 4), at);
-    const radix_plan<Real> plan{row, stride, window.as<Real>(), near.as<Real>(), far.as<Real>()};
+    const radix_plan<Real> plan{row, stride, windowed ? window.as<Real>() : nullptr, near.as<Real>(), far.as<Real>()};
     const auto values = expected(wide, rows, plan);
     std::vector<Real> first[2];
     for (const build &b : builds()) {
@@ -84,8 +87,29 @@ void expect_radix(samples_are kind, void (*kernel_table::*kernel)(const Real *, 
 TEST(RadixKernels, FollowTheirDefinition) {
   expect_radix<float>(samples_are::complex, &kernel_table::windowed_radix_16);
   expect_radix<double>(samples_are::complex, &kernel_table::windowed_radix_16_double);
+  expect_radix<float>(samples_are::complex_without_window, &kernel_table::radix_16);
+  expect_radix<double>(samples_are::complex_without_window, &kernel_table::radix_16_double);
   expect_radix<float>(samples_are::real, &kernel_table::windowed_real_radix_16);
   expect_radix<double>(samples_are::real, &kernel_table::windowed_real_radix_16_double);
+}
+
+TEST(RadixKernels, WeighBinsOfRows) {
+  const tests::guarded rows(tests::noise_of<float>(2 * (radix * stride - gap), 1), tests::edge::back);
+  std::vector<float> bins(2 * radix * row);
+  for (std::size_t i = 0; i < bins.size(); ++i)
+    bins[i] = rows.as<float>()[2 * (i / 2 % radix * stride + i / 2 / radix) + i % 2];
+  const auto weights = tests::noise_of<float>(bins.size(), 2);
+  for (const build &b : builds()) {
+    for (const kernel_table *table : {b.exact, b.fused}) {
+      for (const auto &[first, n] : std::initializer_list<std::pair<std::size_t, std::size_t>>{
+               {0, radix * row}, {5, 0}, {17, 1}, {127, 2}, {131, 500}, {radix * row - 130, 130}}) {
+        std::vector<float> expected(2 * n + 1, 7), got = expected;
+        table->weigh_and_rotate(bins.data() + 2 * first, weights.data(), 0.6F, -0.8F, expected.data(), n);
+        table->weigh_and_rotate_rows(rows.as<float>(), stride, first, weights.data(), 0.6F, -0.8F, got.data(), n);
+        EXPECT_EQ(expected, got) << b.name << ' ' << first << ' ' << n;
+      }
+    }
+  }
 }
 
 }  // namespace

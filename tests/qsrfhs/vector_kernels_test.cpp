@@ -217,11 +217,7 @@ void add_transform_loops(std::vector<operation> &all, products how) {
                    t.scale(out, 0.3F, n);
                  },
                  [](auto x, auto, auto out) { *out = *x * 0.3F; }});
-  all.push_back({"multiply", 2, 2, 2,
-                 [](auto &t, auto x, auto y, auto out, auto n) {
-                   std::copy_n(x, 2 * n, out);
-                   t.multiply(out, y, n);
-                 },
+  all.push_back({"multiply", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.multiply(x, y, out, n); },
                  [how](auto x, auto y, auto out) {
                    out[0] = multiply_add(how, x[0], y[0], -(x[1] * y[1]));
                    out[1] = multiply_add(how, x[1], y[0], x[0] * y[1]);

@@ -11,9 +11,10 @@
 #include "planes.inl"
 #include "polynomial.inl"
 #include "polyphase.inl"
-#include "radix.inl"
 #include "recursion.inl"
 #include "resampler.inl"
+//
+#include "radix.inl"
 #include "rms.inl"
 #include "spectrum.inl"
 #include "transform.inl"
@@ -29,8 +30,11 @@ static constexpr kernel_table table = {
     .order_power = &order_power,
     .windowed_radix_16 = &windowed_radix_16,
     .windowed_radix_16_double = &windowed_radix_16_double,
+    .radix_16 = &radix_16,
+    .radix_16_double = &radix_16_double,
     .windowed_real_radix_16 = &windowed_real_radix_16,
     .windowed_real_radix_16_double = &windowed_real_radix_16_double,
+    .weigh_and_rotate_rows = &weigh_and_rotate_rows,
     .add = &add,
     .reverse_conjugate = &reverse_conjugate,
     .scaled_power = &scaled_power,

@@ -97,6 +97,6 @@ struct multiply_double_step {
   }
 };
 
-static void multiply_double(double *a, const double *b, std::size_t n) {
-  go_over<into_caches>(multiply_double_step{}, a, b, a, n);
+static void multiply_double(const double *a, const double *b, double *out, std::size_t n) {
+  go_over<into_caches>(multiply_double_step{}, a, b, out, n);
 }

@@ -79,7 +79,7 @@ struct turned_angles {
 template <class Real>
 struct radix_plan {
   std::size_t row, stride;  // samples in a row, a multiple of radix_group, and from a row to the next of the results
-  const Real *window;       // for each group of columns n, the values for row 0, then for row 1, and so on
+  const Real *window;       // for each group of columns n, the values for row 0, then for row 1, and so on; or none
   // Factors whose products are the twiddle factors exp(-2 pi j k n / (radix row)), 1 for k = 0:
   const Real *near;  // for each k, those of the first group: real parts, then imaginary ones
   const Real *far;   // for each group, those of its first column, for each k: complex
@@ -108,9 +108,16 @@ struct kernel_table {
   /// `row` points of the rows k then have bins k, k + 16, k + 32 and so on of the transform of all.
   void (*windowed_radix_16)(const float *x, const radix_plan<float> &plan, float *out);
   void (*windowed_radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
-  /// The same with real x, for k from 0 to 8: bins of k above 8 are conjugates of those of 16 - k.
+  /// The same without a window.
+  void (*radix_16)(const float *x, const radix_plan<float> &plan, float *out);
+  void (*radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
+  /// With a window and real x, for k from 0 to 8: bins of k above 8 are conjugates of those of 16 - k.
   void (*windowed_real_radix_16)(const float *x, const radix_plan<float> &plan, float *out);
   void (*windowed_real_radix_16_double)(const double *x, const radix_plan<double> &plan, double *out);
+  /// out[i] = bin first + i times w[i], as weigh_and_rotate, n complex. Bin 16 n + k is rows[k * stride + n]. Reads rows
+  /// up to a multiple of 8 bins each.
+  void (*weigh_and_rotate_rows)(const float *rows, std::size_t stride, std::size_t first, const float *w, float c,
+                                float s, float *out, std::size_t n);
   /// sum[k] += x[k], n real.
   void (*add)(const float *x, float *sum, std::size_t n);
 
@@ -119,8 +126,8 @@ struct kernel_table {
   /// out[k] = (re(x[k])^2 + im(x[k])^2) * factor, n complex, the product in double precision. `mirror`, unless null,
   /// receives the same values in reverse order.
   void (*scaled_power)(const float *x, float *out, float *mirror, double factor, std::size_t n);
-  /// a[k] *= b[k], n complex. a and b may be the same.
-  void (*multiply)(float *a, const float *b, std::size_t n);
+  /// out[k] = a[k] * b[k], n complex. a and b may be the same.
+  void (*multiply)(const float *a, const float *b, float *out, std::size_t n);
   /// x[k] *= factor, n real.
   void (*scale)(float *x, float factor, std::size_t n);
 
@@ -188,8 +195,8 @@ struct kernel_table {
   void (*complex_fir)(const float *x, const float *taps, std::size_t count, float *out, std::size_t n);
   void (*complex_fir_double)(const double *x, const double *taps, std::size_t count, double *out, std::size_t n);
 
-  /// a[k] *= b[k], n complex.
-  void (*multiply_double)(double *a, const double *b, std::size_t n);
+  /// out[k] = a[k] * b[k], n complex.
+  void (*multiply_double)(const double *a, const double *b, double *out, std::size_t n);
 
   /// out[k] = sum over the taps of a row at its offset, times the samples from first on. Samples are `width` values
   /// each: 1 for real samples, 2 for complex ones.

@@ -1,6 +1,6 @@
-// The first pass of a long transform, of radix 16 with decimation in frequency, that takes the window along. Each line
+// The first pass of a long transform, of radix 16 with decimation in frequency, that may take a window along. Each line
 // of the samples, of the window and of the results is gone over at once: the rows lie in the same few lines of the
-// first-level cache. SPDX-License-Identifier: MIT
+// first-level cache. And what puts the bins of the rows back into their order. SPDX-License-Identifier: MIT
 
 /// Complex values, real parts apart from imaginary ones.
 template <class Lanes>
@@ -83,10 +83,11 @@ static inline const Real *window_of(const radix_plan<Real> &plan, std::size_t n)
 }
 
 /// Points b, b + 4, b + 8 and b + 12 of the radix, to point b of each of four transforms p.
-template <int b, class Lanes, class Real>
+template <bool windowed, int b, class Lanes, class Real>
 static inline void first_four(const Real *x, std::size_t row, const Real *w, planes_of<Lanes> (*between)[4]) {
   const auto weighted = [&](std::size_t r) {
     const planes_of<Lanes> a = load_planes(x + 2 * r * row);
+    if constexpr (!windowed) return a;
     const Lanes weight = Lanes::load(w + r * radix_group);
     return planes_of<Lanes>{a.re * weight, a.im * weight};
   };
@@ -137,15 +138,15 @@ static inline void second_four(const planes_of<Lanes> *x, const radix_columns<Re
   for (std::size_t q = 1; q < 4; ++q) columns.put(p + 4 * q, y[q]);
 }
 
-template <class Lanes, class Real>
-static inline void windowed_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
+template <bool windowed, class Lanes, class Real>
+static inline void complex_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
   for (std::size_t n = 0; n < plan.row; n += Lanes::lanes) {
-    const Real *const w = window_of(plan, n);
+    const Real *const w = windowed ? window_of(plan, n) : nullptr;
     planes_of<Lanes> between[4][4];
-    first_four<0>(x + 2 * n, plan.row, w, between);
-    first_four<1>(x + 2 * n, plan.row, w, between);
-    first_four<2>(x + 2 * n, plan.row, w, between);
-    first_four<3>(x + 2 * n, plan.row, w, between);
+    first_four<windowed, 0>(x + 2 * n, plan.row, w, between);
+    first_four<windowed, 1>(x + 2 * n, plan.row, w, between);
+    first_four<windowed, 2>(x + 2 * n, plan.row, w, between);
+    first_four<windowed, 3>(x + 2 * n, plan.row, w, between);
     const radix_columns<Real> columns(plan, n, out);
     second_four<0>(between[0], columns);
     second_four<1>(between[1], columns);
@@ -207,14 +208,49 @@ static inline void windowed_real_radix(const Real *x, const radix_plan<Real> &pl
 }
 
 static void windowed_radix_16(const float *x, const radix_plan<float> &plan, float *out) {
-  windowed_radix<wide>(x, plan, out);
+  complex_radix<true, wide>(x, plan, out);
 }
 static void windowed_radix_16_double(const double *x, const radix_plan<double> &plan, double *out) {
-  windowed_radix<wide_double>(x, plan, out);
+  complex_radix<true, wide_double>(x, plan, out);
 }
 static void windowed_real_radix_16(const float *x, const radix_plan<float> &plan, float *out) {
   windowed_real_radix<wide>(x, plan, out);
 }
 static void windowed_real_radix_16_double(const double *x, const radix_plan<double> &plan, double *out) {
   windowed_real_radix<wide_double>(x, plan, out);
+}
+static void radix_16(const float *x, const radix_plan<float> &plan, float *out) {
+  complex_radix<false, wide>(x, plan, out);
+}
+static void radix_16_double(const double *x, const radix_plan<double> &plan, double *out) {
+  complex_radix<false, wide_double>(x, plan, out);
+}
+
+/// Columns that are put into the order of their bins at once.
+static constexpr std::size_t tile_columns = wide_double::lanes;
+
+/// out[16 n + k] = rows[k * stride + n], complex, for n < tile_columns. A complex value moves as one double. Interleaving
+/// the first half of all values with the second moves the highest bit of an index to its end.
+static inline void interleave_rows(const float *rows, std::size_t stride, float *out) {
+  const auto *const from = reinterpret_cast<const double *>(rows);
+  wide_double x[radix], y[radix];
+  for (std::size_t k = 0; k < radix; ++k) x[k] = wide_double::load(from + k * stride);
+  for (std::size_t i = 0; i < radix / 2; ++i) join_pairs(x[i], x[i + radix / 2], y[2 * i], y[2 * i + 1]);
+  for (std::size_t i = 0; i < radix / 2; ++i) join_pairs(y[i], y[i + radix / 2], x[2 * i], x[2 * i + 1]);
+  for (std::size_t i = 0; i < radix / 2; ++i) join_pairs(x[i], x[i + radix / 2], y[2 * i], y[2 * i + 1]);
+  for (std::size_t i = 0; i < radix / 2; ++i) join_pairs(y[i], y[i + radix / 2], x[2 * i], x[2 * i + 1]);
+  for (std::size_t k = 0; k < radix; ++k) store(reinterpret_cast<double *>(out) + k * tile_columns, x[k]);
+}
+
+static void weigh_and_rotate_rows(const float *rows, std::size_t stride, std::size_t first, const float *w, float c,
+                                  float s, float *out, std::size_t n) {
+  const weigh_and_rotate_step step{wide::broadcast(c), wide::broadcast_pair(-s, s)};
+  constexpr std::size_t tile = radix * tile_columns;
+  alignas(64) float bins[2 * tile];
+  for (std::size_t count = 0; n > 0; n -= count, first += count, w += 2 * count, out += 2 * count) {
+    const std::size_t skipped = first % tile, whole = tile - skipped;
+    count = whole < n ? whole : n;
+    interleave_rows(rows + 2 * ((first - skipped) / radix), stride, bins);
+    go_over<into_caches>(step, bins + 2 * skipped, w, out, count);
+  }
 }

@@ -106,6 +106,6 @@ struct multiply_step {
   }
 };
 
-static void multiply(float *a, const float *b, std::size_t n) {
-  go_over<into_caches>(multiply_step{}, a, b, a, n);
+static void multiply(const float *a, const float *b, float *out, std::size_t n) {
+  go_over<into_caches>(multiply_step{}, a, b, out, n);
 }
