@@ -6,28 +6,19 @@
 #include <utility>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
-#include "signal/rotation.hpp"
 
 namespace dsp {
 namespace {
 
 constexpr std::size_t radix = qsrfhs::kernels::radix, group = qsrfhs::kernels::radix_group;
 
-/// From here on the first pass costs less than what transforms of all points lose to the second-level cache.
-template <class Sample>
-constexpr std::size_t least_split = std::is_same_v<Sample, std::complex<double>> ? 2048 : 8192;
-
 /// Rows are whole groups, those of real samples up to half the rate, too.
 template <class Sample>
 std::size_t rows_for(std::size_t points) noexcept {
-  constexpr std::size_t multiple = radix * group * (is_complex<Sample> ? 1 : 2);
+  constexpr std::size_t multiple = radix_pass<real_of<Sample>>::multiple * (is_complex<Sample> ? 1 : 2);
   if (points < least_split<Sample> || points % multiple != 0) return 1;
   return is_complex<Sample> ? radix : radix / 2 + 1;
 }
-
-/// A line of the caches between rows, which would lie in the same few lines of a cache otherwise.
-template <class Bin>
-constexpr std::size_t gap = 64 / sizeof(Bin);
 
 /// Into the order of the kernels' powers, or out of it.
 template <class Real>
@@ -40,37 +31,20 @@ void order(Real *power, std::size_t n) noexcept {
 template <class Sample>
 segment_plan<Sample>::segment_plan(qsrfhs::aligned_buffer<real> window)
     : rows_(rows_for<Sample>(window.size())),
-      row_(is_split() ? window.size() / radix : window.size()),
-      stride_(is_split() ? row_ + gap<bin> : row_),
+      pass_(is_split() ? radix_pass<real>(window.size()) : radix_pass<real>()),
+      row_(is_split() ? pass_.row() : window.size()),
+      stride_(is_split() ? pass_.stride() : window.size()),
       window_(std::move(window)) {
   if (!is_split()) return;
   const qsrfhs::aligned_buffer<real> natural = std::exchange(window_, qsrfhs::aligned_buffer<real>(points()));
   for (std::size_t n = 0; n < row_; n += group)
     for (std::size_t r = 0; r < radix; ++r)
       std::copy_n(natural.data() + r * row_ + n, group, window_.data() + n * radix + r * group);
-
-  const auto factor = [&](std::size_t k, std::size_t n) {
-    return bin(on_circle(-static_cast<double>(k * n % points()) / static_cast<double>(points())));
-  };
-  near_ = qsrfhs::aligned_buffer<real>(2 * radix * group);
-  far_ = qsrfhs::aligned_buffer<real>(2 * row_);
-  for (std::size_t k = 0; k < radix; ++k) {
-    real *const near = near_.data() + 2 * k * group;
-    for (std::size_t n = 0; n < group; ++n) {
-      near[n] = factor(k, n).real();
-      near[group + n] = factor(k, n).imag();
-    }
-    for (std::size_t n = 0; n < row_; n += group) {
-      const bin turn = factor(k, n);
-      far_.data()[2 * (n + k)] = turn.real();
-      far_.data()[2 * (n + k) + 1] = turn.imag();
-    }
-  }
 }
 
 template <class Sample>
 void segment_plan<Sample>::split(const Sample *x, bin *rows) const noexcept {
-  const qsrfhs::kernels::radix_plan<real> plan{row_, stride_, window_.data(), near_.data(), far_.data()};
+  const qsrfhs::kernels::radix_plan<real> plan = pass_.with(window_.data());
   const auto *const from = reinterpret_cast<const real *>(x);
   auto *const to = reinterpret_cast<real *>(rows);
   const auto &kernels = qsrfhs::kernels::fused();

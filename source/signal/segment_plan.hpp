@@ -6,6 +6,7 @@
 #include <span>
 
 #include "qsrfhs/util/aligned_buffer.hpp"
+#include "signal/radix_pass.hpp"
 #include "signal/sample_type.hpp"
 
 namespace dsp {
@@ -60,9 +61,10 @@ class segment_plan {
   [[nodiscard]] std::size_t columns() const noexcept;
   [[nodiscard]] group_place group_of(std::size_t r, std::size_t n) const noexcept;
 
-  std::size_t rows_, row_, stride_;
+  std::size_t rows_;
+  radix_pass<real> pass_;  // where segments are split
+  std::size_t row_, stride_;
   qsrfhs::aligned_buffer<real> window_;
-  qsrfhs::aligned_buffer<real> near_, far_;  // twiddle factors as the kernels take them, where segments are split
 };
 
 }  // namespace dsp
