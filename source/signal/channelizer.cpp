@@ -18,16 +18,47 @@
 namespace dsp {
 namespace {
 
-/// out[k] = x[k] gains[k] factor; each gain stands twice.
-void weigh_and_rotate(const std::complex<float> *x, const float *gains, std::complex<double> factor,
-                      std::complex<float> *out, std::size_t n) noexcept {
-  qsrfhs::kernels::exact().weigh_and_rotate(reinterpret_cast<const float *>(x), gains,
-                                            static_cast<float>(factor.real()), static_cast<float>(factor.imag()),
-                                            reinterpret_cast<float *>(out), n);
+template <class Sample>
+bool is_split(std::size_t points) noexcept {
+  return is_complex<Sample> && points >= least_split<Sample> && points % radix_pass<real_of<Sample>>::multiple == 0;
 }
-void weigh_and_rotate(const std::complex<double> *x, const double *gains, std::complex<double> factor,
-                      std::complex<double> *out, std::size_t n) noexcept {
-  for (std::size_t k = 0; k < n; ++k) out[k] = times(x[k] * gains[2 * k], factor);
+
+/// A block's bins in their order, or in rows of which the next begins that far behind.
+template <class Bin>
+struct block_bins {
+  const Bin *first;
+  std::size_t stride;  // 0: in their order
+};
+
+/// out[k] = bin from + k times gains[k] factor; each gain stands twice.
+void weigh_and_rotate(block_bins<std::complex<float>> bins, std::size_t from, const float *gains,
+                      std::complex<double> factor, std::complex<float> *out, std::size_t n) noexcept {
+  const auto *const x = reinterpret_cast<const float *>(bins.first);
+  const auto c = static_cast<float>(factor.real()), s = static_cast<float>(factor.imag());
+  auto *const to = reinterpret_cast<float *>(out);
+  const auto &kernels = qsrfhs::kernels::exact();
+  if (bins.stride == 0)
+    kernels.weigh_and_rotate(x + 2 * from, gains, c, s, to, n);
+  else
+    kernels.weigh_and_rotate_rows(x, bins.stride, from, gains, c, s, to, n);
+}
+void weigh_and_rotate(block_bins<std::complex<double>> bins, std::size_t from, const double *gains,
+                      std::complex<double> factor, std::complex<double> *out, std::size_t n) noexcept {
+  constexpr std::size_t rows = qsrfhs::kernels::radix;
+  for (std::size_t k = 0, bin = from; k < n; ++k, ++bin) {
+    const std::size_t place = bins.stride == 0 ? bin : bin % rows * bins.stride + bin / rows;
+    out[k] = times(bins.first[place] * gains[2 * k], factor);
+  }
+}
+
+/// The rows of a block, still to be transformed.
+void split(const std::complex<float> *x, const qsrfhs::kernels::radix_plan<float> &plan,
+           std::complex<float> *rows) noexcept {
+  qsrfhs::kernels::fused().radix_16(reinterpret_cast<const float *>(x), plan, reinterpret_cast<float *>(rows));
+}
+void split(const std::complex<double> *x, const qsrfhs::kernels::radix_plan<double> &plan,
+           std::complex<double> *rows) noexcept {
+  qsrfhs::kernels::fused().radix_16_double(reinterpret_cast<const double *>(x), plan, reinterpret_cast<double *>(rows));
 }
 
 /// A run of bins of the stream, and where in the channel's spectrum it goes.
@@ -125,14 +156,14 @@ class channelizer<Sample>::channel {
     return narrow_ ? 1 + narrow_->filters(0) : interpolator_ ? 2 : 1;
   }
 
-  void run(const output *bins, std::int64_t block, team &with, std::span<output> &room) {
+  void run(block_bins<output> bins, std::int64_t block, team &with, std::span<output> &room) {
     if (block < 0 && way_ == channel_way::exact) return;
     output *const work = with.work.data();
     const auto begin = first_ + block * hop_;
     const std::complex<double> phase = on_circle(-(shift_ * begin).value());
     const real_of<Sample> *gains = gains_.data();
     for (const bin_run &run : runs_) {
-      weigh_and_rotate(bins + run.from, gains, phase, work + run.to, run.count);
+      weigh_and_rotate(bins, run.from, gains, phase, work + run.to, run.count);
       gains += 2 * run.count;
     }
     std::fill(work + empty_first_, work + empty_first_ + empty_count_, output{});
@@ -140,8 +171,10 @@ class channelizer<Sample>::channel {
 
     if (way_ == channel_way::exact) {
       const std::size_t count = std::min(kept_, room.size());
-      std::copy_n(work + lead_, count, room.data());
-      if (turns_.size() != 0) multiply_bins(room.data(), turns_.data(), count);
+      if (turns_.size() != 0)
+        multiply_bins(work + lead_, turns_.data(), room.data(), count);
+      else
+        std::copy_n(work + lead_, count, room.data());
       room = room.subspan(count);
       return;
     }
@@ -249,14 +282,19 @@ channelizer<Sample>::channelizer(std::span<const channel_request> channels, doub
     settings.lengths[0] = static_cast<MKL_LONG>(points);
     return dfti_descriptor(settings);
   };
-  if constexpr (is_complex<Sample>) {
+  std::size_t room = plan_.points;
+  if (is_split<Sample>(plan_.points)) {
+    split_.emplace(plan_.points);
+    in_place_ = make(split_->row());
+    room = split_->radix * split_->stride();
+  } else if constexpr (is_complex<Sample>) {
     in_place_ = make(plan_.points);
   } else {
     apart_.emplace(plan_.points);
     block_ = qsrfhs::aligned_buffer<Sample>(plan_.points);
   }
   held_ = qsrfhs::aligned_buffer<Sample>(plan_.points);
-  bins_ = qsrfhs::aligned_buffer<output>(plan_.points);
+  bins_ = qsrfhs::aligned_buffer<output>(room);
   teams_.resize(std::min(threads, through_blocks.size()));
   for (std::size_t k = 0; k < through_blocks.size(); ++k)
     teams_[k % teams_.size()].members.push_back(through_blocks[k]);
@@ -341,9 +379,21 @@ void channelizer<Sample>::process(std::span<const Sample> in, std::span<output> 
   inputs_ += in.size();
   if (teams_.empty()) return;
   while (in.size() >= plan_.points - held_count_) {
-    const auto rest = in.first(plan_.points - held_count_);
-    in = in.subspan(rest.size());
-    run_block(rest, rooms);
+    if (held_count_ == 0) {
+      run_block(in.data(), rooms);
+      in = in.subspan(plan_.hop());
+      continue;
+    }
+    const std::size_t taken = plan_.points - held_count_;
+    std::copy_n(in.data(), taken, held_.data() + held_count_);
+    run_block(held_.data(), rooms);
+    // The next block lies in these samples alone, where they reach as far back as it does.
+    const bool is_behind = taken >= plan_.overlap;
+    in = in.subspan(is_behind ? taken - plan_.overlap : taken);
+    if (is_behind)
+      held_count_ = 0;
+    else
+      hold_overlap();
   }
   std::copy(in.begin(), in.end(), held_.data() + held_count_);
   held_count_ += in.size();
@@ -356,41 +406,52 @@ void channelizer<Sample>::flush(std::span<output> *rooms) {
   while (!teams_.empty() && begin_of_next() < static_cast<std::int64_t>(inputs_)) {
     const std::span<Sample> silence = held_.elements().subspan(held_count_);
     std::fill(silence.begin(), silence.end(), Sample{});
-    run_block(silence, rooms);
+    run_block(held_.data(), rooms);
+    hold_overlap();
   }
   for (std::size_t k = 0; k < channels_.size(); ++k) channels_[k].end_in_silence(rooms[k]);
   reset();
 }
 
-/// What is held and the rest of a block, to bins of the whole band.
+/// Of the block that is held in full, what the next one begins with.
 template <class Sample>
-void channelizer<Sample>::transform(std::span<const Sample> rest) {
+void channelizer<Sample>::hold_overlap() noexcept {
+  std::copy_n(held_.data() + plan_.hop(), plan_.overlap, held_.data());
+  held_count_ = plan_.overlap;
+}
+
+/// A block to bins of the whole band.
+template <class Sample>
+void channelizer<Sample>::transform(const Sample *samples) {
   if constexpr (is_complex<Sample>) {
-    std::copy(rest.begin(), rest.end(), std::copy_n(held_.data(), held_count_, bins_.data()));
+    if (split_) {
+      split(samples, split_->with(nullptr), bins_.data());
+      qsrfhs::mkl_section around;
+      for (std::size_t r = 0; r < split_->radix; ++r) {
+        in_place_.forward(bins_.data() + r * split_->stride(), around);
+        around.let_forks_pass();
+      }
+      return;
+    }
+    std::copy_n(samples, plan_.points, bins_.data());
     in_place_.forward(bins_.data());
   } else {
-    std::copy(rest.begin(), rest.end(), std::copy_n(held_.data(), held_count_, block_.data()));
+    std::copy_n(samples, plan_.points, block_.data());
     apart_->forward(block_.data(), bins_.data());
     for (std::size_t k = 1; k < plan_.points - plan_.points / 2; ++k)
       bins_.data()[plan_.points - k] = std::conj(bins_.data()[k]);
   }
 }
 
-/// The block's last samples are held for the next.
 template <class Sample>
-void channelizer<Sample>::run_block(std::span<const Sample> rest, std::span<output> *rooms) {
-  transform(rest);
-  const std::size_t from_rest = std::min(rest.size(), plan_.overlap), from_held = plan_.overlap - from_rest;
-  Sample *const held = held_.data();
-  std::copy_n(rest.end() - static_cast<std::ptrdiff_t>(from_rest), from_rest,
-              std::copy_n(held + held_count_ - from_held, from_held, held));
-  held_count_ = plan_.overlap;
-
+void channelizer<Sample>::run_block(const Sample *samples, std::span<output> *rooms) {
+  transform(samples);
   const std::int64_t block = next_block_++;
+  const block_bins<output> bins{bins_.data(), split_ ? split_->stride() : 0};
   const auto run_team = [&](std::size_t index) {
     const qsrfhs::mkl_runtime::use in_use;
     team &with = teams_[index];
-    for (const std::size_t member : with.members) channels_[member].run(bins_.data(), block, with, rooms[member]);
+    for (const std::size_t member : with.members) channels_[member].run(bins, block, with, rooms[member]);
   };
   if (teams_.size() == 1)
     run_team(0);

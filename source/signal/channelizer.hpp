@@ -13,6 +13,7 @@
 #include "signal/block_transform.hpp"
 #include "signal/channel_plan.hpp"
 #include "signal/dfti_descriptor.hpp"
+#include "signal/radix_pass.hpp"
 #include "signal/sample_type.hpp"
 
 namespace dsp {
@@ -69,13 +70,15 @@ class channelizer {
   void begin() noexcept;
   [[nodiscard]] std::int64_t begin_of_next() const noexcept;
   [[nodiscard]] std::size_t held_of(std::uint64_t n) const noexcept;
-  void transform(std::span<const Sample> rest);
-  void run_block(std::span<const Sample> rest, std::span<output> *rooms);
+  void transform(const Sample *samples);
+  void run_block(const Sample *samples, std::span<output> *rooms);
+  void hold_overlap() noexcept;
 
   channel_plan plan_;
   std::vector<channel> channels_;
   std::vector<team> teams_;  // of one thread each
-  // Complex blocks are transformed in place, real ones into half of their bins.
+  // Complex blocks are transformed in place, long ones row by row, and real ones into half of their bins.
+  std::optional<radix_pass<real_of<Sample>>> split_;
   dfti_descriptor in_place_;
   std::optional<block_transform<Sample>> apart_;
   qsrfhs::aligned_buffer<Sample> held_, block_;

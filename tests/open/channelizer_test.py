@@ -57,45 +57,54 @@ def held_outputs(made, rate, channel):
 # Wide channels and a narrow one, on bins and off them, at rates that blocks have and at others, up to the stream's own.
 CHANNELS = [(-4e6, 1e6), (1.234567e6, 1.92e6), (2.5e6, 1e5 + 1 / 3), (-1e6 / 3, 9e6), (3e6, 1234567.8), (0, 10e6)]
 
+# Rates that have long blocks of powers of 2, and bands across the end of the stream's.
+IN_LONG_BLOCKS = [(-4.7e6, 625e3), (1.234567e6, 1.25e6), (2.5e6, 1e5 + 1 / 3), (4.8e6, 312.5e3), (0, 10e6)]
+
 
 class Channelizer(lumra.Test):
     def test_counts_and_bits(self):
         # ceil(n rate / sample rate) samples, with the same bits for any cut, any number of threads and a loaded state.
         n = 200001
-        for kind in lumra.types:
+        for kind, channels in itertools.product(lumra.types, (CHANNELS, IN_LONG_BLOCKS)):
             x = lumra.noise(n, lumra.types[kind])
-            expected = all_of(channelizer(10e6, CHANNELS, kind), kind, len(CHANNELS), [x])
-            for (_, rate), samples in zip(CHANNELS, expected):
+            expected = all_of(channelizer(10e6, channels, kind), kind, len(channels), [x])
+            for (_, rate), samples in zip(channels, expected):
                 self.assertEqual(ceil(n * Fraction(rate) / 10**7), len(samples), (kind, rate))
-            np.testing.assert_array_equal(x, expected[5])
-            made, pieces, done = channelizer(10e6, CHANNELS, kind, threads=2), [], 0
+            np.testing.assert_array_equal(x, expected[-1])
+            made, pieces, done = channelizer(10e6, channels, kind, threads=2), [], 0
             for k in itertools.count():
                 length = int(lumra.random.choice([0, 1, 999, 20000, 50000]))
-                pieces.append(process(made, kind, len(CHANNELS), x[done : done + length]))
+                pieces.append(process(made, kind, len(channels), x[done : done + length]))
                 done += length
                 if k == 3:
                     made = lumra.load("channelizer", lumra.save(made))
                 if done >= n:
                     break
-            pieces.append(run("flush", made, kind, len(CHANNELS)))
+            pieces.append(run("flush", made, kind, len(channels)))
             for c, of_channel in enumerate(zip(*pieces)):
                 self.assertEqual(expected[c].tobytes(), np.concatenate(of_channel).tobytes(), (kind, c))
-            again = all_of(made, kind, len(CHANNELS), [x])  # a flush begins a new stream
+            again = all_of(made, kind, len(channels), [x])  # a flush begins a new stream
             self.assertEqual(expected[3].tobytes(), again[3].tobytes(), kind)
 
     def test_tones_at_exact_times(self):
         # Every channel holds a tone of its own with the phase that the definition gives; the others' are rejected.
         rate, times = 10e6, np.arange(400000) / 10e6
-        for kind, rejection in (("cf32", 80), ("cf64", 120), ("f64", 80)):
+        for kind, rejection, channels in (
+            ("cf32", 80, CHANNELS),
+            ("cf64", 120, CHANNELS),
+            ("f64", 80, CHANNELS),
+            ("cf32", 80, IN_LONG_BLOCKS),
+            ("cf64", 120, IN_LONG_BLOCKS),
+        ):
             is_real = kind[0] == "f"
             limit = 10 ** (-rejection / 20) + 30 * PRECISION[kind]
-            for channel, (centre, own) in enumerate(CHANNELS[:5]):
+            for channel, (centre, own) in enumerate(channels[:-1]):
                 frequency = centre + (0.37 * own if centre <= 0 else -0.41 * own)
                 # Of a real tone a channel has one half, and the other one at the mirrored frequency.
                 x = 2 * tone(frequency, times).real if is_real else tone(frequency, times)
-                made = channelizer(rate, CHANNELS, kind, rejection_db=rejection)
-                samples = all_of(made, kind, len(CHANNELS), [x.astype(lumra.types[kind])])
-                for k, (other, wanted) in enumerate(CHANNELS[:5]):
+                made = channelizer(rate, channels, kind, rejection_db=rejection)
+                samples = all_of(made, kind, len(channels), [x.astype(lumra.types[kind])])
+                for k, (other, wanted) in enumerate(channels[:-1]):
                     held = held_outputs(made, rate, k)[1]
                     middle = samples[k][held:-held]
                     self.assertGreater(len(middle), 100)
