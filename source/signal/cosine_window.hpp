@@ -93,13 +93,13 @@ struct rotations {
 };
 
 inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, float *out,
-                          std::int64_t n) noexcept {
-  qsrfhs::kernels::exact().window_values(angles, polynomial.data(), polynomial.size(), out,
+                          float *mirror, std::int64_t n) noexcept {
+  qsrfhs::kernels::exact().window_values(angles, polynomial.data(), polynomial.size(), out, mirror,
                                          static_cast<std::size_t>(n));
 }
 inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, double *out,
-                          std::int64_t n) noexcept {
-  qsrfhs::kernels::exact().window_values_double(angles, polynomial.data(), polynomial.size(), out,
+                          double *mirror, std::int64_t n) noexcept {
+  qsrfhs::kernels::exact().window_values_double(angles, polynomial.data(), polynomial.size(), out, mirror,
                                                 static_cast<std::size_t>(n));
 }
 
@@ -121,11 +121,10 @@ void multiply_by(const cosine_sum &window, const double *coefficients, T *data, 
     const std::int64_t whole = (count + rotations::group - 1) / rotations::group * rotations::group;
     std::array<Real, rotations::block> w, mirrored;
     // Every block starts from an angle of its own, so that errors do not add up.
-    window_values(table.turned_by(step * static_cast<double>(first)), polynomial, w.data(), whole);
-    std::reverse_copy(w.begin(), w.begin() + count, mirrored.begin());
+    window_values(table.turned_by(step * static_cast<double>(first)), polynomial, w.data(), mirrored.data(), whole);
     T *const rising = data + first, *const falling = data + n - first - count + 1;
     weigh(rising, w.data(), rising, static_cast<std::size_t>(count));
-    weigh(falling, mirrored.data(), falling, static_cast<std::size_t>(count));
+    weigh(falling, mirrored.data() + whole - count, falling, static_cast<std::size_t>(count));
   }
 }
 

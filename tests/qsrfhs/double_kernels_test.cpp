@@ -21,14 +21,17 @@ TEST(WindowKernels, FollowTheirDefinition) {
       for (const std::size_t terms : {2U, 3U, 4U, 5U, 7U}) {
         const turned_angles turned{angles.data(), angles.data() + 512, 0.8, -0.6};
         const tests::guarded narrow(48 * sizeof(float), tests::edge::back), exact(48 * 8, tests::edge::back);
-        table->window_values(turned, polynomial.data(), terms, narrow.as<float>(), 48);
-        table->window_values_double(turned, polynomial.data(), terms, exact.as<double>(), 48);
+        const tests::guarded narrow_mirror(48 * sizeof(float), tests::edge::front), mirror(48 * 8, tests::edge::front);
+        table->window_values(turned, polynomial.data(), terms, narrow.as<float>(), narrow_mirror.as<float>(), 48);
+        table->window_values_double(turned, polynomial.data(), terms, exact.as<double>(), mirror.as<double>(), 48);
         for (std::size_t k = 0; k < 48; ++k) {
           const double sine = -0.6 * angles[k] + 0.8 * angles[512 + k], u = sine * sine;
           double w = polynomial[terms - 1];
           for (std::size_t j = terms - 1; j-- > 0;) w = w * u + polynomial[j];
           EXPECT_EQ(w, exact.as<double>()[k]) << b.name << ' ' << terms;
           EXPECT_EQ(static_cast<float>(w), narrow.as<float>()[k]) << b.name << ' ' << terms;
+          EXPECT_EQ(w, mirror.as<double>()[47 - k]) << b.name << ' ' << terms;
+          EXPECT_EQ(static_cast<float>(w), narrow_mirror.as<float>()[47 - k]) << b.name << ' ' << terms;
         }
       }
       for (std::size_t n = 0; n < 40; ++n) {

@@ -223,11 +223,12 @@ struct kernel_table {
   /// out[k] = x[k] * w[k], n real.
   void (*weigh_double)(const double *x, const double *w, double *out, std::size_t n);
   /// out[k] = a polynomial of `terms` coefficients, that of power 0 first, at the square of the sine of angle k,
-  /// computed in double precision. n is a multiple of 8, `terms` 2, 3, 4, 5 or 7. Nothing is fused in any build.
+  /// computed in double precision; mirror[n - 1 - k], too. n is a multiple of 8, `terms` 2, 3, 4, 5 or 7. Nothing is
+  /// fused in any build.
   void (*window_values)(const turned_angles &angles, const double *polynomial, std::size_t terms, float *out,
-                        std::size_t n);
+                        float *mirror, std::size_t n);
   void (*window_values_double)(const turned_angles &angles, const double *polynomial, std::size_t terms, double *out,
-                               std::size_t n);
+                               double *mirror, std::size_t n);
 };
 
 extern const kernel_table baseline_kernels;

@@ -223,6 +223,9 @@ struct d4 {
 static inline void store(double *p, d4 a) {
   _mm256_storeu_pd(p, a.v);
 }
+static inline d4 reverse(d4 a) {
+  return {_mm256_permute_pd(_mm256_permute2f128_pd(a.v, a.v, 0x01), 0x5)};
+}
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm256_add_pd(a.v, b.v)};
 }

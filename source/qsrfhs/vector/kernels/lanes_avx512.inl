@@ -197,6 +197,9 @@ static inline void join_pairs(d8 re, d8 im, d8 &a, d8 &b) {
 static inline void store(float *p, d8 a) {
   _mm256_storeu_ps(p, _mm512_cvtpd_ps(a.v));
 }
+static inline d8 reverse(d8 a) {
+  return {_mm512_permutexvar_pd(_mm512_setr_epi64(7, 6, 5, 4, 3, 2, 1, 0), a.v)};
+}
 static inline d8 operator+(d8 a, d8 b) {
   return {_mm512_add_pd(a.v, b.v)};
 }

@@ -234,6 +234,9 @@ static inline void store(double *p, d4 a) {
   _mm_storeu_pd(p, a.low);
   _mm_storeu_pd(p + 2, a.high);
 }
+static inline d4 reverse(d4 a) {
+  return {_mm_shuffle_pd(a.high, a.high, 1), _mm_shuffle_pd(a.low, a.low, 1)};
+}
 static inline d4 operator+(d4 a, d4 b) {
   return {_mm_add_pd(a.low, b.low), _mm_add_pd(a.high, b.high)};
 }
