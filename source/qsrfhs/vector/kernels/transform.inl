@@ -33,15 +33,14 @@ static void reverse_conjugate(const float *x, float *out, std::size_t n) {
 /// The factor of powers, which is applied in double precision. One that is a power of two gives the same bits in single
 /// precision, at half the work.
 struct power_factor {
-  double factor;
   wide narrow;
+  double factor;
   bool exact;
-  explicit power_factor(double of) : factor(of) {
+  explicit power_factor(double of) : narrow(wide::broadcast(static_cast<float>(of))), factor(of) {
     const auto rounded = static_cast<float>(of);
     unsigned bits = 0;
     __builtin_memcpy(&bits, &rounded, sizeof bits);
     exact = rounded == of && (bits & 0x007fffffU) == 0;
-    narrow = wide::broadcast(rounded);
   }
   [[nodiscard]] float of_bin(const float *x) const {
     return static_cast<float>(static_cast<double>(x[0] * x[0] + x[1] * x[1]) * factor);
