@@ -18,11 +18,6 @@
 namespace dsp {
 namespace {
 
-template <class Sample>
-bool is_split(std::size_t points) noexcept {
-  return is_complex<Sample> && points >= least_split<Sample> && points % radix_pass<real_of<Sample>>::multiple == 0;
-}
-
 /// A block's bins in their order, or in rows of which the next begins that far behind.
 template <class Bin>
 struct block_bins {
@@ -283,7 +278,7 @@ channelizer<Sample>::channelizer(std::span<const channel_request> channels, doub
     return dfti_descriptor(settings);
   };
   std::size_t room = plan_.points;
-  if (is_split<Sample>(plan_.points)) {
+  if (is_complex<Sample> && is_split<Sample>(plan_.points)) {
     split_.emplace(plan_.points);
     in_place_ = make(split_->row());
     room = split_->radix * split_->stride();

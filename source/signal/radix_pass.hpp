@@ -7,12 +7,9 @@
 
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
+#include "signal/sample_type.hpp"
 
 namespace dsp {
-
-/// Points from which on the pass costs less than what transforms of all of them lose to the second-level cache.
-template <class Sample>
-inline constexpr std::size_t least_split = std::is_same_v<Sample, std::complex<double>> ? 2048 : 8192;
 
 /// A pass of radix 16 leaves rows that fit the caches, whose transforms are the rest of a long one: row r has bins r,
 /// r + 16, r + 32 and so on. Nothing changes it, and all threads may use it.
@@ -41,5 +38,13 @@ class radix_pass {
   qsrfhs::kernels::radix_plan<Real> plan_{};
   qsrfhs::aligned_buffer<Real> near_, far_;
 };
+
+/// Whether a transform of so many points begins with the pass: where it costs less than what one transform of all of them
+/// loses to the second-level cache, and rows are whole groups, those of real samples up to half the rate, too.
+template <class Sample>
+[[nodiscard]] constexpr bool is_split(std::size_t points) noexcept {
+  constexpr std::size_t least = std::is_same_v<Sample, std::complex<double>> ? 2048 : 8192;
+  return points >= least && points % (radix_pass<real_of<Sample>>::multiple * (is_complex<Sample> ? 1 : 2)) == 0;
+}
 
 }  // namespace dsp

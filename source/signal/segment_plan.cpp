@@ -12,11 +12,9 @@ namespace {
 
 constexpr std::size_t radix = qsrfhs::kernels::radix, group = qsrfhs::kernels::radix_group;
 
-/// Rows are whole groups, those of real samples up to half the rate, too.
 template <class Sample>
 std::size_t rows_for(std::size_t points) noexcept {
-  constexpr std::size_t multiple = radix_pass<real_of<Sample>>::multiple * (is_complex<Sample> ? 1 : 2);
-  if (points < least_split<Sample> || points % multiple != 0) return 1;
+  if (!dsp::is_split<Sample>(points)) return 1;
   return is_complex<Sample> ? radix : radix / 2 + 1;
 }
 
