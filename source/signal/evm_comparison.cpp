@@ -49,18 +49,6 @@ double largest_of(const double *powers, std::size_t count) noexcept {
   return *std::max_element(largest, largest + lanes);
 }
 
-/// Takes the peak of powers from a position on, whose sum is known.
-void take_peak(power_peak &peak, std::span<const double> powers, double sum, std::uint64_t position) noexcept {
-  if (std::isnan(sum)) {
-    for (std::size_t k = 0; k < powers.size(); ++k) peak.take(powers[k], position + k);
-    return;
-  }
-  const double largest = largest_of(powers.data(), powers.size());
-  if (largest < peak.power) return;
-  const auto first = std::find(powers.begin(), powers.end(), largest);
-  peak.take(largest, position + static_cast<std::uint64_t>(first - powers.begin()));
-}
-
 double sum_of_squares(const double *x, std::size_t count) noexcept {
   double sum = 0;
   for (std::size_t k = 0; k < count; ++k) sum += x[k] * x[k];
@@ -96,7 +84,7 @@ void error_sums::add(std::span<const wide> carried, const std::complex<Real> *me
   double sum = 0;
   for (std::size_t k = 0; k < count; ++k) sum += powers[k];
   error += sum;
-  take_peak(peak, {powers.data(), count}, sum, position);
+  peak.take(std::span(powers).first(count), sum, largest_of(powers.data(), count), position);
   magnitude += sum_of_squares(magnitudes.data(), count);
   phase += sum_of_squares(angles.data(), count);
   if (traces.error) {

@@ -35,21 +35,25 @@ void power_peak::take(double other, std::uint64_t at) noexcept {
   position = at;
 }
 
+void power_peak::take(std::span<const double> powers, double sum, double largest, std::uint64_t at) noexcept {
+  if (std::isnan(sum)) {
+    for (std::size_t k = 0; k < powers.size(); ++k) take(powers[k], at + k);
+  } else if (largest >= power) {
+    const auto first = std::find(powers.begin(), powers.end(), largest);
+    take(largest, at + static_cast<std::uint64_t>(first - powers.begin()));
+  }
+}
+
 template <class Sample>
 run_figures level_totals::add(std::span<const Sample> x, std::uint64_t position) noexcept {
   std::array<double, level_block> room;
   const run_figures figures = measure_run(x.data(), x.size(), room.data());
   const std::span<const double> each(room.data(), x.size());
-  if (std::isnan(figures.power)) {
+  if (std::isnan(figures.power))
     powers.add(each, 0, figures.power);
-    for (std::size_t k = 0; k < each.size(); ++k) peak.take(each[k], position + k);
-    return figures;
-  }
-  powers.add(each, figures.smallest, figures.largest);
-  if (figures.largest > peak.power) {
-    const auto first = std::find(each.begin(), each.end(), figures.largest);
-    peak.take(figures.largest, position + static_cast<std::uint64_t>(first - each.begin()));
-  }
+  else
+    powers.add(each, figures.smallest, figures.largest);
+  peak.take(each, figures.power, figures.largest, position);
   return figures;
 }
 

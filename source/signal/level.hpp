@@ -19,6 +19,8 @@ struct power_peak {
   double power = -1;
   std::uint64_t position = 0;
   void take(double other, std::uint64_t at) noexcept;
+  /// Powers from a position on, whose sum and largest are known; the latter counts where there is no NaN.
+  void take(std::span<const double> powers, double sum, double largest, std::uint64_t at) noexcept;
 };
 
 /// What is known of samples wherever they stand in a stream.
