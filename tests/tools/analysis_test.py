@@ -126,6 +126,15 @@ class Analysis(unittest.TestCase):
         self.assertTrue(50 <= found["rows"] < 100)
         self.assertAlmostEqual(10000 / RATE, found["rows"] * found["time_step_s"], delta=found["time_step_s"] + 1e-4)
 
+    def test_threads_do_not_change_a_long_spectrum(self):
+        x = np.random.default_rng(3).integers(-100, 100, 2 * 9_000_001, dtype=np.int8)
+        (self.folder / "x.ci8").write_bytes(x.tobytes())
+        line = "spectrum x.ci8 --rate 1M --fft 1000"
+        one = self.figures(f"{line} --threads 1")
+        self.assertEqual((9_000_001 - 1000) // 500 + 1, one["segments"])
+        self.assertEqual(one, self.figures(f"{line} --threads 2"))
+        self.assertEqual(one, self.figures("spectrum - --format ci8 --rate 1M --fft 1000", input=x.tobytes()))
+
     def test_captures_are_averaged_within_one_frequency(self):
         a, b, c = noise(5000), noise(8000, 0.3), noise(5000, 0.2)
         starts = [(0, 1e9), (5000, 2e9), (13000, 1e9)]

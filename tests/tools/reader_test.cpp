@@ -1,4 +1,4 @@
-// The thread that reads ahead, without the program. SPDX-License-Identifier: MIT
+// The threads that read, without the program. SPDX-License-Identifier: MIT
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -7,6 +7,7 @@
 #include <numeric>
 
 #include "analysis/sample_blocks.hpp"
+#include "analysis/spectrum_pieces.hpp"
 #include "recording/failure.hpp"
 
 namespace tests {
@@ -93,6 +94,60 @@ TEST(ReaderConcurrency, FailureComesBehindWhatWasReadBefore) {
       expect_counting(*block);
     }
     EXPECT_THROW((void)blocks.next(), recording::failure) << fails_at;
+  }
+}
+
+const tool::selection two_stretches = chosen({{5, 40'000, {}, 0}, {50'001, 30'003, {}, 0}});
+
+lumra::spectrum_settings short_segments(std::uint32_t threads) {
+  lumra::spectrum_settings settings;
+  settings.points = 64;
+  settings.overlap = 0.3;
+  settings.hold = true;
+  settings.threads = threads;
+  return settings;
+}
+
+TEST(ReaderConcurrency, PiecesAddUpToTheSpectrumOfOneThread) {
+  const recording::source source = counting_source(100'000, recording::endless);
+  tool::spectrum_accumulator whole(short_segments(1), true);
+  tool::sample_blocks blocks(source, two_stretches);
+  while (const auto block = blocks.next()) {
+    if (block->begins_stretch) whole.gap();
+    whole.add(*block);
+  }
+  const lumra::averaged_spectrum expected = whole.read();
+  for (const std::uint32_t threads : {1U, 2U, 5U})
+    for (const std::uint64_t size : {63U, 1000U, 40'000U, 100'000U}) {
+      tool::spectrum_accumulator sum(short_segments(1), true);
+      tool::spectrum_pieces pieces(source, two_stretches, short_segments(threads), size);
+      std::uint64_t samples = 0;
+      while (const auto piece = pieces.next()) {
+        sum.merge(piece->average);
+        samples += piece->samples;
+      }
+      const lumra::averaged_spectrum found = sum.read();
+      EXPECT_EQ(70'003U, samples);
+      EXPECT_EQ(expected.info.segments, found.info.segments);
+      EXPECT_EQ(expected.power, found.power) << threads << " threads, pieces of " << size;
+      EXPECT_EQ(expected.maximum, found.maximum) << threads << " threads, pieces of " << size;
+    }
+}
+
+TEST(ReaderConcurrency, PiecesInFrontOfAFailureAreGivenAndNobodyWaitsForTheRest) {
+  const tool::selection all = chosen({{5, 40'000, {}, 0}});
+  for (const std::uint64_t fails_at : {0U, 4500U, 39'999U, 100'000U}) {
+    const recording::source source = counting_source(100'000, fails_at);
+    const std::uint64_t good = fails_at < 5 ? 0 : std::min<std::uint64_t>((fails_at - 5) / 1000, 40);
+    for (const std::uint64_t wanted : {std::uint64_t{0}, std::uint64_t{1}, good, good + 1}) {
+      tool::spectrum_pieces pieces(source, all, short_segments(3), 1000);
+      for (std::uint64_t k = 0; k < std::min(wanted, good); ++k) ASSERT_TRUE(pieces.next().has_value());
+      if (wanted <= good) continue;
+      if (good < 40)
+        EXPECT_THROW((void)pieces.next(), recording::failure) << fails_at;
+      else
+        EXPECT_FALSE(pieces.next().has_value());
+    }
   }
 }
 

@@ -19,6 +19,8 @@ spectrum_accumulator::spectrum_accumulator(const lumra::spectrum_settings &setti
   options.hold = hold_ ? LUMRA_HOLD_EXTREMES : LUMRA_HOLD_NONE;
   options.overlap = settings.overlap;
   options.threads = settings.threads;
+  options.start = settings.start;
+  options.origin = settings.origin;
   lumra_spectrum_average *made = nullptr;
   lumra::check_open(lumra_spectrum_create(&options, &made));
   average_.reset(made);

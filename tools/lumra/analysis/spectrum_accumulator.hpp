@@ -17,6 +17,10 @@ class spectrum_accumulator {
   void add(sample_block block) { lumra::check_open(lumra_spectrum_add(average_.get(), block.samples, block.count)); }
   /// The next samples do not follow the ones before.
   void gap() { lumra::check_open(lumra_spectrum_gap(average_.get())); }
+  /// Adds what continues this one.
+  void merge(const spectrum_accumulator &next) {
+    lumra::check_open(lumra_spectrum_merge(average_.get(), next.average_.get()));
+  }
   /// Begins a new average; the stream goes on.
   void clear() { lumra::check_open(lumra_spectrum_clear(average_.get())); }
   /// Complete segments.

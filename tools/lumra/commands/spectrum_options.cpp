@@ -11,6 +11,7 @@
 #include <nlohmann/json.hpp>
 
 #include "analysis/spectrum_accumulator.hpp"
+#include "analysis/spectrum_pieces.hpp"
 #include "documentation/command_model.hpp"
 #include "terminal/failure.hpp"
 #include "terminal/progress.hpp"
@@ -117,15 +118,26 @@ lumra::spectrum_settings settings_for(const spectrum_arguments &arguments, const
 
 lumra::averaged_spectrum average(const recording::source &source, selection &chosen,
                                  const lumra::spectrum_settings &settings) {
-  sample_blocks blocks(source, chosen);
-  spectrum_accumulator accumulator(settings, blocks.is_real());
+  spectrum_accumulator accumulator(settings, !source.format.is_complex);
   progress bar("Analysing");
   std::uint64_t done = 0;
-  while (const auto block = blocks.next()) {
-    if (block->begins_stretch && done > 0) accumulator.gap();
-    accumulator.add(*block);
-    done += block->count;
+  const auto add_to_done = [&](std::uint64_t samples) {
+    done += samples;
     bar.update(done, chosen.samples == recording::endless ? 0 : chosen.samples);
+  };
+  if (spectrum_pieces::pay(source, chosen, settings)) {
+    spectrum_pieces pieces(source, chosen, settings, spectrum_pieces::usual_size(settings));
+    while (const auto piece = pieces.next()) {
+      accumulator.merge(piece->average);
+      add_to_done(piece->samples);
+    }
+  } else {
+    sample_blocks blocks(source, chosen);
+    while (const auto block = blocks.next()) {
+      if (block->begins_stretch && done > 0) accumulator.gap();
+      accumulator.add(*block);
+      add_to_done(block->count);
+    }
   }
   chosen.samples = done;
   if (accumulator.segments() == 0)
