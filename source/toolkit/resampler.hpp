@@ -141,6 +141,7 @@ class resampler {
         const double offset = static_cast<double>(k) * step_, whole = std::floor(offset);
         set_tap(taps_.data(), k, static_cast<real>(whole), static_cast<real>(offset - whole));
       }
+      fill_pairs(outputs);
     }
     return source;
   }
@@ -194,7 +195,12 @@ class resampler {
   void make_batch(tap_source source, std::int64_t outputs, const value *x, value *out) const noexcept {
     if constexpr (has_offsets) {
       if (source == tap_source::offsets)
-        return stretched(places_.data(), outputs, {h_.data(), static_cast<float>(last_ - 1), taps_.data()}, x, out);
+        return stretched(places_.data(), outputs,
+                         {h_.data(),
+                          static_cast<float>(last_ - 1),
+                          taps_.data(),
+                          {pairs_.data(), static_cast<std::int32_t>(row_length_)}},
+                         x, out);
     }
     polyphase(places_.data(), outputs, {taps_.data(), static_cast<std::int32_t>(row_length_)}, x, out);
   }
@@ -237,6 +243,20 @@ class resampler {
     }
   }
 
+  /// What taps between coefficients are made of, for each place of the first one, where that pays.
+  void fill_pairs(std::int64_t outputs) {
+    const std::int64_t rows = static_cast<std::int64_t>(step_) + 2;
+    if (outputs < 2 * rows || rows > most_in_rows / (2 * row_length_)) return;
+    pairs_ = qsrfhs::aligned_buffer<real>(static_cast<std::size_t>(rows * 2 * row_length_));
+    for (std::int64_t k = 0; k < row_length_; ++k) {
+      const auto whole = static_cast<std::int64_t>(static_cast<double>(k) * step_);
+      for (std::int64_t row = 0; row < rows; ++row) {
+        const auto i = static_cast<std::size_t>(std::min(whole + row, last_ - 1));
+        set_tap(pairs_.data() + row * 2 * row_length_, k, h_[i], h_[i + 1] - h_[i]);
+      }
+    }
+  }
+
   /// Taps first, first + 1, ... of those at `tap`, `tap` + step, ..., made in double precision.
   void fill_taps_between(double tap, std::int64_t first, std::int64_t length, real *row) const noexcept {
     const bool nearest = between_ == interpolation::nearest;
@@ -259,7 +279,7 @@ class resampler {
   std::int64_t row_length_ = 0;
   std::array<tap_place<real>, most_together> places_;  // of a batch
   qsrfhs::aligned_buffer<value> samples_;              // where they are gathered from history and block
-  qsrfhs::aligned_buffer<real> taps_;
+  qsrfhs::aligned_buffer<real> taps_, pairs_;
 };
 
 }  // namespace toolkit

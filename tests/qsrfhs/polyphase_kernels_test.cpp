@@ -17,9 +17,9 @@ using tests::edge, tests::guarded;
 
 /// Real outputs, then complex ones, of one kernel of either kind in all builds.
 template <class Taps, class Kernel>
-void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
-                 Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places, std::size_t samples,
-                 const std::vector<std::vector<double>> &taps) {
+std::vector<float> expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_table::*real,
+                               Kernel kernel_table::*complex, const std::vector<tap_place<float>> &places,
+                               std::size_t samples, const std::vector<std::vector<double>> &taps) {
   const auto x = tests::noise_of<float>(2 * samples, 7);
   // Nothing before the samples is read, and behind the last group of any place neither.
   std::vector<std::vector<float>> got;
@@ -47,6 +47,7 @@ void expect_sums(const Taps &real_taps, const Taps &complex_taps, Kernel kernel_
     EXPECT_NEAR(sums[1], static_cast<double>(got[0][places.size() + 2 * k]), 4e-6) << places[k].count;
     EXPECT_NEAR(sums[2], static_cast<double>(got[0][places.size() + 2 * k + 1]), 4e-6) << places[k].count;
   }
+  return got[0];
 }
 
 std::size_t slot(std::size_t k, bool complex) {
@@ -77,17 +78,24 @@ TEST(PolyphaseKernels, TapsInRows) {
   }
 }
 
+// The last taps lie behind the prototype's end: they go on along its last pair. Rows hold what is read from it otherwise.
 TEST(PolyphaseKernels, TapsAtOffsets) {
-  constexpr std::size_t length = 40, size = 200;
+  constexpr std::size_t length = 40, last_pair = 190, rows = 5;
   constexpr double step = 4.9;
-  const auto h = tests::noise_of<float>(size, 1);
-  std::vector<float> in_order(2 * length), for_complex(2 * length);
-  for (std::size_t k = 0; k < length; ++k) {
-    const double offset = step * static_cast<double>(k);
-    for (const bool complex : {false, true}) {
-      auto &to = complex ? for_complex : in_order;
-      to[slot(k, complex)] = static_cast<float>(std::floor(offset));
-      to[slot(k, complex) + 8] = static_cast<float>(offset - std::floor(offset));
+  const auto h = tests::noise_of<float>(last_pair + 2, 1);
+  std::vector<float> offsets[2], pairs[2];
+  for (const bool complex : {false, true}) {
+    offsets[complex].resize(2 * length);
+    pairs[complex].resize(2 * length * rows);
+    for (std::size_t k = 0; k < length; ++k) {
+      const double offset = step * static_cast<double>(k), whole = std::floor(offset);
+      offsets[complex][slot(k, complex)] = static_cast<float>(whole);
+      offsets[complex][slot(k, complex) + 8] = static_cast<float>(offset - whole);
+      for (std::size_t row = 0; row < rows; ++row) {
+        const std::size_t i = std::min(static_cast<std::size_t>(whole) + row, last_pair);
+        pairs[complex][2 * length * row + slot(k, complex)] = h[i];
+        pairs[complex][2 * length * row + slot(k, complex) + 8] = h[i + 1] - h[i];
+      }
     }
   }
   std::vector<tap_place<float>> places;
@@ -97,16 +105,20 @@ TEST(PolyphaseKernels, TapsAtOffsets) {
     auto &of_place = taps.emplace_back();
     for (std::size_t k = 0; k < length; ++k) {
       const double t = 3.875 + step * static_cast<double>(k);
-      const auto i = static_cast<std::size_t>(t);
+      const std::size_t i = std::min(static_cast<std::size_t>(t), last_pair);
       of_place.push_back(static_cast<double>(h[i]) +
                          (t - static_cast<double>(i)) * (static_cast<double>(h[i + 1]) - static_cast<double>(h[i])));
     }
   }
   for (const edge at : {edge::front, edge::back}) {
-    const guarded prototype(h, at), real(in_order, at), complex(for_complex, at);
-    expect_sums(tap_offsets{prototype.as<float>(), size - 2, real.as<float>()},
-                tap_offsets{prototype.as<float>(), size - 2, complex.as<float>()}, &kernel_table::stretched,
-                &kernel_table::complex_stretched, places, 44, taps);
+    const guarded prototype(h, at), real(offsets[0], at), complex(offsets[1], at), real_rows(pairs[0], at),
+        complex_rows(pairs[1], at);
+    const auto sums = [&](const float *at_real, const float *at_complex) {
+      return expect_sums(tap_offsets{prototype.as<float>(), last_pair, real.as<float>(), {at_real, length}},
+                         tap_offsets{prototype.as<float>(), last_pair, complex.as<float>(), {at_complex, length}},
+                         &kernel_table::stretched, &kernel_table::complex_stretched, places, 44, taps);
+    };
+    EXPECT_EQ(sums(nullptr, nullptr), sums(real_rows.as<float>(), complex_rows.as<float>()));
   }
 }
 

@@ -40,6 +40,9 @@ struct tap_offsets {
   const float *prototype;
   float last_pair;       // index of the last coefficient but one
   const float *offsets;  // groups of eight: whole parts, then fractions, each at most 1
+  /// The coefficients at each tap's whole part, or at the last pair, and their slopes to the next ones, for each row of
+  /// the places and one more; or null, where the prototype is read.
+  tap_rows<float> at_rows;
 };
 
 /// Where an output takes its samples, and where it lies between the middle two of them.

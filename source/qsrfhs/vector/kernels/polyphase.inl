@@ -46,27 +46,52 @@ struct taps_of_row {
   }
 };
 
+/// Coefficients in front of taps, and their slopes to the next, from the prototype or out of rows of them.
+struct coefficients_sought {
+  const float *h;
+  coefficients_sought(const tap_offsets &taps, const tap_place<float> & /*place*/) : h(taps.prototype) {}
+  void get(f8 found, f8 /*carries*/, f8 &near, f8 &slope) const {
+    int index[8];
+    store(reinterpret_cast<float *>(index), to_integers(found));
+    f8 far;
+    load_pairs(h, index, near, far);
+    slope = far - near;
+  }
+};
+struct coefficients_in_rows {
+  const float *row, *next;
+  coefficients_in_rows(const tap_offsets &taps, const tap_place<float> &place)
+      : row(taps.at_rows.taps + static_cast<std::ptrdiff_t>(place.row) * 2 * taps.at_rows.length),
+        next(row + 2 * static_cast<std::ptrdiff_t>(taps.at_rows.length)) {}
+  void get(f8 /*found*/, f8 carries, f8 &near, f8 &slope) {
+    near = select(carries, f8::load(next), f8::load(row));
+    slope = select(carries, f8::load(next + 8), f8::load(row + 8));
+    row += 16;
+    next += 16;
+  }
+};
+
 /// Taps that lie anywhere.
+template <class Coefficients>
 struct taps_at_offsets {
-  const float *h, *offset;
+  Coefficients coefficients;
+  const float *offset;
   f8 last, whole, fraction;
   taps_at_offsets(const tap_offsets &taps, const tap_place<float> &place)
-      : h(taps.prototype),
+      : coefficients(taps, place),
         offset(taps.offsets),
         last(f8::broadcast(taps.last_pair)),
         whole(f8::broadcast(static_cast<float>(place.row))),
         fraction(f8::broadcast(place.fraction)) {}
   f8 next() {
     const f8 one = f8::broadcast(1), between = f8::load(offset + 8) + fraction;
-    const f8 carry = (between >= one) & one;
+    const f8 carries = between >= one, carry = carries & one;
     const f8 sought = f8::load(offset) + whole + carry;  // whole numbers below 2^24
     const f8 found = smaller_of(sought, last);
-    int index[8];
-    store(reinterpret_cast<float *>(index), to_integers(found));
-    f8 near, far;
-    load_pairs(h, index, near, far);
+    f8 near, slope;
+    coefficients.get(found, carries, near, slope);
     offset += 16;
-    return near + ((between - carry) + (sought - found)) * (far - near);
+    return near + ((between - carry) + (sought - found)) * slope;
   }
 };
 
@@ -93,11 +118,19 @@ static void complex_polyphase(const tap_place<float> *places, std::size_t output
                               const float *x, float *out) {
   filter_at<complex_sum, taps_of_row>(places, outputs, rows, x, out);
 }
+template <class Sum>
+static inline void filter_at_offsets(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps,
+                                     const float *x, float *out) {
+  if (taps.at_rows.taps)
+    filter_at<Sum, taps_at_offsets<coefficients_in_rows>>(places, outputs, taps, x, out);
+  else
+    filter_at<Sum, taps_at_offsets<coefficients_sought>>(places, outputs, taps, x, out);
+}
 static void stretched(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps, const float *x,
                       float *out) {
-  filter_at<real_sum, taps_at_offsets>(places, outputs, taps, x, out);
+  filter_at_offsets<real_sum>(places, outputs, taps, x, out);
 }
 static void complex_stretched(const tap_place<float> *places, std::size_t outputs, const tap_offsets &taps,
                               const float *x, float *out) {
-  filter_at<complex_sum, taps_at_offsets>(places, outputs, taps, x, out);
+  filter_at_offsets<complex_sum>(places, outputs, taps, x, out);
 }
