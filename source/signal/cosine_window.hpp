@@ -3,16 +3,15 @@
 #pragma once
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <complex>
 #include <cstdint>
 #include <numbers>
 #include <span>
+#include <type_traits>
 #include <utility>
 
 #include "qsrfhs/vector/kernels/kernels.hpp"
-#include "signal/weighting.hpp"
 
 namespace dsp {
 
@@ -92,17 +91,6 @@ struct rotations {
   }
 };
 
-inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, float *out,
-                          float *mirror, std::int64_t n) noexcept {
-  qsrfhs::kernels::exact().window_values(angles, polynomial.data(), polynomial.size(), out, mirror,
-                                         static_cast<std::size_t>(n));
-}
-inline void window_values(const qsrfhs::kernels::turned_angles &angles, std::span<const double> polynomial, double *out,
-                          double *mirror, std::int64_t n) noexcept {
-  qsrfhs::kernels::exact().window_values_double(angles, polynomial.data(), polynomial.size(), out, mirror,
-                                                static_cast<std::size_t>(n));
-}
-
 /// Multiplies n samples by the window of period n that expand() made the coefficients of. Two terms or more. As
 /// w[i] = w[n - i], half of the window is computed.
 template <class T, class Real = decltype(std::real(T{}))>
@@ -116,15 +104,23 @@ void multiply_by(const cosine_sum &window, const double *coefficients, T *data, 
   const double step = std::numbers::pi / static_cast<double>(n);
   const rotations table(step, std::min(n, rotations::block));
   const std::int64_t pairs = (n - 1) / 2;
+  const auto &kernels = qsrfhs::kernels::exact();
   for (std::int64_t first = 1; first <= pairs; first += rotations::block) {
     const std::int64_t count = std::min(pairs - first + 1, rotations::block);
-    const std::int64_t whole = (count + rotations::group - 1) / rotations::group * rotations::group;
-    std::array<Real, rotations::block> w, mirrored;
     // Every block starts from an angle of its own, so that errors do not add up.
-    window_values(table.turned_by(step * static_cast<double>(first)), polynomial, w.data(), mirrored.data(), whole);
-    T *const rising = data + first, *const falling = data + n - first - count + 1;
-    weigh(rising, w.data(), rising, static_cast<std::size_t>(count));
-    weigh(falling, mirrored.data() + whole - count, falling, static_cast<std::size_t>(count));
+    const auto angles = table.turned_by(step * static_cast<double>(first));
+    const auto weigh_ends = [&](auto kernel) {
+      kernel(angles, polynomial.data(), polynomial.size(), reinterpret_cast<Real *>(data + first),
+             reinterpret_cast<Real *>(data + n - first - count + 1), static_cast<std::size_t>(count));
+    };
+    if constexpr (std::is_same_v<T, float>)
+      weigh_ends(kernels.cosine_window);
+    else if constexpr (std::is_same_v<T, double>)
+      weigh_ends(kernels.cosine_window_double);
+    else if constexpr (std::is_same_v<Real, float>)
+      weigh_ends(kernels.complex_cosine_window);
+    else
+      weigh_ends(kernels.complex_cosine_window_double);
   }
 }
 

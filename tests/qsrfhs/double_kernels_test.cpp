@@ -14,31 +14,40 @@ namespace {
 
 using namespace qsrfhs::kernels;
 
-TEST(WindowKernels, FollowTheirDefinition) {
+/// Records of n samples, which the window weighs from both ends.
+template <class Real, std::size_t parts, class Kernel>
+void expect_window(const build &b, Kernel kernel_table::*kernel, std::size_t terms, std::size_t n) {
   const auto polynomial = tests::noise_of<double>(7, 1), angles = tests::noise_of<double>(1024, 2);
+  const auto x = tests::noise_of<Real>(parts * n, 3), y = tests::noise_of<Real>(parts * n, 4);
+  for (const kernel_table *table : {b.exact, b.fused}) {
+    const tests::guarded rising(x, tests::edge::back), falling(y, tests::edge::front);
+    (table->*kernel)({angles.data(), angles.data() + 512, 0.8, -0.6}, polynomial.data(), terms, rising.as<Real>(),
+                     falling.as<Real>(), n);
+    for (std::size_t k = 0; k < parts * n; ++k) {
+      const std::size_t at = k / parts, back = parts * (n - 1 - at) + k % parts;
+      const double sine = -0.6 * angles[at] + 0.8 * angles[512 + at], u = sine * sine;
+      double w = polynomial[terms - 1];
+      for (std::size_t j = terms - 1; j-- > 0;) w = w * u + polynomial[j];
+      ASSERT_EQ(x[k] * static_cast<Real>(w), rising.as<Real>()[k]) << b.name << ' ' << terms << ' ' << n;
+      ASSERT_EQ(y[back] * static_cast<Real>(w), falling.as<Real>()[back]) << b.name << ' ' << terms << ' ' << n;
+    }
+  }
+}
+
+TEST(WindowKernels, FollowTheirDefinition) {
   for (const build &b : builds()) {
-    for (const kernel_table *table : {b.exact, b.fused}) {
-      for (const std::size_t terms : {2U, 3U, 4U, 5U, 7U}) {
-        const turned_angles turned{angles.data(), angles.data() + 512, 0.8, -0.6};
-        const tests::guarded narrow(48 * sizeof(float), tests::edge::back), exact(48 * 8, tests::edge::back);
-        const tests::guarded narrow_mirror(48 * sizeof(float), tests::edge::front), mirror(48 * 8, tests::edge::front);
-        table->window_values(turned, polynomial.data(), terms, narrow.as<float>(), narrow_mirror.as<float>(), 48);
-        table->window_values_double(turned, polynomial.data(), terms, exact.as<double>(), mirror.as<double>(), 48);
-        for (std::size_t k = 0; k < 48; ++k) {
-          const double sine = -0.6 * angles[k] + 0.8 * angles[512 + k], u = sine * sine;
-          double w = polynomial[terms - 1];
-          for (std::size_t j = terms - 1; j-- > 0;) w = w * u + polynomial[j];
-          EXPECT_EQ(w, exact.as<double>()[k]) << b.name << ' ' << terms;
-          EXPECT_EQ(static_cast<float>(w), narrow.as<float>()[k]) << b.name << ' ' << terms;
-          EXPECT_EQ(w, mirror.as<double>()[47 - k]) << b.name << ' ' << terms;
-          EXPECT_EQ(static_cast<float>(w), narrow_mirror.as<float>()[47 - k]) << b.name << ' ' << terms;
-        }
+    for (const std::size_t terms : {2U, 3U, 4U, 5U, 7U})
+      for (const std::size_t n : {0U, 1U, 7U, 8U, 63U, 64U, 65U, 130U, 512U}) {
+        expect_window<float, 1>(b, &kernel_table::cosine_window, terms, n);
+        expect_window<double, 1>(b, &kernel_table::cosine_window_double, terms, n);
+        expect_window<float, 2>(b, &kernel_table::complex_cosine_window, terms, n);
+        expect_window<double, 2>(b, &kernel_table::complex_cosine_window_double, terms, n);
       }
-      for (std::size_t n = 0; n < 40; ++n) {
-        const tests::guarded out(n * sizeof(double), tests::edge::back);
-        table->weigh_double(angles.data(), angles.data() + 512, out.as<double>(), n);
-        for (std::size_t k = 0; k < n; ++k) EXPECT_EQ(angles[k] * angles[512 + k], out.as<double>()[k]) << b.name;
-      }
+    const auto x = tests::noise_of<double>(80, 2);
+    for (std::size_t n = 0; n < 40; ++n) {
+      const tests::guarded out(n * sizeof(double), tests::edge::back);
+      b.exact->weigh_double(x.data(), x.data() + 40, out.as<double>(), n);
+      for (std::size_t k = 0; k < n; ++k) EXPECT_EQ(x[k] * x[40 + k], out.as<double>()[k]) << b.name;
     }
   }
 }

@@ -76,6 +76,8 @@ static constexpr kernel_table table = {
     .join_planes_double = &join_planes_double,
     .is_finite = &is_finite,
     .weigh_double = &weigh_double,
-    .window_values = &window_values,
-    .window_values_double = &window_values_double,
+    .cosine_window = &cosine_window,
+    .cosine_window_double = &cosine_window_double,
+    .complex_cosine_window = &complex_cosine_window,
+    .complex_cosine_window_double = &complex_cosine_window_double,
 };

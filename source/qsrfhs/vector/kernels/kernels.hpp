@@ -225,13 +225,17 @@ struct kernel_table {
 
   /// out[k] = x[k] * w[k], n real.
   void (*weigh_double)(const double *x, const double *w, double *out, std::size_t n);
-  /// out[k] = a polynomial of `terms` coefficients, that of power 0 first, at the square of the sine of angle k,
-  /// computed in double precision; mirror[n - 1 - k], too. n is a multiple of 8, `terms` 2, 3, 4, 5 or 7. Nothing is
-  /// fused in any build.
-  void (*window_values)(const turned_angles &angles, const double *polynomial, std::size_t terms, float *out,
-                        float *mirror, std::size_t n);
-  void (*window_values_double)(const turned_angles &angles, const double *polynomial, std::size_t terms, double *out,
-                               double *mirror, std::size_t n);
+  /// rising[k] *= w and falling[n - 1 - k] *= w, where w is a polynomial of `terms` coefficients, that of power 0 first,
+  /// at the square of the sine of angle k, computed in double precision. There are angles up to a multiple of 8. `terms`
+  /// is 2, 3, 4, 5 or 7; rising and falling lie apart. Nothing is fused in any build.
+  void (*cosine_window)(const turned_angles &angles, const double *polynomial, std::size_t terms, float *rising,
+                        float *falling, std::size_t n);
+  void (*cosine_window_double)(const turned_angles &angles, const double *polynomial, std::size_t terms, double *rising,
+                               double *falling, std::size_t n);
+  void (*complex_cosine_window)(const turned_angles &angles, const double *polynomial, std::size_t terms, float *rising,
+                                float *falling, std::size_t n);
+  void (*complex_cosine_window_double)(const turned_angles &angles, const double *polynomial, std::size_t terms,
+                                       double *rising, double *falling, std::size_t n);
 };
 
 extern const kernel_table baseline_kernels;
