@@ -18,12 +18,6 @@ std::size_t samples_at_once(const lumra::spectrum_settings &settings) noexcept {
   return static_cast<std::size_t>(std::max(std::uint64_t{1} << 15, 4 * settings.points));
 }
 
-std::uint64_t pieces_of(const selection &chosen, std::uint64_t size) noexcept {
-  std::uint64_t pieces = 0;
-  for (const recording::stretch &over : chosen.stretches) pieces += (over.samples + size - 1) / size;
-  return pieces;
-}
-
 std::uint64_t threads_for(const lumra::spectrum_settings &settings) noexcept {
   return settings.threads != 0 ? settings.threads : std::thread::hardware_concurrency();
 }
@@ -35,6 +29,7 @@ class piece_reader {
   piece_reader(const recording::source &source, std::size_t at_once)
       : source_(source), reader_(source, 0, source.samples), samples_(at_once) {}
 
+  /// Of one stretch.
   void add(std::uint64_t first, std::uint64_t count, spectrum_accumulator &average) {
     reader_.seek(first);
     for (std::uint64_t left = count; left > 0;) {
@@ -58,27 +53,40 @@ bool spectrum_pieces::pay(const recording::source &source, const selection &chos
                           const lumra::spectrum_settings &settings) {
   constexpr std::uint64_t each = 2;  // fewer end too far apart
   const std::uint64_t threads = threads_for(settings);
-  return threads > 1 && source.ranged && pieces_of(chosen, usual_size(settings)) >= each * threads;
+  return threads > 1 && source.ranged && chosen.samples / usual_size(settings) >= each * threads;
 }
 
 spectrum_pieces::spectrum_pieces(const recording::source &source, const selection &chosen,
                                  const lumra::spectrum_settings &settings, std::uint64_t size)
-    : source_(source), settings_(settings) {
+    : source_(source), stretches_(chosen.stretches), settings_(settings) {
   const std::uint64_t threads = threads_for(settings);
   settings_.threads = 1;
-  std::uint64_t position = 0;
-  for (const recording::stretch &over : chosen.stretches) {
-    const std::uint64_t origin = position;
-    for (std::uint64_t done = 0; done < over.samples; done += size) {
-      const std::uint64_t samples = std::min(size, over.samples - done);
-      pieces_.push_back({over.first + done, samples, position, origin});
-      position += samples;
-    }
+  std::size_t stretch = 0;
+  for (std::uint64_t start = 0, origin = 0; start < chosen.samples; start += size) {
+    while (start - origin >= stretches_[stretch].samples) origin += stretches_[stretch++].samples;
+    pieces_.push_back({stretch, start, origin, std::min(size, chosen.samples - start)});
   }
   results_.resize(static_cast<std::size_t>(2 * threads));
   const held_signals for_the_other_threads;  // which inherit them: handlers run in this one
   for (std::uint64_t k = 0; k < threads; ++k)
     threads_.emplace_back([this](const std::stop_token &stopped) { work(stopped); });
+}
+
+template <class Reader>
+spectrum_accumulator spectrum_pieces::average_of(const piece &of, Reader &reader) const {
+  lumra::spectrum_settings settings = settings_;
+  settings.start = of.start;
+  settings.origin = of.origin;
+  spectrum_accumulator average(settings, !source_.format.is_complex);
+  std::uint64_t skipped = of.start - of.origin;
+  auto over = stretches_.begin() + static_cast<std::ptrdiff_t>(of.stretch);
+  for (std::uint64_t left = of.samples; left > 0; ++over, skipped = 0) {
+    if (left < of.samples) average.gap();
+    const std::uint64_t count = std::min(over->samples - skipped, left);
+    reader.add(over->first + skipped, count, average);
+    left -= count;
+  }
+  return average;
 }
 
 void spectrum_pieces::work(const std::stop_token &stopped) {
@@ -94,11 +102,7 @@ void spectrum_pieces::work(const std::stop_token &stopped) {
       result made;
       try {
         if (!reader) reader.emplace(source_, samples_at_once(settings_));
-        lumra::spectrum_settings settings = settings_;
-        settings.start = pieces_[k].start;
-        settings.origin = pieces_[k].origin;
-        made.average.emplace(settings, !source_.format.is_complex);
-        reader->add(pieces_[k].first, pieces_[k].samples, *made.average);
+        made.average = average_of(pieces_[k], *reader);
       } catch (...) {
         made.failure = std::current_exception();
       }

@@ -44,8 +44,9 @@ class spectrum_pieces {
 
  private:
   struct piece {
-    std::uint64_t first, samples;  // in the recording
-    std::uint64_t start, origin;   // in the stream of all samples that were chosen
+    std::size_t stretch;          // that it begins in; it may have samples of several
+    std::uint64_t start, origin;  // of it and of that stretch, in the stream of all samples that were chosen
+    std::uint64_t samples;
   };
   struct result {
     std::optional<spectrum_accumulator> average;
@@ -53,9 +54,12 @@ class spectrum_pieces {
     [[nodiscard]] bool is_there() const noexcept { return average || failure; }
   };
 
+  template <class Reader>
+  spectrum_accumulator average_of(const piece &of, Reader &reader) const;
   void work(const std::stop_token &stopped);
 
   const recording::source &source_;
+  std::vector<recording::stretch> stretches_;
   lumra::spectrum_settings settings_;
   std::vector<piece> pieces_;
   std::vector<result> results_;  // that of piece k at k modulo their number
