@@ -3,7 +3,6 @@
 
 #include <complex>
 #include <cstddef>
-#include <type_traits>
 
 #include "qsrfhs/util/aligned_buffer.hpp"
 #include "qsrfhs/vector/kernels/kernels.hpp"
@@ -43,7 +42,7 @@ class radix_pass {
 /// loses to the second-level cache, and rows are whole groups, those of real samples up to half the rate, too.
 template <class Sample>
 [[nodiscard]] constexpr bool is_split(std::size_t points) noexcept {
-  constexpr std::size_t least = std::is_same_v<Sample, std::complex<double>> ? 2048 : 8192;
+  constexpr std::size_t least = sizeof(real_of<Sample>) == sizeof(double) ? 2048 : 4096;
   return points >= least && points % (radix_pass<real_of<Sample>>::multiple * (is_complex<Sample> ? 1 : 2)) == 0;
 }
 

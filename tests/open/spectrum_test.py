@@ -1,7 +1,10 @@
 # SPDX-License-Identifier: MIT
 """Averaged spectra: SciPy's values, and the same bits however a stream is cut, merged, saved and threaded."""
 import ctypes
+import multiprocessing
+import os
 import unittest
+from unittest import mock
 
 import numpy as np
 import open as lumra
@@ -175,6 +178,33 @@ class Bits(lumra.Test):
             all_of_it = make(points=1000, overlap=0.5)
             add(all_of_it, x)
             self.assertEqual(read(all_of_it)[1].tobytes(), read(front)[1].tobytes(), cut)
+
+
+def average(kind, points, x):
+    spectrum = make(kind, points=points, hold=1)
+    add(spectrum, x)
+    return spectrum
+
+
+def saved(kind, points, x):
+    return save(average(kind, points, x))
+
+
+class Builds(lumra.Test):
+    """Kernels for different processors keep powers in orders of their own, states do not."""
+
+    def test_a_state_goes_on_with_the_kernels_of_another_processor(self):
+        works = [(kind, points, noise(9 * points + 5, kind)) for kind in TYPES for points in (1024, 4096)]
+        for kernels in ("baseline", "avx512"):
+            with mock.patch.dict(os.environ, LUMRA_KERNELS=kernels):
+                with multiprocessing.get_context("spawn").Pool(1) as other:
+                    states = other.starmap(saved, [(kind, points, x[: 3 * points + 1]) for kind, points, x in works])
+            for (kind, points, x), state in zip(works, states):
+                spectrum = load(state)
+                add(spectrum, x[3 * points + 1 :])
+                alone = average(kind, points, x)
+                for expected, actual in zip(read(alone, hold=True)[1:], read(spectrum, hold=True)[1:]):
+                    self.close(expected, actual, TYPES[kind][1], (kernels, kind, points))
 
 
 class Refusals(lumra.Test):
