@@ -103,11 +103,13 @@ template <class Real>
 void scale_logarithms(std::span<Real> x, Real a, Real b) noexcept {
   constexpr MKL_INT64 mode = VML_LA | VML_FTZDAZ_OFF | VML_ERRMODE_IGNORE;
   const auto n = static_cast<MKL_INT>(x.size());
-  if constexpr (std::is_same_v<Real, float>)
+  if constexpr (std::is_same_v<Real, float>) {
     vmsLog2(n, x.data(), x.data(), mode);
-  else
+    exact().scale_and_shift(x.data(), a, b, x.size());
+  } else {
     vmdLog2(n, x.data(), x.data(), mode);
-  for (Real &v : x) v = a * v + b;
+    for (Real &v : x) v = a * v + b;
+  }
 }
 
 /// Runs work(piece of the input, piece of the output) and the logarithms of what it wrote, in pieces that stay in the

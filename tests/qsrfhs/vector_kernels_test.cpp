@@ -217,6 +217,12 @@ void add_transform_loops(std::vector<operation> &all, products how) {
                    t.scale(out, 0.3F, n);
                  },
                  [](auto x, auto, auto out) { *out = *x * 0.3F; }});
+  all.push_back({"scale_and_shift", 1, 0, 1,
+                 [](auto &t, auto x, auto, auto out, auto n) {
+                   std::copy_n(x, n, out);
+                   t.scale_and_shift(out, 0.3F, 7, n);
+                 },
+                 [](auto x, auto, auto out) { *out = *x * 0.3F + 7; }});
   all.push_back({"multiply", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.multiply(x, y, out, n); },
                  [how](auto x, auto y, auto out) {
                    out[0] = multiply_add(how, x[0], y[0], -(x[1] * y[1]));

@@ -40,6 +40,7 @@ static constexpr kernel_table table = {
     .scaled_power = &scaled_power,
     .multiply = &multiply,
     .scale = &scale,
+    .scale_and_shift = &scale_and_shift,
     .divide = &divide,
     .divide_by_value = &divide_by_value,
     .magnitude = &magnitude,

@@ -133,6 +133,8 @@ struct kernel_table {
   void (*multiply)(const float *a, const float *b, float *out, std::size_t n);
   /// x[k] *= factor, n real.
   void (*scale)(float *x, float factor, std::size_t n);
+  /// x[k] = x[k] * factor + offset, n real.
+  void (*scale_and_shift)(float *x, float factor, float offset, std::size_t n);
 
   /// out[k] = x[k] / y[k], n complex.
   void (*divide)(const float *x, const float *y, float *out, std::size_t n);

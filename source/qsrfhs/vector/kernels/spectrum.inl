@@ -25,6 +25,15 @@ struct scale_step {
   }
 };
 
+struct scale_and_shift_step {
+  static constexpr std::size_t groups = 1, x_width = 1, y_width = 0, out_width = 1;
+  wide factor, offset;
+  template <class Put, std::size_t>
+  inline void run(const float *x, const float *, float *out) const {
+    Put::put(out, wide::load(x) * factor + offset);
+  }
+};
+
 template <class Lanes>
 static inline void window_group(const float *x, const float *w, float *out) {
   store(out, Lanes::load(x) * Lanes::load_twice(w));
@@ -149,4 +158,8 @@ static void add(const float *x, float *sum, std::size_t n) {
 
 static void scale(float *x, float factor, std::size_t n) {
   go_over<into_caches>(scale_step{wide::broadcast(factor)}, x, x, x, n);
+}
+
+static void scale_and_shift(float *x, float factor, float offset, std::size_t n) {
+  run(scale_and_shift_step{wide::broadcast(factor), wide::broadcast(offset)}, x, x, x, n);
 }
