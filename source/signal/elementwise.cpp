@@ -37,10 +37,12 @@ void divide_one(const Real *a, Real br, Real bi, Real r, Real *out) noexcept {
   out[1] = (ai * br - ar * bi) * r;
 }
 
+// Loops over complex outputs are told `of` how many elements theirs are a part.
+
 template <class T>
-void divide_each(std::span<const T> x, std::span<const T> y, std::span<T> out) noexcept {
+void divide_each(std::span<const T> x, std::span<const T> y, std::span<T> out, std::size_t of) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    exact().divide(parts(x), parts(y), parts(out), out.size());
+    exact().divide(parts(x), parts(y), parts(out), {out.size(), of});
   } else if constexpr (is_complex<T>) {
     const auto *const a = parts(x), *const b = parts(y);
     auto *const q = parts(out);
@@ -54,9 +56,9 @@ void divide_each(std::span<const T> x, std::span<const T> y, std::span<T> out) n
 }
 
 template <class T>
-void divide_by_value_each(std::span<const T> x, T value, std::span<T> out) noexcept {
+void divide_by_value_each(std::span<const T> x, T value, std::span<T> out, std::size_t of) noexcept {
   if constexpr (std::is_same_v<T, cf32>) {
-    exact().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), out.size());
+    exact().divide_by_value(parts(x), parts(std::span<const T>(&value, 1)), parts(out), {out.size(), of});
   } else if constexpr (is_complex<T>) {
     const real_of<T> br = value.real(), bi = value.imag(), r = 1 / (br * br + bi * bi);
     for (std::size_t i = 0; i < 2 * out.size(); i += 2) divide_one(parts(x) + i, br, bi, r, parts(out) + i);
@@ -176,11 +178,11 @@ void polynomial_of_block(const T *x, std::span<const C> c, C *out, std::size_t n
 }
 
 template <class T, class C>
-void polynomial_each(std::span<const T> x, std::span<const C> c, std::span<C> out) noexcept {
+void polynomial_each(std::span<const T> x, std::span<const C> c, std::span<C> out, std::size_t of) noexcept {
   if constexpr (std::is_same_v<C, float>) {
     fused().polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
   } else if constexpr (std::is_same_v<T, float>) {
-    fused().complex_polynomial(parts(x), parts(c), c.size(), parts(out), out.size());
+    fused().complex_polynomial(parts(x), parts(c), c.size(), parts(out), {out.size(), of});
   } else {
     for (std::size_t i = 0; i < out.size(); i += polynomial_block)
       polynomial_of_block(x.data() + i, c, out.data() + i, std::min(polynomial_block, out.size() - i));
@@ -207,12 +209,12 @@ gain_place<Real> place_of(Real t, std::size_t m) noexcept {
 
 template <class Real>
 void look_up_each(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
-                  std::span<std::complex<Real>> out) noexcept {
+                  std::span<std::complex<Real>> out, std::size_t of) noexcept {
   if constexpr (std::is_same_v<Real, float>) {
     const cf32 alone[] = {table.gains.front(), table.gains.front()};
     const auto gains = table.gains.size() > 1 ? table.gains : std::span<const cf32>(alone);
     exact().lookup_between({parts(gains), static_cast<int>(table.gains.size()), table.start, table.step}, keys.data(),
-                           parts(x), parts(out), out.size());
+                           parts(x), parts(out), {out.size(), of});
   } else {
     const Real inverse_step = 1 / table.step;
     const Real *const in = parts(x), *const gains = parts(table.gains);
@@ -241,12 +243,13 @@ constexpr double logarithm_cost = std::is_same_v<Real, float> ? 0.4 : 1.2;
 
 template <class T>
 void divide(std::span<const T> x, std::span<const T> y, std::span<T> out, std::size_t threads) noexcept {
-  share(threads, no_more, divide_each<T>, x, y, out);
+  const auto loop = [n = out.size()](auto in, auto by, auto quotients) { divide_each<T>(in, by, quotients, n); };
+  share(threads, no_more, loop, x, y, out);
 }
 
 template <class T>
 void divide_by_value(std::span<const T> x, T value, std::span<T> out, std::size_t threads) noexcept {
-  const auto loop = [=](auto in, auto quotients) { divide_by_value_each<T>(in, value, quotients); };
+  const auto loop = [=, n = out.size()](auto in, auto quotients) { divide_by_value_each<T>(in, value, quotients, n); };
   share(threads, no_more, loop, x, out);
 }
 
@@ -283,7 +286,7 @@ template <class T, class C>
 void polynomial(std::span<const T> x, std::span<const C> c, std::span<C> out, std::size_t threads) noexcept {
   constexpr bool by_kernel = std::is_same_v<T, float>;
   constexpr double cost_of_coefficient = by_kernel ? 0.012 : is_complex<T> ? 0.48 : 0.18;
-  const auto loop = [=](auto in, auto values) { polynomial_each<T, C>(in, c, values); };
+  const auto loop = [=, n = out.size()](auto in, auto values) { polynomial_each<T, C>(in, c, values, n); };
   share(threads, cost_of_coefficient * static_cast<double>(c.size()), loop, x, out);
 }
 
@@ -291,7 +294,7 @@ template <class Real>
 void look_up(std::span<const std::complex<Real>> x, std::span<const Real> keys, const gain_table<Real> &table,
              std::span<std::complex<Real>> out, std::size_t threads) noexcept {
   constexpr double cost = std::is_same_v<Real, float> ? 0.7 : 3;
-  const auto loop = [&](auto in, auto at, auto products) { look_up_each<Real>(in, at, table, products); };
+  const auto loop = [&](auto in, auto at, auto products) { look_up_each<Real>(in, at, table, products, out.size()); };
   share(threads, cost, loop, x, keys, out);
 }
 

@@ -293,14 +293,22 @@ void add_transform_loops(std::vector<operation> &all, products how) {
                  }});
 }
 
+/// Elements of which those that are tested are a part: outputs go past the caches, but for those that are inputs.
+constexpr std::size_t many = std::size_t{1} << 30;
+
 std::vector<operation> operations(products how) {
   std::vector<operation> all;
-  all.push_back(
-      {"divide", 2, 2, 2, [](auto &t, auto x, auto y, auto out, auto n) { t.divide(x, y, out, n); }, define_division});
+  all.push_back({"divide", 2, 2, 2,
+                 [](auto &t, auto x, auto y, auto out, auto n) {
+                   t.divide(x, y, out, {n, many});
+                 },
+                 define_division});
   for (const auto *v :
        {at_a_page({0, 1}), at_a_page({3, -4}), at_a_page({0, 0}), at_a_page({1e30F, 1}), at_a_page({nan, 1})})
     all.push_back({"divide_by_value", 2, 0, 2,
-                   [v](auto &t, auto x, auto, auto out, auto n) { t.divide_by_value(x, v, out, n); },
+                   [v](auto &t, auto x, auto, auto out, auto n) {
+                     t.divide_by_value(x, v, out, {n, many});
+                   },
                    [v](auto x, auto, auto out) { define_division(x, v, out); }});
   all.push_back({"magnitude", 2, 0, 1, [](auto &t, auto x, auto, auto out, auto n) { t.magnitude(x, out, n); },
                  [](auto x, auto, auto out) { *out = std::sqrt(define_power(x)); }});
@@ -333,13 +341,14 @@ std::vector<operation> operations(products how) {
     all.push_back({"polynomial", 1, 0, 1,
                    [m, p = at_a_page(real)](auto &t, auto x, auto, auto out, auto n) { t.polynomial(x, p, m, out, n); },
                    [how, real](auto x, auto, auto out) { *out = define_polynomial(how, real, 0, 1, *x); }});
-    all.push_back(
-        {"complex_polynomial", 1, 0, 2,
-         [m, p = at_a_page(c)](auto &t, auto x, auto, auto out, auto n) { t.complex_polynomial(x, p, m, out, n); },
-         [how, c](auto x, auto, auto out) {
-           out[0] = define_polynomial(how, c, 0, 2, *x);
-           out[1] = define_polynomial(how, c, 1, 2, *x);
-         }});
+    all.push_back({"complex_polynomial", 1, 0, 2,
+                   [m, p = at_a_page(c)](auto &t, auto x, auto, auto out, auto n) {
+                     t.complex_polynomial(x, p, m, out, {n, many});
+                   },
+                   [how, c](auto x, auto, auto out) {
+                     out[0] = define_polynomial(how, c, 0, 2, *x);
+                     out[1] = define_polynomial(how, c, 1, 2, *x);
+                   }});
   }
   // Keys reach below, into and beyond the tables; an infinite and a negative zero value must come out as they are.
   static const std::vector<float> entries{-0.0F, 1,  2, 3,     0.5F, -1, inf, nan, 2, -0.0F,
@@ -351,11 +360,14 @@ std::vector<operation> operations(products how) {
                                               {nullptr, 4, 0, tiny},
                                               {nullptr, 1, 0, 1}}) {
     table.entries = at_a_page({entries.begin(), entries.begin() + 4 * table.count});
-    all.push_back({"lookup", 1, 2, 2, [=](auto &t, auto x, auto y, auto out, auto n) { t.lookup(table, x, y, out, n); },
+    all.push_back({"lookup", 1, 2, 2,
+                   [=](auto &t, auto x, auto y, auto out, auto n) {
+                     t.lookup(table, x, y, out, {n, many});
+                   },
                    [=](auto x, auto y, auto out) { define_lookup(table, *x, y, out); }});
     all.push_back({"lookup_between", 1, 2, 2,
                    [=, p = at_a_page(gains_of(table))](auto &t, auto x, auto y, auto out, auto n) {
-                     t.lookup_between({p, table.count, table.start, table.step}, x, y, out, n);
+                     t.lookup_between({p, table.count, table.start, table.step}, x, y, out, {n, many});
                    },
                    [=, with_slopes = at_a_page(slopes_of(table))](auto x, auto y, auto out) {
                      define_lookup({with_slopes, table.count, table.start, table.step}, *x, y, out);

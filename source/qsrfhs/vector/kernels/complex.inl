@@ -62,11 +62,11 @@ struct magnitude_squared_step {
   }
 };
 
-static void divide(const float *x, const float *y, float *out, std::size_t n) {
+static void divide(const float *x, const float *y, float *out, part_of_all n) {
   run(divide_step{}, x, y, out, n);
 }
 
-static void divide_by_value(const float *x, const float *v, float *out, std::size_t n) {
+static void divide_by_value(const float *x, const float *v, float *out, part_of_all n) {
   const wide br = wide::broadcast(v[0]), bi = wide::broadcast(v[1]);
   run(divide_by_value_step{br, bi, reciprocal_power(br, bi)}, x, x, out, n);
 }

@@ -4,8 +4,8 @@
 // The widths are in values an element; an input of width 0 is not read.
 // SPDX-License-Identifier: MIT
 
-/// Bytes in all arrays of a call from which the output is stored past the caches: its lines need not be read then
-/// before they are written.
+/// Bytes in all arrays from which the output is stored past the caches: its lines need not be read then before they
+/// are written.
 static constexpr std::size_t streaming_bytes = std::size_t{24} << 20;
 
 struct into_caches {
@@ -73,21 +73,21 @@ static inline std::size_t in_front_of_boundary(const float *x, const float *out,
 }
 
 /// Outputs past the caches pay where they are complex. Gathering whole lines for others costs more than it saves, and
-/// lines of an output that is an input are in the caches anyway.
+/// lines of an output that is an input are in the caches anyway. From element `first` on they lie on a boundary.
 template <class Step>
-static inline bool passes_caches(const float *x, const float *y, const float *out, std::size_t n) {
+static inline bool passes_caches(const float *x, const float *y, const float *out, std::size_t first, part_of_all n) {
   constexpr std::size_t bytes = sizeof(float) * (Step::x_width + Step::y_width + Step::out_width);
-  return Step::out_width == 2 && n >= streaming_bytes / bytes && out != x && out != y &&
-         reinterpret_cast<std::size_t>(out) % 8 == 0;
+  return Step::out_width == 2 && n.all >= streaming_bytes / bytes && out != x && out != y &&
+         reinterpret_cast<std::size_t>(out + first * Step::out_width) % (sizeof(float) * wide::lanes) == 0;
 }
 
 /// A record, in groups that begin on a boundary, so that fewer loads and stores are split between two lines of the
 /// caches: most allocators place all arrays alike, 16 bytes behind one.
 template <class Step>
-static inline void run(const Step &step, const float *x, const float *y, float *out, std::size_t n) {
-  const std::size_t first = in_front_of_boundary<Step>(x, out, n);
+static inline void run(const Step &step, const float *x, const float *y, float *out, part_of_all n) {
+  const std::size_t first = in_front_of_boundary<Step>(x, out, n.count);
   if (first) go_over_few(step, x, y, out, first);
-  if (!passes_caches<Step>(x, y, out, n)) return go_over<into_caches>(step, x, y, out, n, first);
-  go_over<past_caches>(step, x, y, out, n, first);
+  if (!passes_caches<Step>(x, y, out, first, n)) return go_over<into_caches>(step, x, y, out, n.count, first);
+  go_over<past_caches>(step, x, y, out, n.count, first);
   _mm_sfence();
 }

@@ -89,6 +89,14 @@ struct radix_plan {
 };
 inline constexpr std::size_t radix = 16, radix_group = 16;
 
+/// Elements of a call, and of all calls that threads share the same arrays in: where all together leave the caches,
+/// complex outputs are stored past them.
+struct part_of_all {
+  std::size_t count, all;
+  constexpr part_of_all(std::size_t n) noexcept : count(n), all(n) {}  // a call that is alone
+  constexpr part_of_all(std::size_t n, std::size_t of) noexcept : count(n), all(of) {}
+};
+
 struct kernel_table {
   /// out[k] = x[k], n complex.
   void (*copy)(const float *x, float *out, std::size_t n);
@@ -137,9 +145,9 @@ struct kernel_table {
   void (*scale_and_shift)(float *x, float factor, float offset, std::size_t n);
 
   /// out[k] = x[k] / y[k], n complex.
-  void (*divide)(const float *x, const float *y, float *out, std::size_t n);
+  void (*divide)(const float *x, const float *y, float *out, part_of_all n);
   /// out[k] = x[k] / v, n complex by one complex.
-  void (*divide_by_value)(const float *x, const float *v, float *out, std::size_t n);
+  void (*divide_by_value)(const float *x, const float *v, float *out, part_of_all n);
   /// out[k] = |x[k]|, and |x[k]|^2, n complex to real.
   void (*magnitude)(const float *x, float *out, std::size_t n);
   void (*magnitude_squared)(const float *x, float *out, std::size_t n);
@@ -149,7 +157,7 @@ struct kernel_table {
   /// out[k] = c[0] + c[1] x[k] + ... + c[m - 1] x[k]^(m - 1), n real; m at least 1, c apart from out.
   void (*polynomial)(const float *x, const float *c, std::size_t m, float *out, std::size_t n);
   /// The same with complex c and out.
-  void (*complex_polynomial)(const float *x, const float *c, std::size_t m, float *out, std::size_t n);
+  void (*complex_polynomial)(const float *x, const float *c, std::size_t m, float *out, part_of_all n);
 
   /// out[k] = a * log2(x[k]) + b, n real; NaN for negative x.
   void (*log2_scaled)(const float *x, float a, float b, float *out, std::size_t n);
@@ -164,9 +172,9 @@ struct kernel_table {
   void (*sum_power_and_peak)(const float *x, std::size_t n, float *sum, float *peak);
 
   /// out[k] = in[k] * (gain at keys[k]), n complex.
-  void (*lookup)(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n);
+  void (*lookup)(const lookup_table &table, const float *keys, const float *in, float *out, part_of_all n);
   /// The same, where an entry is a gain alone and the slope the difference to the next; of one gain there are two alike.
-  void (*lookup_between)(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n);
+  void (*lookup_between)(const lookup_table &table, const float *keys, const float *in, float *out, part_of_all n);
 
   /// out[k] = x[k] * w[k], real parts and imaginary parts each with their own weight, n complex.
   void (*weigh)(const float *x, const float *w, float *out, std::size_t n);

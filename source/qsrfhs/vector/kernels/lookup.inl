@@ -56,7 +56,7 @@ struct lookup_step {
 
 template <class Gains>
 static inline void look_up_in(const lookup_table &table, const float *keys, const float *in, float *out,
-                              std::size_t n) {
+                              part_of_all n) {
   // An index that is no float is compared as the next float above: no index lies between the two.
   float last = static_cast<float>(table.count - 1);
   if (static_cast<double>(last) < table.count - 1) last = __builtin_bit_cast(float, __builtin_bit_cast(int, last) + 1);
@@ -65,10 +65,10 @@ static inline void look_up_in(const lookup_table &table, const float *keys, cons
       keys, in, out, n);
 }
 
-static void lookup(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n) {
+static void lookup(const lookup_table &table, const float *keys, const float *in, float *out, part_of_all n) {
   look_up_in<gains_with_slopes>(table, keys, in, out, n);
 }
 
-static void lookup_between(const lookup_table &table, const float *keys, const float *in, float *out, std::size_t n) {
+static void lookup_between(const lookup_table &table, const float *keys, const float *in, float *out, part_of_all n) {
   look_up_in<gains_alone>(table, keys, in, out, n);
 }

@@ -59,6 +59,6 @@ static void polynomial(const float *x, const float *c, std::size_t m, float *out
   run(polynomial_step{c, m}, x, x, out, n);
 }
 
-static void complex_polynomial(const float *x, const float *c, std::size_t m, float *out, std::size_t n) {
+static void complex_polynomial(const float *x, const float *c, std::size_t m, float *out, part_of_all n) {
   run(complex_polynomial_step{c, m}, x, x, out, n);
 }
