@@ -188,6 +188,48 @@ static inline void split_pairs(d8 a, d8 b, d8 &re, d8 &im) {
   re = {_mm512_permutex2var_pd(a.v, _mm512_setr_epi64(0, 2, 4, 6, 8, 10, 12, 14), b.v)};
   im = {_mm512_permutex2var_pd(a.v, _mm512_setr_epi64(1, 3, 5, 7, 9, 11, 13, 15), b.v)};
 }
+
+static constexpr bool loads_lines = true;
+
+/// Two registers' worth of values, from the three lines of the caches that they lie in. `before` values of the first line
+/// and all from there on in the third are not read.
+template <class Lanes>
+struct across_lines;
+
+template <>
+struct across_lines<f16> {
+  std::size_t before;
+  __m512i places;
+  explicit across_lines(const float *p)
+      : before(reinterpret_cast<std::size_t>(p) % 64 / sizeof(float)),
+        places(_mm512_add_epi32(_mm512_setr_epi32(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15),
+                                _mm512_set1_epi32(static_cast<int>(before)))) {}
+  inline void load(const float *p, f16 &a, f16 &b) const {
+    const auto behind = static_cast<__mmask16>(0xFFFFU << before);
+    const __m512 first = _mm512_maskz_load_ps(behind, p - before), second = _mm512_load_ps(p - before + 16);
+    const __m512 third = _mm512_maskz_load_ps(_knot_mask16(behind), p - before + 32);
+    a = {_mm512_permutex2var_ps(first, places, second)};
+    b = {_mm512_permutex2var_ps(second, places, third)};
+  }
+};
+
+template <>
+struct across_lines<d8> {
+  std::size_t before;
+  __m512i places;
+  explicit across_lines(const double *p)
+      : before(reinterpret_cast<std::size_t>(p) % 64 / sizeof(double)),
+        places(_mm512_add_epi64(_mm512_setr_epi64(0, 1, 2, 3, 4, 5, 6, 7),
+                                _mm512_set1_epi64(static_cast<long long>(before)))) {}
+  inline void load(const double *p, d8 &a, d8 &b) const {
+    const auto behind = static_cast<__mmask8>(0xFFU << before);
+    const __m512d first = _mm512_maskz_load_pd(behind, p - before), second = _mm512_load_pd(p - before + 8);
+    const __m512d third = _mm512_maskz_load_pd(_knot_mask8(behind), p - before + 16);
+    a = {_mm512_permutex2var_pd(first, places, second)};
+    b = {_mm512_permutex2var_pd(second, places, third)};
+  }
+};
+
 /// Takes split_pairs back.
 static inline void join_pairs(d8 re, d8 im, d8 &a, d8 &b) {
   a = {_mm512_permutex2var_pd(re.v, _mm512_setr_epi64(0, 8, 1, 9, 2, 10, 3, 11), im.v)};

@@ -3,3 +3,7 @@
 using wide = f8;
 using wide_mask = f8;
 using wide_double = d4;
+
+static constexpr bool loads_lines = false;
+template <class Lanes>
+struct across_lines;

@@ -51,6 +51,36 @@ static inline void store_planes(double *p, planes_of<wide_double> a) {
   store(p + wide_double::lanes, second);
 }
 
+/// Samples of a row, two registers at once, wherever they lie.
+template <class Lanes>
+struct as_they_lie {
+  template <class Real>
+  inline planes_of<Lanes> operator()(const Real *p) const {
+    return load_planes(p);
+  }
+};
+
+/// Those that do not begin on a line of the caches, where rows lie in the same few lines of the first-level cache: a line
+/// that two groups of columns share is gone before the second one comes, and split loads wait for both of theirs.
+template <class Lanes>
+struct line_by_line {
+  across_lines<Lanes> lines;
+  inline planes_of<Lanes> operator()(const float *p) const {
+    planes_of<Lanes> values;
+    Lanes a, b;
+    lines.load(p, a, b);
+    split_in_lanes(a, b, values.re, values.im);
+    return values;
+  }
+  inline planes_of<Lanes> operator()(const double *p) const {
+    planes_of<Lanes> values;
+    Lanes a, b;
+    lines.load(p, a, b);
+    split_pairs(a, b, values.re, values.im);
+    return values;
+  }
+};
+
 /// A transform of four points, from sums and differences of points 0 and 2, and of points 1 and 3.
 template <class Lanes>
 static inline void four_points(planes_of<Lanes> sum_02, planes_of<Lanes> difference_02, planes_of<Lanes> sum_13,
@@ -83,10 +113,11 @@ static inline const Real *window_of(const radix_plan<Real> &plan, std::size_t n)
 }
 
 /// Points b, b + 4, b + 8 and b + 12 of the radix, to point b of each of four transforms p.
-template <bool windowed, int b, class Lanes, class Real>
-static inline void first_four(const Real *x, std::size_t row, const Real *w, planes_of<Lanes> (*between)[4]) {
+template <bool windowed, int b, class Lanes, class Load, class Real>
+static inline void first_four(const Load &load, const Real *x, std::size_t row, const Real *w,
+                              planes_of<Lanes> (*between)[4]) {
   const auto weighted = [&](std::size_t r) {
-    const planes_of<Lanes> a = load_planes(x + 2 * r * row);
+    const planes_of<Lanes> a = load(x + 2 * r * row);
     if constexpr (!windowed) return a;
     const Lanes weight = Lanes::load(w + r * radix_group);
     return planes_of<Lanes>{a.re * weight, a.im * weight};
@@ -138,21 +169,30 @@ static inline void second_four(const planes_of<Lanes> *x, const radix_columns<Re
   for (std::size_t q = 1; q < 4; ++q) columns.put(p + 4 * q, y[q]);
 }
 
-template <bool windowed, class Lanes, class Real>
-static inline void complex_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
+template <bool windowed, class Lanes, class Load, class Real>
+static inline void complex_radix_by(const Load load, const Real *x, const radix_plan<Real> &plan, Real *out) {
   for (std::size_t n = 0; n < plan.row; n += Lanes::lanes) {
     const Real *const w = windowed ? window_of(plan, n) : nullptr;
     planes_of<Lanes> between[4][4];
-    first_four<windowed, 0>(x + 2 * n, plan.row, w, between);
-    first_four<windowed, 1>(x + 2 * n, plan.row, w, between);
-    first_four<windowed, 2>(x + 2 * n, plan.row, w, between);
-    first_four<windowed, 3>(x + 2 * n, plan.row, w, between);
+    first_four<windowed, 0>(load, x + 2 * n, plan.row, w, between);
+    first_four<windowed, 1>(load, x + 2 * n, plan.row, w, between);
+    first_four<windowed, 2>(load, x + 2 * n, plan.row, w, between);
+    first_four<windowed, 3>(load, x + 2 * n, plan.row, w, between);
     const radix_columns<Real> columns(plan, n, out);
     second_four<0>(between[0], columns);
     second_four<1>(between[1], columns);
     second_four<2>(between[2], columns);
     second_four<3>(between[3], columns);
   }
+}
+
+template <bool windowed, class Lanes, class Real>
+static inline void complex_radix(const Real *x, const radix_plan<Real> &plan, Real *out) {
+  constexpr std::size_t line = 64, way = 4096;  // bytes
+  if constexpr (loads_lines)
+    if (reinterpret_cast<std::size_t>(x) % line != 0 && 2 * plan.row * sizeof(Real) % way == 0)
+      return complex_radix_by<windowed, Lanes>(line_by_line<Lanes>{across_lines<Lanes>(x)}, x, plan, out);
+  complex_radix_by<windowed, Lanes>(as_they_lie<Lanes>{}, x, plan, out);
 }
 
 /// The same of real samples: p = 3 has the conjugates of what p = 1 has.
