@@ -7,13 +7,13 @@
  * filtered part by part. The results are those of scipy.signal's lfilter and sosfilt within rounding, and the same bits
  * however the stream is cut.
  *
- * Two methods: in order, sample by sample; and in blocks of eight samples from the outputs in front of them, several
- * times as fast. LUMRA_IIR_AUTO takes blocks where a trial in lumra_iir_create shows them to be about as exact: on 2048
+ * Two methods: in order, sample by sample; and in blocks of eight samples from a state in front of them, several times
+ * as fast. LUMRA_IIR_AUTO takes blocks where a trial in lumra_iir_create shows them to be about as exact: on 2048
  * samples of noise their root-mean-square error against extended precision must be below four times that of the filter
- * in order, or below 2^-30 (single precision) or 2^-52 (double) of the output. Narrow filters in direct form from about
- * the fifth order on, and filters that are not stable, so stay in order; sections nearly always go in blocks. Outputs
- * below 1e-290 count as 0 for those that follow. A sample that is not finite spoils its own output and those that
- * follow, none in front of it; lumra_iir_reset makes the filter usable again. */
+ * in order, or below 2^-30 (single precision) or 2^-52 (double) of the output. Nearly all filters of up to 16
+ * coefficients behind a[0] so go in blocks, narrow ones included; filters whose outputs grow beyond all numbers in the
+ * trial do not. What is left of a sound below 1e-290 counts as 0 for what follows. A sample that is not finite spoils
+ * its own output and those that follow, none in front of it; lumra_iir_reset makes the filter usable again. */
 #ifndef LUMRA_FILTER_RECURSIVE_H
 #define LUMRA_FILTER_RECURSIVE_H
 
@@ -33,7 +33,8 @@ enum lumra_iir_method { LUMRA_IIR_AUTO = 0, LUMRA_IIR_IN_ORDER = 1, LUMRA_IIR_BL
 typedef struct lumra_iir_options {
   uint32_t size;  /* of this record in bytes */
   int32_t type;   /* of the samples: one of enum lumra_type_code */
-  int32_t method; /* one of enum lumra_iir_method; blocks need 16 or fewer coefficients behind a[0] in each stage */
+  int32_t method; /* one of enum lumra_iir_method; blocks need 16 or fewer coefficients behind a[0] in each stage;
+                     where outputs leave all numbers within 64 samples, they go in order after all */
 } lumra_iir_options;
 
 #define LUMRA_IIR_OPTIONS \

@@ -27,7 +27,7 @@ struct iir {
 
 using iirs = handles<lumra_iir, iir>;
 
-constexpr state_kind saved_iir{"iir", 1};
+constexpr state_kind saved_iir{"iir", 2};
 constexpr std::uint64_t most_coefficients = 65536, most_sections = 4096;
 
 void require_finite(const std::vector<double> &values, std::string_view name, std::string_view what) {
@@ -71,21 +71,8 @@ std::unique_ptr<iir> make(std::vector<dsp::recursion_coefficients> stages, std::
       new iir{type, dsp::recursive_filter(std::move(stages), is_complex(type) ? 2 : 1, chosen)});
 }
 
-/// Interleaves or separates the values of complex states, which the filter keeps stage by stage and part by part.
-template <class Move>
-void walk_state(const dsp::recursive_filter &filter, Move move) {
-  std::size_t kept = 0, given = 0;
-  for (const dsp::recursion_coefficients &stage : filter.stages()) {
-    const std::size_t order = stage.order(), streams = filter.streams();
-    for (std::size_t s = 0; s < streams; ++s)
-      for (std::size_t j = 0; j < order; ++j) move(kept + s * order + j, given + j * streams + s);
-    kept += streams * order;
-    given += streams * order;
-  }
-}
-
 void require_count(const dsp::recursive_filter &filter, std::uint64_t count) {
-  const std::uint64_t order = filter.state_count() / filter.streams();
+  const std::uint64_t order = filter.state_count() / filter.parts();
   require(count == order, LUMRA_OUT_OF_RANGE, "count is ", count, "; the state has ", order, " values");
 }
 
@@ -211,9 +198,7 @@ lumra_status lumra_iir_get_state(const lumra_iir *filter, void *state, uint64_t 
     const dsp::recursive_filter &kept = iirs::get(filter, "filter").filter;
     require_count(kept, count);
     const auto values = array(static_cast<double *>(state), kept.state_count(), "state");
-    std::vector<double> parts(values.size());
-    kept.read_state(parts);
-    walk_state(kept, [&](std::size_t inside, std::size_t outside) { values[outside] = parts[inside]; });
+    kept.read_state(values);
   });
 }
 
@@ -222,9 +207,7 @@ lumra_status lumra_iir_set_state(lumra_iir *filter, const void *state, uint64_t 
     dsp::recursive_filter &kept = iirs::get(filter, "filter").filter;
     require_count(kept, count);
     const auto values = array(static_cast<const double *>(state), kept.state_count(), "state");
-    std::vector<double> parts(values.size());
-    walk_state(kept, [&](std::size_t inside, std::size_t outside) { parts[inside] = values[outside]; });
-    kept.set_state(parts);
+    kept.set_state(values);
   });
 }
 
@@ -232,7 +215,7 @@ lumra_status lumra_iir_order(const lumra_iir *filter, uint64_t *order) {
   return enter(__func__, [&] {
     const dsp::recursive_filter &kept = iirs::get(filter, "filter").filter;
     require_present(order, "order");
-    *order = kept.state_count() / kept.streams();
+    *order = kept.state_count() / kept.parts();
   });
 }
 

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <algorithm>
-#include <array>
 #include <complex>
 #include <cstddef>
 #include <cstdint>
@@ -10,6 +9,7 @@
 #include <vector>
 
 #include "qsrfhs/util/aligned_buffer.hpp"
+#include "qsrfhs/vector/kernels/kernels.hpp"
 #include "signal/sample_type.hpp"
 
 namespace dsp {
@@ -28,37 +28,38 @@ recursion_coefficients normalised(std::span<const double> b, std::span<const dou
 
 enum class recursion_method {
   in_order,  // sample by sample
-  blocks,    // eight samples at a time, from the outputs in front of them
+  blocks,    // eight samples at a time, from a state in front of them
 };
 
-/// Stages behind each other in double precision, over a stream of real samples, or two: real and imaginary parts.
+/// Stages behind each other in double precision, over a stream of real or complex samples.
 ///
 /// Blocks start at every eighth sample from the start of the stream, from the last reset or from where a state was set,
-/// and every output is the same sum of the same products wherever the stream is cut. Outputs below 1e-290 are taken as
-/// 0 by what comes after them.
+/// and every output is the same sum of the same products wherever the stream is cut. Outputs below 1e-290, and in
+/// blocks states that leave no larger ones, are taken as 0 by what comes after them.
 class recursive_filter {
  public:
-  static constexpr std::size_t block = 8, most_block_order = 16;
+  static constexpr std::size_t block = 8, most_block_order = qsrfhs::kernels::block_recursion::most_order;
 
-  /// `streams` is 1 or 2. Blocks need stages of at most most_block_order.
-  recursive_filter(std::vector<recursion_coefficients> stages, std::size_t streams, recursion_method method);
+  /// A sample has `parts`: one value, or a real and an imaginary part. Blocks need recursions of at most
+  /// most_block_order. One that grows too fast for them, to more than a double holds within 64 samples, stays in order.
+  recursive_filter(std::vector<recursion_coefficients> stages, std::size_t parts, recursion_method method);
 
   /// The method that pays: blocks, where a trial shows them to be about as exact as the recursion in order.
   ///
   /// The trial is noise of 2048 samples. Blocks are taken where their error against extended precision is, as a root
   /// mean square, below four times that of the recursion in order, or below 2^-30 (single precision) or 2^-52 (double)
-  /// of the output. A narrow filter of high order in direct form loses more digits in blocks, and stays in order.
+  /// of the output; not where the outputs leave all numbers meanwhile.
   static recursion_method choose(const std::vector<recursion_coefficients> &stages, precision of_samples);
 
-  /// Filters n samples of type float, double or complex of them; out may be in.
+  /// Filters n samples of as many parts, float or double; out may be in.
   template <class Sample>
   void run(const Sample *in, Sample *out, std::uint64_t n) noexcept;
 
   void reset() noexcept;
 
   /// What the samples so far add to the next `order` outputs, before those recur: the state of the transposed direct
-  /// form II. Stage after stage, of each stream in turn.
-  [[nodiscard]] std::size_t state_count() const noexcept { return streams_ * total_order_; }
+  /// form II, stage after stage.
+  [[nodiscard]] std::size_t state_count() const noexcept { return parts_ * total_order_; }
   void read_state(std::span<double> out) const;
   void set_state(std::span<const double> state) noexcept;
 
@@ -67,34 +68,34 @@ class recursive_filter {
   [[nodiscard]] std::span<const double> memory() const noexcept { return memory_.elements(); }
   struct place {
     std::uint32_t in_block = 0;  // samples of a block that has begun
-    std::uint32_t preset = 0;    // outputs from which on a state that was set adds nothing more
+    std::uint32_t preset = 0;    // outputs since a state was set, up to where it adds nothing more
   };
   [[nodiscard]] const place &at() const noexcept { return at_; }
   /// False for a place that no stream of this filter can be at.
   [[nodiscard]] bool restore(const place &at) noexcept;
 
   [[nodiscard]] recursion_method method() const noexcept { return method_; }
-  [[nodiscard]] std::size_t streams() const noexcept { return streams_; }
+  [[nodiscard]] std::size_t parts() const noexcept { return parts_; }
   [[nodiscard]] const std::vector<recursion_coefficients> &stages() const noexcept { return stages_; }
 
  private:
   struct stage_view;
-  using planes = std::array<double *, 2>;
 
   template <class Visit>
   void for_each_stage(Visit visit) const;
-  void run_chunk(planes &in, planes &out, std::size_t n) noexcept;
-  [[nodiscard]] std::size_t plane_size() const noexcept;
-  void run_stage(const stage_view &stage, const planes &in, const planes &out, std::size_t n) noexcept;
-  void add_preset(const stage_view &stage, const planes &data, std::size_t n) const noexcept;
+  void sum_samples(const stage_view &stage, double *in, double *out, std::size_t n) noexcept;
+  void recur_in_order(const stage_view &stage, double *data, std::size_t n) noexcept;
+  void recur_by_blocks(const stage_view &stage, double *data, std::size_t n) noexcept;
+  double *run_chunk(double *data, double *other, std::size_t n) noexcept;
+  [[nodiscard]] std::size_t room_in_front() const noexcept;
 
   std::vector<recursion_coefficients> stages_;
-  std::size_t streams_, total_order_ = 0, most_order_ = 0;
+  std::size_t parts_, total_order_ = 0, most_order_ = 0;
   recursion_method method_;
   place at_;
-  qsrfhs::aligned_buffer<double> plans_;   // coefficients of the block recursions, stage after stage
-  qsrfhs::aligned_buffer<double> memory_;  // of each stage and stream in turn: see stage_view
-  qsrfhs::aligned_buffer<double> room_;    // a chunk of samples and one of outputs, histories in front of them
+  qsrfhs::aligned_buffer<double> plans_;   // tables of the block recursions, stage after stage
+  qsrfhs::aligned_buffer<double> memory_;  // stage after stage: see stage_view
+  qsrfhs::aligned_buffer<double> room_;    // a chunk of samples and one of sums, histories in front of them
 };
 
 }  // namespace dsp

@@ -166,40 +166,4 @@ TEST(PolyphaseKernels, TapsThatArePolynomials) {
   expect_cubic_sums(&kernel_table::interpolate_double, 1e-13);
 }
 
-// Two streams of 5 blocks through a stable recursion of each order, beside the same sums in long double.
-TEST(PolyphaseKernels, RecursionsByBlocks) {
-  constexpr std::size_t blocks = 5, width = 8;
-  for (std::size_t order = 1; order <= 6; ++order) {
-    const auto responses = tests::noise_of<double>(8 * order, 3);
-    auto shares = tests::noise_of<double>(64, 4);
-    for (std::size_t i = 0; i < 8; ++i) std::fill_n(&shares[8 * i], i, 0.0);
-    std::vector<double> scaled(responses);
-    for (double &r : scaled) r /= static_cast<double>(order);
-    const block_recursion plan{order, scaled.data(), shares.data()};
-    const auto outputs = [&](const kernel_table &table) {
-      std::vector<double> first = tests::noise_of<double>(width + 8 * blocks, 5), second = first;
-      second[width] = 3;
-      double *const streams[] = {first.data() + width, second.data() + width};
-      table.recursion(plan, blocks, streams, 2);
-      first.insert(first.end(), second.begin(), second.end());
-      return first;
-    };
-    const auto got = outputs(baseline_kernels);
-    for (const build &b : builds()) EXPECT_EQ(got, outputs(*b.exact)) << b.name;
-    auto expected = tests::noise_of<double>(width + 8 * blocks, 5);
-    for (std::size_t at = width; at < expected.size(); at += 8) {
-      long double sums[8] = {};
-      for (std::size_t l = 0; l < 8; ++l) {
-        for (std::size_t i = 0; i <= l; ++i)
-          sums[l] += static_cast<long double>(expected[at + i]) * static_cast<long double>(shares[8 * i + l]);
-        for (std::size_t j = 0; j < order; ++j)
-          sums[l] += static_cast<long double>(expected[at - 1 - j]) * static_cast<long double>(scaled[8 * j + l]);
-      }
-      for (std::size_t l = 0; l < 8; ++l) expected[at + l] = static_cast<double>(sums[l]);
-    }
-    for (std::size_t k = 0; k < expected.size(); ++k)
-      EXPECT_NEAR(expected[k], got[k], 1e-13 * std::max(1.0, std::abs(expected[k]))) << order << ' ' << k;
-  }
-}
-
 }  // namespace

@@ -4,11 +4,11 @@
 #include "element_wise.inl"
 //
 #include "complex.inl"
+#include "doubles.inl"
 #include "fir.inl"
 #include "interpolation.inl"
 #include "log2.inl"
 #include "lookup.inl"
-#include "planes.inl"
 #include "polynomial.inl"
 #include "polyphase.inl"
 #include "recursion.inl"
@@ -69,12 +69,9 @@ static constexpr kernel_table table = {
     .interpolate = &interpolate,
     .interpolate_double = &interpolate_double,
     .recursion = &recursion,
+    .complex_recursion = &complex_recursion,
     .widen = &widen,
     .narrow = &narrow,
-    .split = &split,
-    .split_double = &split_double,
-    .join_planes = &join_planes,
-    .join_planes_double = &join_planes_double,
     .is_finite = &is_finite,
     .weigh_double = &weigh_double,
     .cosine_window = &cosine_window,

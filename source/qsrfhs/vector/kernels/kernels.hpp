@@ -64,12 +64,21 @@ struct cubic_taps {
 /// Where tap k of eight stands for complex samples, so that taps can be doubled within the halves of a register.
 constexpr int complex_tap_order[8] = {0, 1, 4, 5, 2, 3, 6, 7};
 
-/// A recursion of outputs that goes on by blocks of eight samples: each output is a sum over the outputs in front of
-/// the block and the block's samples up to its own.
+/// A linear recursion that goes on by blocks of eight samples: outputs are sums over the values of a state in front of
+/// the block and over the block's samples up to their own, and so is the state behind the block over all of them. For
+/// complex samples each value of the tables stands twice, in a row.
 struct block_recursion {
-  std::size_t order;
-  const double *responses;  // order x 8: what the outputs before, newest first, leave in the block's outputs
-  const double *shares;     // 8 x 8: what each sample adds to the outputs, 0 to those in front of it
+  static constexpr std::size_t most_order = 16;
+  std::size_t order;         // values of the state, 1 to most_order
+  const double *shares;      // 8 x 8: what each sample adds to the outputs, 0 to those in front of it
+  const double *responses;   // order, made even, x 8: what each value of the state adds to them
+  const double *gathering;   // 8 x width_of(order): what each sample leaves in the state behind the block
+  const double *transition;  // order, made even, x width_of(order): what each value of the state leaves there
+  /// Values of a state in memory, the last ones 0; complex ones are two `parts` each.
+  [[nodiscard]] static constexpr std::size_t width_of(std::size_t order, std::size_t parts) noexcept {
+    const std::size_t room = order <= 4 ? 4 : (order + 7) / 8 * 8;
+    return room * parts < 8 ? 8 : room * parts;
+  }
 };
 
 /// Angles of a table, all turned by one.
@@ -218,18 +227,16 @@ struct kernel_table {
   void (*interpolate_double)(const sample_place<double> *places, std::size_t outputs, const cubic_taps<double> &taps,
                              std::size_t width, const double *x, double *out);
 
-  /// Turns samples into outputs, in place, in whole blocks of `count` streams, 1 or 2. In front of each stream stand as
-  /// many outputs as the order, rounded up to a multiple of 4. Samples are finite: where one is not, the outputs of its
-  /// block in front of it become NaN, too.
-  void (*recursion)(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count);
+  /// Turns n samples into outputs, in place. Zeros stand behind them, up to a whole block. The state goes on to the end
+  /// of the last whole block. Samples are finite: where one is not, the outputs of its block in front of it become NaN,
+  /// too. Outputs are the same bits wherever a stream is cut between blocks.
+  void (*recursion)(const block_recursion &plan, std::size_t n, double *data, double *state);
+  /// The same with complex samples and state.
+  void (*complex_recursion)(const block_recursion &plan, std::size_t n, double *data, double *state);
 
-  // Between samples and planes of doubles, which are apart from them; n real for the first two, n complex.
+  /// Floats to doubles that are apart from them, and back, n real.
   void (*widen)(const float *x, double *out, std::size_t n);
   void (*narrow)(const double *x, float *out, std::size_t n);
-  void (*split)(const float *x, double *re, double *im, std::size_t n);
-  void (*split_double)(const double *x, double *re, double *im, std::size_t n);
-  void (*join_planes)(const double *re, const double *im, float *out, std::size_t n);
-  void (*join_planes_double)(const double *re, const double *im, double *out, std::size_t n);
   /// Whether none of n real is an infinity or a NaN.
   bool (*is_finite)(const double *x, std::size_t n);
 

@@ -218,6 +218,10 @@ struct d4 {
   static inline d4 load(const float *p) { return {_mm256_cvtps_pd(_mm_loadu_ps(p))}; }
   static inline d4 load(const double *p) { return {_mm256_loadu_pd(p)}; }
   static inline d4 broadcast(double a) { return {_mm256_set1_pd(a)}; }
+  /// a b a b.
+  static inline d4 broadcast_pair(const double *p) {
+    return {_mm256_broadcast_pd(reinterpret_cast<const __m128d *>(p))};
+  }
 };
 
 static inline void store(double *p, d4 a) {
@@ -275,13 +279,13 @@ static inline bool all_below(d4 a, d4 least) {
   return _mm256_movemask_pd(_mm256_cmp_pd(size, least.v, _CMP_LT_OQ)) == 0xf;
 }
 
-/// Lane 3 - k, four times.
+/// Lane k, four times.
 template <int k>
-static inline d4 broadcast_newest(d4 a) {
-  constexpr int lane = 3 - k;
-  return {_mm256_permute_pd(_mm256_permute2f128_pd(a.v, a.v, lane < 2 ? 0x00 : 0x11), lane % 2 != 0 ? 0xf : 0x0)};
+static inline d4 broadcast_lane(d4 a) {
+  return {_mm256_permute_pd(_mm256_permute2f128_pd(a.v, a.v, k < 2 ? 0x00 : 0x11), k % 2 != 0 ? 0xf : 0x0)};
 }
-/// Whether the last four lanes are smaller than `least`.
-static inline bool newest_are_below(d4 a, double least) {
-  return all_below(a, d4::broadcast(least));
+/// Lanes 2 k and 2 k + 1, twice.
+template <int k>
+static inline d4 broadcast_pair(d4 a) {
+  return {_mm256_permute2f128_pd(a.v, a.v, k == 0 ? 0x00 : 0x11)};
 }

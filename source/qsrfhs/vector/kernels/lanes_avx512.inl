@@ -176,6 +176,8 @@ struct d8 {
   static inline d8 load(const float *p) { return {_mm512_cvtps_pd(_mm256_loadu_ps(p))}; }
   static inline d8 load(const double *p) { return {_mm512_loadu_pd(p)}; }
   static inline d8 broadcast(double a) { return {_mm512_set1_pd(a)}; }
+  /// a b a b a b a b.
+  static inline d8 broadcast_pair(const double *p) { return {_mm512_broadcast_f64x2(_mm_loadu_pd(p))}; }
 };
 
 using wide_double = d8;
@@ -269,13 +271,19 @@ static inline d8 subtract_and_add(d8 a, d8 b) {
   return {_mm512_add_pd(a.v, _mm512_xor_pd(b.v, signs))};
 }
 
-/// Lane 7 - k, eight times.
+/// Lane k, eight times.
 template <int k>
-static inline d8 broadcast_newest(d8 a) {
-  return {_mm512_permutexvar_pd(_mm512_set1_epi64(7 - k), a.v)};
+static inline d8 broadcast_lane(d8 a) {
+  return {_mm512_permutexvar_pd(_mm512_set1_epi64(k), a.v)};
 }
-/// Whether the last four lanes are smaller than `least`.
-static inline bool newest_are_below(d8 a, double least) {
-  const __m512d size = _mm512_abs_pd(a.v);
-  return (_mm512_cmp_pd_mask(size, _mm512_set1_pd(least), _CMP_LT_OQ) & 0xf0) == 0xf0;
+/// True when all are smaller than `least`, which is below 2^-511; false with a NaN. Larger ones are told by two bits of
+/// their exponents, which is faster.
+static inline bool all_below(d8 a, d8 least) {
+  if (_mm512_test_epi64_mask(_mm512_castpd_si512(a.v), _mm512_set1_epi64(0x6000000000000000)) != 0) return false;
+  return _mm512_cmp_pd_mask(_mm512_abs_pd(a.v), least.v, _CMP_LT_OQ) == 0xff;
+}
+/// Lanes 2 k and 2 k + 1, four times.
+template <int k>
+static inline d8 broadcast_pair(d8 a) {
+  return {_mm512_shuffle_f64x2(a.v, a.v, 0x55 * k)};
 }

@@ -228,6 +228,8 @@ struct d4 {
   }
   static inline d4 load(const double *p) { return {_mm_loadu_pd(p), _mm_loadu_pd(p + 2)}; }
   static inline d4 broadcast(double a) { return {_mm_set1_pd(a), _mm_set1_pd(a)}; }
+  /// a b a b.
+  static inline d4 broadcast_pair(const double *p) { return {_mm_loadu_pd(p), _mm_loadu_pd(p)}; }
 };
 
 static inline void store(double *p, d4 a) {
@@ -287,14 +289,15 @@ static inline bool all_below(d4 a, d4 least) {
   return _mm_movemask_pd(_mm_and_pd(low, high)) == 3;
 }
 
-/// Lane 3 - k, four times.
+/// Lane k, four times.
 template <int k>
-static inline d4 broadcast_newest(d4 a) {
-  const __m128d half = k < 2 ? a.high : a.low;
-  const __m128d both = k % 2 == 0 ? _mm_unpackhi_pd(half, half) : _mm_unpacklo_pd(half, half);
+static inline d4 broadcast_lane(d4 a) {
+  const __m128d half = k < 2 ? a.low : a.high;
+  const __m128d both = k % 2 != 0 ? _mm_unpackhi_pd(half, half) : _mm_unpacklo_pd(half, half);
   return {both, both};
 }
-/// Whether the last four lanes are smaller than `least`.
-static inline bool newest_are_below(d4 a, double least) {
-  return all_below(a, d4::broadcast(least));
+/// Lanes 2 k and 2 k + 1, twice.
+template <int k>
+static inline d4 broadcast_pair(d4 a) {
+  return k == 0 ? d4{a.low, a.low} : d4{a.high, a.high};
 }

@@ -1,108 +1,180 @@
-// Recursive filters, eight samples at a time. SPDX-License-Identifier: MIT
+// Recursive filters, eight samples at a time. A sample is `parts` values: one, or a real and an imaginary part, with
+// tables where each value stands twice. SPDX-License-Identifier: MIT
 
-static constexpr std::size_t block_parts = 8 / wide_double::lanes;  // registers that hold a block
+static constexpr bool many_registers = wide_double::lanes == 8;  // enough for several blocks at a time
 
+// What a state below this leaves is worth nothing, and its products may be subnormal, which takes a hundred times
+// longer.
+static constexpr double least_state = 1e-290;
+
+/// The sums of a block: outputs, and the state behind it in `registers`.
+template <std::size_t parts, std::size_t registers>
 struct block_sums {
-  wide_double part[block_parts];
+  static constexpr std::size_t output_registers = 8 * parts / wide_double::lanes;
+  wide_double outputs[output_registers], state[registers];
 };
 
-/// The samples' shares of a block's outputs.
-static inline block_sums shares_of(const double *x, const double *shares) {
-  block_sums sums;
-  for (std::size_t p = 0; p < block_parts; ++p) {
-    sums.part[p] = wide_double::broadcast(0);
-    // Samples behind a register's outputs have no share in it.
-    for (std::size_t i = 0; i < (p + 1) * wide_double::lanes; ++i)
-      sums.part[p] =
-          sums.part[p] + wide_double::broadcast(x[i]) * wide_double::load(shares + 8 * i + p * wide_double::lanes);
-  }
-  return sums;
-}
-
-/// Adds an output's responses, times(register's index) of them.
-template <class Times>
-static inline void add_responses(block_sums &sums, Times times) {
-  for (std::size_t p = 0; p < block_parts; ++p) sums.part[p] = sums.part[p] + times(p);
-}
-
-// What outputs below this leave is worth nothing, and their products may be subnormal, which takes a hundred times
-// longer.
-static constexpr double least_output = 1e-290;
-
-/// A block is as fast as the way from its last outputs to those of the next: the newest two add up beside the others,
-/// and with an order of at most 4 they never leave the registers.
-template <std::size_t order>
-static inline void recurse_over_block(const block_recursion &plan, wide_double &last, double *data) {
-  block_sums sums = shares_of(data, plan.shares);
-  if (!newest_are_below(last, least_output)) {
-    const auto response = [&](std::size_t j, std::size_t p) {
-      return wide_double::load(plan.responses + 8 * j + p * wide_double::lanes);
-    };
-    const wide_double past[4] = {broadcast_newest<0>(last), broadcast_newest<1>(last), broadcast_newest<2>(last),
-                                 broadcast_newest<3>(last)};
-    for (std::size_t j = order; j-- > 2;) add_responses(sums, [&](std::size_t p) { return past[j] * response(j, p); });
-    add_responses(sums, [&](std::size_t p) {
-      const wide_double newest = past[0] * response(0, p);
-      return order == 1 ? newest : past[1] * response(1, p) + newest;
-    });
-  }
-  for (std::size_t p = 0; p < block_parts; ++p) store(data + p * wide_double::lanes, sums.part[p]);
-  last = sums.part[block_parts - 1];
-}
-
-/// The same for any order, out of memory.
-static inline void recurse_over_block(const block_recursion &plan, double *data) {
-  const d4 limit = d4::broadcast(least_output);
-  bool silent = true;
-  for (std::size_t j = 0; j < plan.order; j += 4) silent = silent && all_below(d4::load(data - j - 4), limit);
-  block_sums sums = shares_of(data, plan.shares);
-  if (!silent) {
-    const auto response = [&](std::size_t j, std::size_t p) {
-      return wide_double::broadcast(*(data - 1 - static_cast<std::ptrdiff_t>(j))) *
-             wide_double::load(plan.responses + 8 * j + p * wide_double::lanes);
-    };
-    for (std::size_t j = plan.order; j-- > 2;) add_responses(sums, [&](std::size_t p) { return response(j, p); });
-    add_responses(sums, [&](std::size_t p) { return response(1, p) + response(0, p); });
-  }
-  for (std::size_t p = 0; p < block_parts; ++p) store(data + p * wide_double::lanes, sums.part[p]);
-}
-
-/// The newest four outputs of a stream, in the place that broadcast_newest takes them from.
-static inline wide_double newest_outputs(const double *data) {
-  double lanes[wide_double::lanes] = {};
-  for (std::size_t l = 0; l < 4; ++l) lanes[wide_double::lanes - 4 + l] = data[static_cast<std::ptrdiff_t>(l) - 4];
-  return wide_double::load(lanes);
-}
-
-template <std::size_t order, std::size_t count>
-static inline void recurse_over(const block_recursion &plan, std::size_t blocks, double *const *streams) {
-  wide_double last[count];
-  for (std::size_t s = 0; s < count; ++s) last[s] = newest_outputs(streams[s]);
-  for (std::size_t block = 0; block < blocks; ++block)
-    for (std::size_t s = 0; s < count; ++s) recurse_over_block<order>(plan, last[s], streams[s] + 8 * block);
-}
-
-template <std::size_t order>
-static inline void recurse_over_streams(const block_recursion &plan, std::size_t blocks, double *const *streams,
-                                        std::size_t count) {
-  if (count == 1)
-    recurse_over<order, 1>(plan, blocks, streams);
+/// A sample, all over a register.
+template <std::size_t parts>
+static inline wide_double repeated(const double *sample) {
+  if constexpr (parts == 1)
+    return wide_double::broadcast(*sample);
   else
-    recurse_over<order, 2>(plan, blocks, streams);
+    return wide_double::broadcast_pair(sample);
+}
+/// The same for value k of a state.
+template <std::size_t parts, std::size_t k>
+static inline wide_double repeated_lane(const wide_double *state) {
+  constexpr std::size_t in_one = wide_double::lanes / parts;
+  if constexpr (parts == 1)
+    return broadcast_lane<k>(state[0]);
+  else
+    return broadcast_pair<k % in_one>(state[k / in_one]);
 }
 
-static void recursion(const block_recursion &plan, std::size_t blocks, double *const *streams, std::size_t count) {
+/// The sums of `count` samples of several blocks, each times its row of one register of a table, which is loaded once.
+template <std::size_t parts, std::size_t blocks>
+static inline void sum_products(const double *x, const double *rows, std::size_t width, std::size_t count,
+                                wide_double *sums) {
+  for (std::size_t b = 0; b < blocks; ++b) sums[b] = repeated<parts>(x + 8 * parts * b) * wide_double::load(rows);
+  for (std::size_t i = 1; i < count; ++i) {
+    const wide_double row =
+        blocks > 1 ? in_register(wide_double::load(rows + width * i)) : wide_double::load(rows + width * i);
+    for (std::size_t b = 0; b < blocks; ++b)
+      sums[b] = multiply_add(repeated<parts>(x + parts * (8 * b + i)), row, sums[b]);
+  }
+}
+
+/// What their samples add to several blocks.
+template <std::size_t parts, std::size_t registers, std::size_t blocks>
+static inline void sum_samples(const block_recursion &plan, std::size_t width, const double *x,
+                               block_sums<parts, registers> *sums) {
+  constexpr std::size_t lanes = wide_double::lanes;
+  wide_double sum[blocks];
+  for (std::size_t r = 0; r < registers; ++r) {
+    sum_products<parts, blocks>(x, plan.gathering + r * lanes, width, 8, sum);
+    for (std::size_t b = 0; b < blocks; ++b) sums[b].state[r] = sum[b];
+  }
+  for (std::size_t r = 0; r < sums->output_registers; ++r) {
+    // Samples behind a register's outputs have no share in it.
+    sum_products<parts, blocks>(x, plan.shares + r * lanes, 8 * parts, (r + 1) * lanes / parts, sum);
+    for (std::size_t b = 0; b < blocks; ++b) sums[b].outputs[r] = sum[b];
+  }
+}
+
+/// Registers that hold a state of order 4.
+template <std::size_t parts>
+static constexpr std::size_t small_state = 4 * parts > wide_double::lanes ? 4 * parts / wide_double::lanes : 1;
+
+/// Puts a block's outputs, and the state behind it in the place of that in front. A block is as fast as the way from
+/// one state to the next, so its products add up in two sums.
+template <std::size_t parts, std::size_t order>
+static inline void finish_block(const block_recursion &plan, const block_sums<parts, small_state<parts>> &sums,
+                                wide_double *state, double *out) {
+  constexpr std::size_t lanes = wide_double::lanes, registers = small_state<parts>,
+                        width = block_recursion::width_of(order, parts);
+  bool silent = true;
+  for (std::size_t r = 0; r < registers; ++r)
+    silent = silent && all_below(state[r], wide_double::broadcast(least_state));
+  if (silent) {
+    for (std::size_t r = 0; r < registers; ++r) state[r] = sums.state[r];
+    for (std::size_t r = 0; r < sums.output_registers; ++r) store(out + r * lanes, sums.outputs[r]);
+    return;
+  }
+  const wide_double values[4] = {repeated_lane<parts, 0>(state), repeated_lane<parts, 1>(state),
+                                 repeated_lane<parts, 2>(state), repeated_lane<parts, 3>(state)};
+  for (std::size_t r = 0; r < registers; ++r) {
+    const auto column = [&](std::size_t j) { return wide_double::load(plan.transition + width * j + r * lanes); };
+    wide_double next = multiply_add(values[0], column(0), sums.state[r]);
+    if constexpr (order > 1) {
+      wide_double odd = values[1] * column(1);
+      if constexpr (order > 2) next = multiply_add(values[2], column(2), next);
+      if constexpr (order > 3) odd = multiply_add(values[3], column(3), odd);
+      next = next + odd;
+    }
+    state[r] = next;
+  }
+  for (std::size_t r = 0; r < sums.output_registers; ++r) {
+    wide_double outputs = sums.outputs[r];
+    for (std::size_t j = 0; j < order; ++j)
+      outputs = multiply_add(values[j], wide_double::load(plan.responses + 8 * parts * j + r * lanes), outputs);
+    store(out + r * lanes, outputs);
+  }
+}
+
+template <std::size_t parts, std::size_t order, std::size_t blocks>
+static inline void recurse_over_blocks(const block_recursion &plan, double *data, wide_double *state) {
+  block_sums<parts, small_state<parts>> sums[blocks];
+  sum_samples<parts, small_state<parts>, blocks>(plan, block_recursion::width_of(order, parts), data, sums);
+  for (std::size_t b = 0; b < blocks; ++b) finish_block<parts, order>(plan, sums[b], state, data + 8 * parts * b);
+}
+
+/// Orders up to 4: the state never leaves the registers.
+template <std::size_t parts, std::size_t order>
+static inline void recurse_in_registers(const block_recursion &plan, std::size_t n, double *data, double *state) {
+  constexpr std::size_t together = many_registers ? 2 : 1, registers = small_state<parts>;
+  wide_double values[registers];
+  for (std::size_t r = 0; r < registers; ++r) values[r] = wide_double::load(state + r * wide_double::lanes);
+  for (; n >= 8 * together; n -= 8 * together, data += 8 * parts * together)
+    recurse_over_blocks<parts, order, together>(plan, data, values);
+  if (together > 1 && n >= 8) {
+    recurse_over_blocks<parts, order, 1>(plan, data, values);
+    data += 8 * parts;
+  }
+  for (std::size_t r = 0; r < registers; ++r) store(state + r * wide_double::lanes, values[r]);
+  if (n % 8 > 0) recurse_over_blocks<parts, order, 1>(plan, data, values);
+}
+
+/// Any order, with a state of `width` values in memory.
+template <std::size_t parts, std::size_t width>
+static inline void recurse_in_memory(const block_recursion &plan, std::size_t n, double *data, double *state) {
+  constexpr std::size_t lanes = wide_double::lanes, registers = width / lanes;
+  using sums_of_block = block_sums<parts, registers>;
+  for (std::size_t k = 0; k < n; k += 8, data += 8 * parts) {
+    sums_of_block even, odd;
+    sum_samples<parts, registers, 1>(plan, width, data, &even);
+    for (wide_double &sum : odd.outputs) sum = wide_double::broadcast(0);
+    for (wide_double &sum : odd.state) sum = wide_double::broadcast(0);
+    bool silent = true;
+    for (std::size_t at = 0; at < width; at += lanes)
+      silent = silent && all_below(wide_double::load(state + at), wide_double::broadcast(least_state));
+    const auto add = [&](std::size_t j, sums_of_block &sums) {
+      const wide_double value = repeated<parts>(state + parts * j);
+      for (std::size_t r = 0; r < registers; ++r)
+        sums.state[r] = multiply_add(value, wide_double::load(plan.transition + width * j + r * lanes), sums.state[r]);
+      for (std::size_t r = 0; r < sums.output_registers; ++r)
+        sums.outputs[r] =
+            multiply_add(value, wide_double::load(plan.responses + 8 * parts * j + r * lanes), sums.outputs[r]);
+    };
+    for (std::size_t j = 0; !silent && j < plan.order; j += 2) {
+      add(j, even);
+      add(j + 1, odd);
+    }
+    for (std::size_t r = 0; r < even.output_registers; ++r) store(data + r * lanes, even.outputs[r] + odd.outputs[r]);
+    for (std::size_t r = 0; r < registers && k + 8 <= n; ++r) store(state + r * lanes, even.state[r] + odd.state[r]);
+  }
+}
+
+template <std::size_t parts>
+static inline void recurse(const block_recursion &plan, std::size_t n, double *data, double *state) {
   switch (plan.order) {
     case 1:
-      return recurse_over_streams<1>(plan, blocks, streams, count);
+      return recurse_in_registers<parts, 1>(plan, n, data, state);
     case 2:
-      return recurse_over_streams<2>(plan, blocks, streams, count);
+      return recurse_in_registers<parts, 2>(plan, n, data, state);
     case 3:
-      return recurse_over_streams<3>(plan, blocks, streams, count);
+      return recurse_in_registers<parts, 3>(plan, n, data, state);
     case 4:
-      return recurse_over_streams<4>(plan, blocks, streams, count);
+      return recurse_in_registers<parts, 4>(plan, n, data, state);
     default:
-      for (std::size_t block = 0; block < blocks; ++block)
-        for (std::size_t s = 0; s < count; ++s) recurse_over_block(plan, streams[s] + 8 * block);
+      return plan.order <= 8 ? recurse_in_memory<parts, 8 * parts>(plan, n, data, state)
+                             : recurse_in_memory<parts, 16 * parts>(plan, n, data, state);
   }
+}
+
+static void recursion(const block_recursion &plan, std::size_t n, double *data, double *state) {
+  recurse<1>(plan, n, data, state);
+}
+static void complex_recursion(const block_recursion &plan, std::size_t n, double *data, double *state) {
+  recurse<2>(plan, n, data, state);
 }
