@@ -32,7 +32,7 @@ struct spectrum_object {
 };
 using spectra = handles<lumra_spectrum_average, spectrum_object>;
 
-constexpr state_kind saved_spectrum{{'a', 'v', 'g'}, 2};
+constexpr state_kind saved_spectrum{{'a', 'v', 'g'}, 3};
 constexpr std::uint64_t fewest_points = 16;
 
 dsp::spectrum_settings checked_settings(const lumra_spectrum_options &options) {

@@ -39,7 +39,8 @@ class radix_pass {
 };
 
 /// Whether a transform of so many points begins with the pass: where it costs less than what one transform of all of them
-/// loses to the second-level cache, and rows are whole groups, those of real samples up to half the rate, too.
+/// loses to the second-level cache, and rows are whole groups, those of real samples up to half the rate, too. Saved
+/// spectra hold the rows: another answer needs another version of them.
 template <class Sample>
 [[nodiscard]] constexpr bool is_split(std::size_t points) noexcept {
   constexpr std::size_t least = sizeof(real_of<Sample>) == sizeof(double) ? 2048 : 4096;

@@ -82,10 +82,7 @@ auto segment_plan<Sample>::group_of(std::size_t r, std::size_t n) const noexcept
 
 template <class Sample>
 void segment_plan<Sample>::to_bins(std::span<const real> power, std::span<real> bins) const noexcept {
-  if (!is_split()) {
-    std::copy(power.begin(), power.end(), bins.begin());
-    return order(bins.data(), bins.size());
-  }
+  if (!is_split()) return to_state(power, bins);
   real tile[radix][group];
   for (std::size_t n = 0; n < columns(); n += group) {
     for (std::size_t r = 0; r < radix; ++r) {
@@ -101,21 +98,15 @@ void segment_plan<Sample>::to_bins(std::span<const real> power, std::span<real> 
 }
 
 template <class Sample>
-void segment_plan<Sample>::from_bins(std::span<const real> bins, std::span<real> power) const noexcept {
-  if (!is_split()) {
-    std::copy(bins.begin(), bins.end(), power.begin());
-    return order(power.data(), power.size());
-  }
-  for (std::size_t n = 0; n < columns(); n += group) {
-    for (std::size_t r = 0; r < radix; ++r) {
-      const group_place place = group_of(r, n);
-      real *const to = power.data() + place.first;
-      for (std::size_t i = 0; i < group; ++i) to[i] = bins[(n + i) * radix + r];
-      if (place.reversed) std::reverse(to, to + group);
-      order(to, group);
-    }
-  }
-  if constexpr (!is_complex<Sample>) power.back() = bins.back();
+void segment_plan<Sample>::to_state(std::span<const real> power, std::span<real> state) const noexcept {
+  std::copy(power.begin(), power.end(), state.begin());
+  order(state.data(), state.size());
+}
+
+template <class Sample>
+void segment_plan<Sample>::from_state(std::span<const real> state, std::span<real> power) const noexcept {
+  std::copy(state.begin(), state.end(), power.begin());
+  order(power.data(), power.size());
 }
 
 template class segment_plan<float>;

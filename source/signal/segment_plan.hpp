@@ -47,9 +47,12 @@ class segment_plan {
 
   /// Where the powers of a row's bins go, from the first bin on, as the kernels leave them.
   [[nodiscard]] range powers_of(std::size_t row) const noexcept;
-  /// Powers into the order of the bins, and out of it. The spans lie apart.
+  /// Powers into the order of the bins. The spans lie apart.
   void to_bins(std::span<const real> power, std::span<real> bins) const noexcept;
-  void from_bins(std::span<const real> bins, std::span<real> power) const noexcept;
+  /// For states: each row into the order of its bins, which is the same with all kernels, and out of it. To put the rows
+  /// into each other would take as long as all the rest of saving. The spans lie apart.
+  void to_state(std::span<const real> power, std::span<real> state) const noexcept;
+  void from_state(std::span<const real> state, std::span<real> power) const noexcept;
 
  private:
   /// Of the powers of some neighbours in a row, which may stand in reverse order.

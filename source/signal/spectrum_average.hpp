@@ -120,7 +120,7 @@ void spectrum_average<Sample>::save(Writer &to) const {
   to.add_all(std::span<const Sample>(head_));
   to.add_all(std::span<const Sample>(tail_.data(), tail_count_));
   const auto add_row = [&](std::span<const real> row) {
-    if (!to.only_counts()) plan_.to_bins(row, ordered_.elements());
+    if (!to.only_counts()) plan_.to_state(row, ordered_.elements());
     to.add_all(std::span<const real>(ordered_.elements()));
   };
   for (const auto &tree : all.forest.trees()) {
@@ -154,7 +154,7 @@ bool spectrum_average<Sample>::load(Reader &from) {
   from.take_all(std::span<Sample>(tail_.data(), static_cast<std::size_t>(tail)));
   const auto take_row = [&] {
     from.take_all(ordered_.elements());
-    plan_.from_bins(ordered_.elements(), scratch_.elements());
+    plan_.from_state(ordered_.elements(), scratch_.elements());
   };
   std::uint64_t behind = settings_.start;
   for (std::uint64_t k = 0; k < trees; ++k) {
