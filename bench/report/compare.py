@@ -91,4 +91,6 @@ def compare(old, new, pattern, turns):
     print(f"{turns} processes of each build, of each the fastest repetition by the processor's time; others kept "
           f"{load.others:.2f} processors busy. A change: rank test of Mann and Whitney, by Benjamini's and Hochberg's "
           f"correction at {figures.FALSE_CHANGES:.0%} for all {len(changes)} rows, and {figures.LEAST_EFFECT:.0%} or more.")
-    print("\nChanged:\n\n" + table(found) if found else "Nothing changed beyond the noise.")
+    fewest = figures.fewest_turns(count)
+    nothing = "Nothing changed beyond the noise." if turns >= fewest else f"Fewer than {fewest} turns cannot tell a change."
+    print("\nChanged:\n\n" + table(found) if found else nothing)
