@@ -7,7 +7,6 @@
 #include <utility>
 
 #include "recording/sample_reader.hpp"
-#include "terminal/failure.hpp"
 #include "terminal/interruption.hpp"
 
 namespace tool {
@@ -27,22 +26,19 @@ template <class Sample>
 class piece_reader {
  public:
   piece_reader(const recording::source &source, std::size_t at_once)
-      : source_(source), reader_(source, 0, source.samples), samples_(at_once) {}
+      : reader_(source, 0, source.samples), samples_(at_once) {}
 
-  /// Of one stretch.
+  /// Of one stretch, whose samples are there: the reader throws where the file became shorter.
   void add(std::uint64_t first, std::uint64_t count, spectrum_accumulator &average) {
     reader_.seek(first);
-    for (std::uint64_t left = count; left > 0;) {
-      const auto wanted = static_cast<std::size_t>(std::min<std::uint64_t>(left, samples_.size()));
+    for (std::uint64_t done = 0; done < count; done += samples_.size()) {
+      const auto wanted = static_cast<std::size_t>(std::min<std::uint64_t>(count - done, samples_.size()));
       const std::size_t got = reader_.read(std::span(samples_).first(wanted));
-      if (got < wanted) throw failure("{}: became shorter while it was read; try again", source_.data.string());
-      average.add({samples_.data(), got, sizeof(Sample), first, false});
-      left -= got;
+      average.add({samples_.data(), got, sizeof(Sample), first + done, false});
     }
   }
 
  private:
-  const recording::source &source_;
   recording::sample_reader reader_;
   std::vector<Sample> samples_;
 };

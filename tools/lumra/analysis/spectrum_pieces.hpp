@@ -1,4 +1,5 @@
-// Averages a long recording by several threads, which each read, decode and add pieces of it. SPDX-License-Identifier: MIT
+// Averages a long recording by several threads, which each read, decode and add pieces of it.
+// SPDX-License-Identifier: MIT
 #pragma once
 
 #include <algorithm>
