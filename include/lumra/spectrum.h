@@ -11,7 +11,8 @@
  *
  * The result has the same bits however the stream is cut into calls and into objects that are merged, and with any
  * number of threads: the powers of up to eight neighbours are added one after the other, and these sums in pairs along
- * a binary tree, both by the positions at which the segments begin; which also keeps the rounding small. Conventions of the open interface: lumra/lumra.h. */
+ * a binary tree, both by the positions at which the segments begin; which also keeps the rounding small. Conventions of
+ * the open interface: lumra/lumra.h. */
 #ifndef LUMRA_SPECTRUM_H
 #define LUMRA_SPECTRUM_H
 

@@ -13,8 +13,8 @@ namespace {
 
 using qsrfhs::kernels::block_recursion;
 
-constexpr std::size_t chunk =
-    1024;  // samples that go through all stages before the next ones; stays in the first cache
+/// Samples that go through all stages before the next ones; they stay in the first cache.
+constexpr std::size_t chunk = 1024;
 constexpr std::size_t block = recursive_filter::block;
 
 /// Room for a history, in whole registers and at least one.

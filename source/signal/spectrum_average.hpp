@@ -99,7 +99,7 @@ class spectrum_average {
   segment_plan<Sample> plan_;
   std::vector<std::unique_ptr<lane>> lanes_;  // the first is the caller's, with what all have gathered
   qsrfhs::aligned_buffer<real> scratch_;      // a row of powers
-  qsrfhs::aligned_buffer<real> ordered_;      // one in the order of the bins
+  qsrfhs::aligned_buffer<real> ordered_;      // one as it is read or saved
   std::uint64_t origin_, position_, next_;    // next_: where the next segment begins
   std::uint64_t segments_ = 0;
   std::vector<Sample> head_;

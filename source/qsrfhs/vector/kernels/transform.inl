@@ -51,7 +51,8 @@ struct power_factor {
   }
 };
 
-/// Powers of bins k to `end` in reverse: that of bin k goes to end_of[-1 - k]. Where it ended: on a boundary, or behind the last bin of all.
+/// Powers of bins k to `end` in reverse: that of bin k goes to end_of[-1 - k]. Where it ended: on a boundary, or behind
+/// the last bin of all.
 static inline std::size_t mirrored_up_to(const power_factor &of, const float *x, float *end_of, std::size_t k,
                                          std::size_t end, bool is_last) {
   const auto put = [&](std::size_t at) { store(end_of - at - wide::lanes, reverse(of.of_bins(x + 2 * at))); };
